@@ -1,0 +1,48 @@
+# How every target of the project is built: warnings are errors with both compilers, sanitizers and
+# coverage are switched on by the presets.
+
+option(PROJECT_WERROR "Treat warnings as errors" ON)
+set(PROJECT_SANITIZE "" CACHE STRING "Sanitizers, as -fsanitize takes them (address,undefined or thread)")
+option(PROJECT_COVERAGE "Measure coverage" OFF)
+
+add_library(project_options INTERFACE)
+target_include_directories(project_options INTERFACE ${PROJECT_SOURCE_DIR})
+target_compile_options(
+  project_options
+  INTERFACE -Wall
+            -Wextra
+            -Wpedantic
+            -Wshadow
+            -Wconversion
+            -Wsign-conversion
+            -Wnon-virtual-dtor
+            -Woverloaded-virtual
+            -Wcast-align
+            -Wold-style-cast
+            $<$<BOOL:${PROJECT_WERROR}>:-Werror>)
+if(PROJECT_SANITIZE)
+  target_compile_options(project_options INTERFACE -fsanitize=${PROJECT_SANITIZE} -fno-sanitize-recover=all
+                                                   -fno-omit-frame-pointer)
+  target_link_options(project_options INTERFACE -fsanitize=${PROJECT_SANITIZE})
+endif()
+if(PROJECT_COVERAGE)
+  target_compile_options(project_options INTERFACE --coverage)
+  target_link_options(project_options INTERFACE --coverage)
+endif()
+
+# Everything built lies where its users look for it, so that the build tree runs like an installation.
+set(CMAKE_RUNTIME_OUTPUT_DIRECTORY ${PROJECT_BINARY_DIR}/bin)
+set(CMAKE_LIBRARY_OUTPUT_DIRECTORY ${PROJECT_BINARY_DIR}/lib)
+set(PROJECT_MIGRATORS_DIRECTORY ${PROJECT_BINARY_DIR}/lib/account-retirement/migrators)
+set(CMAKE_INSTALL_RPATH $ORIGIN $ORIGIN/../${CMAKE_INSTALL_LIBDIR} $ORIGIN/../../..)
+
+# project_test(<name> <source>... LIBRARIES <target>...) builds one GoogleTest program. CTest runs each
+# of its cases in a process of its own, because much of the state under test is kept per process.
+function(project_test name)
+  cmake_parse_arguments(PARSE_ARGV 1 arg "" "" "LIBRARIES")
+  add_executable(${name} ${arg_UNPARSED_ARGUMENTS})
+  target_link_libraries(${name} PRIVATE project_options ${arg_LIBRARIES} GTest::gtest GTest::gmock
+                                        GTest::gtest_main)
+  target_compile_definitions(${name} PRIVATE TEST_DATA_DIR="${PROJECT_SOURCE_DIR}/tests/data")
+  gtest_discover_tests(${name} TEST_PREFIX ${name}. DISCOVERY_TIMEOUT 60 PROPERTIES TIMEOUT 120)
+endfunction()

@@ -1,0 +1,25 @@
+#pragma once
+
+#include <optional>
+#include <string>
+#include <string_view>
+
+#include "platform/Export.h"
+
+namespace platform {
+
+// The device's fixed properties. Any thread.
+class PLATFORM_EXPORT DeviceInfo {
+ public:
+  virtual ~DeviceInfo();
+  // The property under `key` ("CPUArchitecture", "DeviceClass"); empty when the device has none.
+  virtual std::optional<std::string> queryValue(std::string_view key) = 0;
+  // The directory under which the device's files lie: "/" on a device.
+  virtual std::string systemRootDirectory() = 0;
+};
+
+// `root` with `path` as a further part. The result stays below `root` also when `path` begins with
+// "/", and has no doubled "/" between the two.
+PLATFORM_EXPORT std::string joinedPath(std::string_view root, std::string_view path);
+
+}  // namespace platform

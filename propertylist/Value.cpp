@@ -1,0 +1,3 @@
+#include "propertylist/Value.h"
+#include "propertylist/Reading.h"
+#include "propertylist/Writing.h"
