@@ -20,14 +20,14 @@ class PLATFORM_EXPORT Describable {
   virtual std::string description() const = 0;
 };
 
-// One argument of a log line. Refers to what it was made from, which must outlive the call that takes
-// it, and describes it only when a line is really written.
+// One argument of a log line. Refers to what it was made from, which must outlive the call that
+// takes it, and describes it only when a line is really written.
 class PLATFORM_EXPORT LogArgument {
  public:
   // NOLINTBEGIN(google-explicit-constructor): arguments are passed as they are
   LogArgument(std::string_view text);
   LogArgument(const std::string& text) : LogArgument(std::string_view(text)) {}
-  LogArgument(const char* text);                      // null prints as "(null)"
+  LogArgument(const char* text);                        // null prints as "(null)"
   LogArgument(const std::optional<std::string>& text);  // empty prints as "(null)"
   LogArgument(int number);
   LogArgument(long number);
@@ -35,14 +35,14 @@ class PLATFORM_EXPORT LogArgument {
   LogArgument(unsigned number);
   LogArgument(unsigned long number);
   LogArgument(const propertylist::Value& value);
-  LogArgument(const propertylist::Value* value);      // null prints as "(null)"
+  LogArgument(const propertylist::Value* value);  // null prints as "(null)"
   LogArgument(const propertylist::Dictionary& dictionary);
   LogArgument(const propertylist::Array& array);
   LogArgument(const std::optional<propertylist::Dictionary>& dictionary);
   LogArgument(const std::optional<propertylist::Array>& array);
-  LogArgument(const std::optional<Error>& error);     // empty prints as "(null)"
+  LogArgument(const std::optional<Error>& error);  // empty prints as "(null)"
   LogArgument(const Describable& object);
-  LogArgument(const Describable* object);             // null prints as "(null)"
+  LogArgument(const Describable* object);  // null prints as "(null)"
   template <typename T>
   LogArgument(const std::shared_ptr<T>& object)
       : LogArgument(static_cast<const Describable*>(object.get())) {}
