@@ -1,0 +1,43 @@
+#pragma once
+
+#include <functional>
+#include <memory>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "deviceimage/DeviceImage.h"
+#include "platform/Services.h"
+
+namespace deviceimage {
+
+struct ServiceOptions {
+  // What each line of the system log begins with, after the time.
+  std::string processName = "migration-host";
+  // Also gets every line, as it is written to the log (one line, control characters escaped,
+  // without time and process). May be called on any thread, and writes no log line itself.
+  std::function<void(std::string_view line)> logSink;
+  // The user's languages, the preferred one first ("de", "en").
+  std::vector<std::string> preferredLanguages = {"en"};
+};
+
+// Every platform service over one device image. What a service cannot read in the image counts as
+// absent; what it cannot write is a failure of its own kind, or, for journals and log, passed over.
+//
+// Making it opens no database and writes nothing. The services live as long as this object, which
+// is used by one process: a child made by fork makes its own.
+class DeviceImageServices {
+ public:
+  explicit DeviceImageServices(std::shared_ptr<const DeviceImage> image,
+                               ServiceOptions options = {});
+  ~DeviceImageServices();
+
+  // References into this object, to be given to platform::install.
+  const platform::Services& services() const;
+
+ private:
+  class Implementation;
+  std::unique_ptr<Implementation> _implementation;
+};
+
+}  // namespace deviceimage
