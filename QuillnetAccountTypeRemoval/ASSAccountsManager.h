@@ -1,0 +1,180 @@
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <map>
+#include <memory>
+#include <optional>
+#include <set>
+#include <string>
+#include <string_view>
+#include <unordered_map>
+#include <vector>
+
+#include "QuillnetAccountTypeRemoval/ASSBasicAccount.h"
+#include "QuillnetAccountTypeRemoval/ASSDeviceLocalAccount.h"
+#include "QuillnetAccountTypeRemoval/ASSRuntimeFixMailAccount.h"
+#include "QuillnetAccountTypeRemoval/StringLists.h"
+#include "propertylist/Value.h"
+
+namespace accountsettings {
+
+class ASSAccountsManager;
+using AccountsManagerPtr = std::shared_ptr<ASSAccountsManager>;
+using AccountArray = std::vector<AccountPtr>;
+
+// The accounts of one device: read from the settings file when the store is made, changed in
+// memory, written back by saveAllAccounts. Every user makes a store of its own; two stores, in one
+// process or in two, meet only in the file, where a save merges what both changed.
+//
+// Top-level accounts have an order, that of the file. The child accounts of a top-level account are
+// dictionaries in its property "ChildAccounts", one level deep; their records are made from there
+// and are an index of it. Identifiers are expected to be unique and not forced to be.
+//
+// The store shares its records with its callers: a change of a record is a change of the store. One
+// thread at a time; no lock is taken. What fails is logged, not returned.
+class ASSAccountsManager {
+ public:
+  virtual ~ASSAccountsManager() = default;
+  ASSAccountsManager(const ASSAccountsManager&) = delete;
+  ASSAccountsManager& operator=(const ASSAccountsManager&) = delete;
+
+  // --- Making a store ---
+
+  // Reads the settings file, once. A file that is missing, or cannot be read as a dictionary, gives
+  // an empty store without a word. Both do the same.
+  static AccountsManagerPtr init();
+  static AccountsManagerPtr initInsideOfMigration();
+  // A store of the given account dictionaries; the file is not read and dataVersion stays 0.
+  static AccountsManagerPtr initWithAccounsInfoArray(
+      const std::optional<propertylist::Array>& accounts);
+
+  // The "Version" of the file that was read; 0 when it had none. A save writes currentVersion
+  // whatever stands here.
+  std::int64_t dataVersion() const { return dataVersion_; }
+  void setDataVersion(std::int64_t version) { dataVersion_ = version; }
+  static unsigned currentVersion() { return 12; }
+  static std::string fullPathToAccountSettingsPlist();
+
+  // --- Queries: nothing is changed or written; an unknown identifier gives null ---
+
+  // The top-level account with the identifier; for the identifier of a child, its top-level parent.
+  AccountPtr accountWithIdentifier(std::string_view identifier) const;
+  // The account, child accounts included, whose sync store has the identifier. A top-level account
+  // wins.
+  AccountPtr syncableAccountWithSyncIdentifier(std::string_view syncIdentifier) const;
+  // The same account, or for a child its parent: the one that is shown to the user.
+  AccountPtr displayAccountWithSyncIdentifier(std::string_view syncIdentifier) const;
+  // The top-level accounts in order. Live: insertions and deletions show in an array taken earlier;
+  // the replace operations install another array, and one taken before keeps showing what was.
+  std::shared_ptr<const AccountArray> allBasicAccounts() const { return orderedTopLevelAccounts_; }
+  // The top-level accounts in order, then all child accounts.
+  AccountArray allBasicSyncableAccounts() const;
+  AccountArray basicAccountsWithTypes(const StringList& types) const;
+  std::size_t countOfBasicAccountsWithTypes(const StringList& types) const;
+  std::size_t count() const { return orderedTopLevelAccounts_->size(); }
+  // The device-local account. A store without one gets a new one, with a log line; it reaches the
+  // file at the next save. A plain record of type "OnMyDevice" does not count and is replaced or
+  // removed. (The store's own record, whatever the name says; no full account is made.)
+  DeviceLocalAccountPtr fullDeviceLocalAccount();
+
+  // --- Changes in memory: the file changes at the next save ---
+
+  // Puts `account` in place of every account with its identifier, and does nothing when there is
+  // none.
+  void updateAccount(const AccountPtr& account);
+  // Appends `account`, unless a top-level account with its identifier is registered.
+  void insertAccount(const AccountPtr& account);
+  // Removes the last account that has the identifier of `account`, which need not be the same
+  // object, and its children. Of two different accounts with one identifier the first stays listed.
+  void deleteAccount(const AccountPtr& account);
+  // Deletes the top-level account with the identifier; nothing when there is none.
+  void deleteAccountWithIdentifier(std::string_view identifier);
+  // Puts `replacement` where `current` stands, which must be the very object the store holds; any
+  // other is a caller error and changes nothing. Until the file is loaded again
+  // accountWithIdentifier does not find `replacement` among the top-level accounts; updateAccount
+  // has no such gap.
+  void replaceAccountWithAccount(const AccountPtr& current, const AccountPtr& replacement);
+  // Makes `accounts` the accounts of these types. One with the identifier property of an account of
+  // the store takes its place, whatever that one's type; other accounts of the types go, with their
+  // children; the rest of `accounts` is appended in order, and one that has a parent is put into
+  // that parent's children instead, out of its old parent's. A child whose parent is neither kept
+  // nor placed before it is a caller error and changes nothing.
+  void replaceAccountsWithTypesWithAccounts(const StringList& types, const AccountArray& accounts);
+  // Removes the child's dictionary from the parent's "ChildAccounts".
+  void removeChildWithIdentifierFromAccount(std::string_view identifier, const AccountPtr& parent);
+  // Appends the child's own properties to the parent's "ChildAccounts", whether or not a child of
+  // that identifier is there. The store's record of the child is a new one.
+  void addChildToAccount(const AccountPtr& child, const AccountPtr& parent);
+
+  // --- Saving ---
+
+  // Writes every account, merged with what the file holds by now, in one step: a reader sees the
+  // old or the new file. When anything fails the file stays as it is, one line is logged and
+  // nothing is returned. Accounts that another process added meanwhile are not carried over.
+  void saveAllAccounts();
+  // One account's properties out of three versions: what changed in memory since `original` wins,
+  // key by key, and what did not change follows `onDisk`. Without `original` or `onDisk`, absent or
+  // empty, the answer is `inMemory`. Values are taken whole, never merged inside.
+  propertylist::Dictionary mergeInMemoryPropertiesOriginalPropertiesOnDiskProperties(
+      const propertylist::Dictionary& inMemory,
+      const std::optional<propertylist::Dictionary>& original,
+      const std::optional<propertylist::Dictionary>& onDisk) const;
+
+ protected:
+  // Makes an object without accounts; _initFromSettingsFile or _initWithAccountsInfo completes it.
+  ASSAccountsManager();
+  void _initFromSettingsFile();
+  void _initWithAccountsInfo(const std::optional<propertylist::Array>& accounts);
+  // The fixers through which every top-level account passes at loading and saving. A subclass may
+  // choose others.
+  virtual std::vector<RuntimeFixerPtr> _createRuntimeFixers();
+
+  void _loadChildrenFromAccount(const AccountPtr& parent);
+  void _removeChildrenForAccountWithIdentifier(const std::optional<std::string>& identifier);
+  // Takes the snapshot of what was loaded or saved, which change notifications compare with.
+  void _setOriginalAccountDictionaries();
+
+  const std::map<std::string, propertylist::Dictionary, std::less<>>& originalAccountsByID() const {
+    return originalAccountsByID_;
+  }
+  const std::map<std::string, AccountPtr, std::less<>>& childAccountsByID() const {
+    return childAccountsByID_;
+  }
+  const std::map<std::string, std::string, std::less<>>& childAccountIDToParentAccountID() const {
+    return childAccountIDToParentAccountID_;
+  }
+
+ private:
+  using AccountsByID = std::map<std::string, AccountPtr, std::less<>>;
+
+  void _loadAccount(const propertylist::Value& info, bool& fixedAny);
+  void _register(const AccountPtr& account);
+  void _registerChild(const std::string& identifier, const AccountPtr& child,
+                      const std::string& parentIdentifier);
+  void _forgetChild(const std::string& identifier);
+  bool _everyChildHasItsParent(const StringList& types, const AccountArray& accounts) const;
+  void _placeChild(const AccountPtr& child, const AccountsByID& placed);
+  bool _fixAccountsBeforeSaving();
+  propertylist::Array _mergedAccounts(const ASSAccountsManager& onDisk) const;
+
+  // Every account in the order of the file, as it was registered; an account placed by
+  // replaceAccountWithAccount is listed here and not registered by its identifier.
+  AccountsByID topLevelAccountsByID_;
+  std::shared_ptr<AccountArray> orderedTopLevelAccounts_;
+  AccountsByID childAccountsByID_;
+  std::map<std::string, std::string, std::less<>> childAccountIDToParentAccountID_;
+  // The same map the other way round, so that one parent's children are found without a walk over
+  // all.
+  std::unordered_map<std::string, std::set<std::string>> childIDsByParentID_;
+  std::map<std::string, propertylist::Dictionary, std::less<>> originalAccountsByID_;
+  std::int64_t dataVersion_ = 0;
+  std::vector<RuntimeFixerPtr> runtimeFixers_;
+  // The file exists and could not be read as a dictionary when this store read it.
+  bool settingsFileIsUnreadable_ = false;
+};
+
+// The path of the settings file, for callers outside the store.
+std::string accountSettingsAccountsPath();
+
+}  // namespace accountsettings

@@ -1,0 +1,168 @@
+// How a store is made from the settings file.
+
+#include "QuillnetAccountTypeRemoval/ASSAccountsManager.h"
+#include "QuillnetAccountTypeRemoval/PropertyNumbers.h"
+#include "platform/Services.h"
+
+namespace accountsettings {
+
+using propertylist::Array;
+using propertylist::Dictionary;
+using propertylist::Value;
+
+namespace {
+
+class MadeStore final : public ASSAccountsManager {};
+
+constexpr const char* kInitWithAccountsInfo = "-[ASSAccountsManager _initWithAccountsInfo:]";
+
+AccountPtr accountFromInfo(const Dictionary& info) {
+  const std::string* type = propertylist::findString(info, kAccountType);
+  if (type != nullptr && *type == kOnMyDeviceAccountType)
+    return ASSDeviceLocalAccount::initWithProperties(info);
+  return ASSBasicAccount::initWithProperties(info);
+}
+
+}  // namespace
+
+ASSAccountsManager::ASSAccountsManager()
+    : orderedTopLevelAccounts_(std::make_shared<AccountArray>()) {}
+
+AccountsManagerPtr ASSAccountsManager::init() { return initInsideOfMigration(); }
+
+AccountsManagerPtr ASSAccountsManager::initInsideOfMigration() {
+  const auto store = std::make_shared<MadeStore>();
+  static_cast<ASSAccountsManager&>(*store)._initFromSettingsFile();
+  return store;
+}
+
+AccountsManagerPtr ASSAccountsManager::initWithAccounsInfoArray(
+    const std::optional<Array>& accounts) {
+  const auto store = std::make_shared<MadeStore>();
+  static_cast<ASSAccountsManager&>(*store)._initWithAccountsInfo(accounts);
+  return store;
+}
+
+std::string ASSAccountsManager::fullPathToAccountSettingsPlist() {
+  return platform::joinedPath(platform::services().deviceInfo.systemRootDirectory(),
+                              platform::formatLogLine("/var/mobile/Library/Preferences/%@",
+                                                      {"com.vantor.accountsettings.plist"}));
+}
+
+std::string accountSettingsAccountsPath() {
+  return ASSAccountsManager::fullPathToAccountSettingsPlist();
+}
+
+void ASSAccountsManager::_initFromSettingsFile() {
+  const propertylist::FileReadResult read =
+      platform::services().fileServices.readPropertyListFile(fullPathToAccountSettingsPlist());
+  const Dictionary* root = read.value ? read.value->asDictionary() : nullptr;
+  settingsFileIsUnreadable_ = read.exists && root == nullptr;
+  const Array* accounts = root != nullptr ? propertylist::findArray(*root, "Accounts") : nullptr;
+  _initWithAccountsInfo(accounts != nullptr ? std::optional(*accounts) : std::nullopt);
+  if (root != nullptr) dataVersion_ = integerValue(root->find("Version"));
+}
+
+std::vector<RuntimeFixerPtr> ASSAccountsManager::_createRuntimeFixers() {
+  return {ASSRuntimeFixMailAccount::init()};
+}
+
+void ASSAccountsManager::_initWithAccountsInfo(const std::optional<Array>& accounts) {
+  runtimeFixers_ = _createRuntimeFixers();
+  if (accounts) {
+    bool fixedAny = false;
+    for (const Value& info : *accounts) _loadAccount(info, fixedAny);
+    if (fixedAny) {
+      for (const RuntimeFixerPtr& fixer : runtimeFixers_) fixer->accountsHaveBeenSaved(false);
+    }
+  }
+  _setOriginalAccountDictionaries();
+}
+
+void ASSAccountsManager::_loadAccount(const Value& info, bool& fixedAny) {
+  const Dictionary* properties = info.asDictionary();
+  const AccountPtr account = properties != nullptr ? accountFromInfo(*properties) : nullptr;
+  if (!account) {
+    platform::logToSystem("[%s] ERROR: Failed to create a ASSBasicAccount from %@",
+                          kInitWithAccountsInfo, info);
+    return;
+  }
+  // An account is registered once for every fixer that keeps it. With the one fixer of a store that
+  // is once or, when the fixer drops it, never.
+  for (const RuntimeFixerPtr& fixer : runtimeFixers_) {
+    const FixVerdict verdict =
+        fixer->fixBasicAccountIfNeededLoggingMessage(account, "loading accounts");
+    if (verdict != FixVerdict::nothingToDo) fixedAny = true;
+    if (verdict != FixVerdict::couldNotFix) _register(account);
+  }
+}
+
+void ASSAccountsManager::_register(const AccountPtr& account) {
+  if (const std::optional<std::string> identifier = account->identifier())
+    topLevelAccountsByID_[*identifier] = account;
+  orderedTopLevelAccounts_->push_back(account);
+  _loadChildrenFromAccount(account);
+}
+
+void ASSAccountsManager::_loadChildrenFromAccount(const AccountPtr& parent) {
+  const std::optional<std::string> parentIdentifier = parent->identifier();
+  _removeChildrenForAccountWithIdentifier(parentIdentifier);
+  const Value* children = parent->accountPropertyForKey(kAccountChildAccounts);
+  if (children == nullptr || children->asArray() == nullptr) return;
+  for (const Value& info : *children->asArray()) {
+    const Dictionary* properties = info.asDictionary();
+    const AccountPtr child =
+        properties != nullptr ? ASSBasicAccount::initWithProperties(*properties) : nullptr;
+    // A record made from a dictionary without an identifier has a fresh one, which nobody stores:
+    // the child could never be found or removed by it.
+    const std::string* identifier =
+        properties != nullptr ? propertylist::findString(*properties, kAccountIdentifier) : nullptr;
+    if (!child || identifier == nullptr || !parentIdentifier) {
+      platform::logToSystem("Ignoring unknown child account with properties %@", info);
+      continue;
+    }
+    child->setParentAccount(parent);
+    _registerChild(*identifier, child, *parentIdentifier);
+  }
+}
+
+void ASSAccountsManager::_registerChild(const std::string& identifier, const AccountPtr& child,
+                                        const std::string& parentIdentifier) {
+  _forgetChild(identifier);
+  childAccountsByID_[identifier] = child;
+  childAccountIDToParentAccountID_[identifier] = parentIdentifier;
+  childIDsByParentID_[parentIdentifier].insert(identifier);
+}
+
+void ASSAccountsManager::_forgetChild(const std::string& identifier) {
+  const auto entry = childAccountIDToParentAccountID_.find(identifier);
+  if (entry == childAccountIDToParentAccountID_.end()) return;
+  childIDsByParentID_[entry->second].erase(identifier);
+  childAccountIDToParentAccountID_.erase(entry);
+  childAccountsByID_.erase(identifier);
+}
+
+void ASSAccountsManager::_removeChildrenForAccountWithIdentifier(
+    const std::optional<std::string>& identifier) {
+  if (!identifier) return;
+  const auto children = childIDsByParentID_.find(*identifier);
+  if (children == childIDsByParentID_.end()) return;
+  for (const std::string& child : children->second) {
+    childAccountIDToParentAccountID_.erase(child);
+    childAccountsByID_.erase(child);
+  }
+  childIDsByParentID_.erase(children);
+}
+
+void ASSAccountsManager::_setOriginalAccountDictionaries() {
+  originalAccountsByID_.clear();
+  for (const AccountPtr& account : *orderedTopLevelAccounts_) {
+    if (const std::optional<std::string> identifier = account->identifier())
+      originalAccountsByID_[*identifier] = account->propertiesToSave();
+    else
+      platform::logToSystem("%@ returned a nil identifier. Account properties may not get saved",
+                            account);
+  }
+}
+
+}  // namespace accountsettings

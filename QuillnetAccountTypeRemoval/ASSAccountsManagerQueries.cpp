@@ -1,0 +1,74 @@
+// Finding and listing accounts.
+
+#include "QuillnetAccountTypeRemoval/ASSAccountsManager.h"
+#include "platform/Services.h"
+
+namespace accountsettings {
+namespace {
+
+template <typename Accounts>
+AccountPtr firstWithSyncIdentifier(const Accounts& accountsByID, std::string_view syncIdentifier) {
+  for (const auto& [identifier, account] : accountsByID) {
+    if (account->syncStoreIdentifier() == syncIdentifier) return account;
+  }
+  return nullptr;
+}
+
+}  // namespace
+
+AccountPtr ASSAccountsManager::accountWithIdentifier(std::string_view identifier) const {
+  if (const auto found = topLevelAccountsByID_.find(identifier);
+      found != topLevelAccountsByID_.end())
+    return found->second;
+  const auto parent = childAccountIDToParentAccountID_.find(identifier);
+  if (parent == childAccountIDToParentAccountID_.end()) return nullptr;
+  const auto found = topLevelAccountsByID_.find(parent->second);
+  return found != topLevelAccountsByID_.end() ? found->second : nullptr;
+}
+
+AccountPtr ASSAccountsManager::syncableAccountWithSyncIdentifier(
+    std::string_view syncIdentifier) const {
+  if (AccountPtr account = firstWithSyncIdentifier(topLevelAccountsByID_, syncIdentifier))
+    return account;
+  return firstWithSyncIdentifier(childAccountsByID_, syncIdentifier);
+}
+
+AccountPtr ASSAccountsManager::displayAccountWithSyncIdentifier(
+    std::string_view syncIdentifier) const {
+  const AccountPtr account = syncableAccountWithSyncIdentifier(syncIdentifier);
+  const std::optional<std::string> identifier = account ? account->identifier() : std::nullopt;
+  return identifier ? accountWithIdentifier(*identifier) : nullptr;
+}
+
+AccountArray ASSAccountsManager::allBasicSyncableAccounts() const {
+  AccountArray accounts = *orderedTopLevelAccounts_;
+  accounts.reserve(accounts.size() + childAccountsByID_.size());
+  for (const auto& [identifier, child] : childAccountsByID_) accounts.push_back(child);
+  return accounts;
+}
+
+AccountArray ASSAccountsManager::basicAccountsWithTypes(const StringList& types) const {
+  AccountArray accounts;
+  for (const AccountPtr& account : *orderedTopLevelAccounts_) {
+    if (isOfOneType(*account, types)) accounts.push_back(account);
+  }
+  return accounts;
+}
+
+std::size_t ASSAccountsManager::countOfBasicAccountsWithTypes(const StringList& types) const {
+  return basicAccountsWithTypes(types).size();
+}
+
+DeviceLocalAccountPtr ASSAccountsManager::fullDeviceLocalAccount() {
+  for (const AccountPtr& account : *orderedTopLevelAccounts_) {
+    if (account->type() != kOnMyDeviceAccountType) continue;
+    if (auto local = std::dynamic_pointer_cast<ASSDeviceLocalAccount>(account)) return local;
+  }
+  platform::logToSystem("DeviceLocalAccount missing. Creating...");
+  const DeviceLocalAccountPtr created =
+      ASSDeviceLocalAccount::initWithProperties(ASSDeviceLocalAccount::basicAccountProperties());
+  replaceAccountsWithTypesWithAccounts({std::string(kOnMyDeviceAccountType)}, {created});
+  return created;
+}
+
+}  // namespace accountsettings

@@ -1,0 +1,114 @@
+// Writing the accounts back, merged with what the file holds by now.
+
+#include "QuillnetAccountTypeRemoval/ASLog.h"
+#include "QuillnetAccountTypeRemoval/ASSAccountsManager.h"
+#include "QuillnetAccountTypeRemoval/SettingsFileWriting.h"
+#include "platform/SystemLog.h"
+
+namespace accountsettings {
+
+using propertylist::Array;
+using propertylist::Dictionary;
+using propertylist::Value;
+
+namespace {
+
+std::optional<Array> arrayOfStrings(const std::optional<StringList>& strings) {
+  return strings ? std::optional(accountsettings::arrayOfStrings(*strings)) : std::nullopt;
+}
+
+// Walks both dictionaries once instead of changing a copy key by key, so that the merge of accounts
+// with very many keys stays linear.
+Dictionary merged(const Dictionary& inMemory, const Dictionary& original,
+                  const Dictionary& onDisk) {
+  std::vector<Dictionary::Entry> entries;
+  entries.reserve(onDisk.size() + inMemory.size());
+  for (const Dictionary::Entry& disk : onDisk) {
+    const Value* before = original.find(disk.key());
+    const Value* now = inMemory.find(disk.key());
+    if (now == nullptr && before != nullptr) continue;  // deleted in memory
+    const bool changedInMemory = now != nullptr && (before == nullptr || *before != *now);
+    entries.push_back(changedInMemory ? Dictionary::Entry(disk.key(), *now) : disk);
+  }
+  for (const Dictionary::Entry& now : inMemory) {
+    if (onDisk.contains(now.key())) continue;
+    const Value* before = original.find(now.key());
+    const bool deletedOnDisk = before != nullptr && *before == now.value();
+    if (!deletedOnDisk) entries.push_back(now);
+  }
+  return Dictionary(std::move(entries));
+}
+
+}  // namespace
+
+Dictionary ASSAccountsManager::mergeInMemoryPropertiesOriginalPropertiesOnDiskProperties(
+    const Dictionary& inMemory, const std::optional<Dictionary>& original,
+    const std::optional<Dictionary>& onDisk) const {
+  ASLog("Merging inmem %@ orig %@ onDisk %@", inMemory, original, onDisk);
+  const bool nothingToMerge = !original || original->empty() || !onDisk || onDisk->empty();
+  const Dictionary result = nothingToMerge ? inMemory : merged(inMemory, *original, *onDisk);
+  ASLog("merged to %@", result);
+  return result;
+}
+
+bool ASSAccountsManager::_fixAccountsBeforeSaving() {
+  bool fixedAny = false;
+  const AccountArray& accounts = *orderedTopLevelAccounts_;
+  for (auto it = accounts.rbegin(); it != accounts.rend(); ++it) {
+    for (const RuntimeFixerPtr& fixer : runtimeFixers_) {
+      const FixVerdict verdict =
+          fixer->fixBasicAccountIfNeededLoggingMessage(*it, "saving accounts");
+      if (verdict != FixVerdict::nothingToDo) fixedAny = true;
+      if (verdict != FixVerdict::couldNotFix) continue;
+      // The account stays listed, so this save still writes it; the next load drops it.
+      const std::optional<std::string> identifier = (*it)->identifier();
+      _removeChildrenForAccountWithIdentifier(identifier);
+      if (identifier) topLevelAccountsByID_.erase(*identifier);
+    }
+  }
+  return fixedAny;
+}
+
+Array ASSAccountsManager::_mergedAccounts(const ASSAccountsManager& onDisk) const {
+  std::vector<Value> accounts;
+  accounts.reserve(orderedTopLevelAccounts_->size());
+  for (const AccountPtr& account : *orderedTopLevelAccounts_) {
+    const std::optional<std::string> identifier = account->identifier();
+    const AccountPtr stored = identifier ? onDisk.accountWithIdentifier(*identifier) : nullptr;
+    const Dictionary result = mergeInMemoryPropertiesOriginalPropertiesOnDiskProperties(
+        account->propertiesToSave(), account->originalProperties(),
+        stored ? std::optional(stored->propertiesToSave()) : std::nullopt);
+    // The list is computed whether or not tracing is on, and never printed.
+    const std::optional<Array> enabled = arrayOfStrings(account->enabledDataclasses());
+    ASLog("%@:%@", account->type(), result, enabled);
+    accounts.emplace_back(result);
+  }
+  return Array(std::move(accounts));
+}
+
+void ASSAccountsManager::saveAllAccounts() {
+  ASLog("Saving all accounts");
+  const bool fixedAny = _fixAccountsBeforeSaving();
+  bool saved = false;
+  {
+    // What another process wrote since this store was loaded.
+    const AccountsManagerPtr onDisk = initInsideOfMigration();
+    const Dictionary root{{"Accounts", _mergedAccounts(*onDisk)}, {"Version", currentVersion()}};
+    saved = writeSettingsFile(root, fullPathToAccountSettingsPlist(),
+                              onDisk->settingsFileIsUnreadable_);
+  }
+  if (saved) {
+    // From here on, what is in memory counts as known to the file, also where the file kept values
+    // of its own: they stay on disk and are not taken into memory.
+    for (const AccountPtr& account : *orderedTopLevelAccounts_)
+      account->setOriginalProperties(account->propertiesToSave());
+  } else {
+    platform::logToSystem(
+        "Failed to save accounts to filesystem. Maybe the information did not conform to a plist.");
+  }
+  if (fixedAny) {
+    for (const RuntimeFixerPtr& fixer : runtimeFixers_) fixer->accountsHaveBeenSaved(true);
+  }
+}
+
+}  // namespace accountsettings
