@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 #include <optional>
 #include <span>
 #include <string>
@@ -11,9 +12,9 @@
 namespace propertylist {
 
 // What the readers refuse, so that no input costs more than its size allows.
-inline constexpr std::size_t kMaximumDepth = 512;                          // nested containers
-inline constexpr std::size_t kMinimumValueLimit = 1'000'000;               // see readPropertyList
-inline constexpr std::size_t kMaximumFileSize = std::size_t{256} << 20U;   // bytes
+inline constexpr std::size_t kMaximumDepth = 512;                         // nested containers
+inline constexpr std::size_t kMinimumValueLimit = 1'000'000;              // see readPropertyList
+inline constexpr std::size_t kMaximumFileSize = std::size_t{256} << 20U;  // bytes, in a file or not
 
 // Why bytes are no property list, and where.
 struct PROPERTYLIST_EXPORT ReadError {
@@ -34,15 +35,15 @@ struct PROPERTYLIST_EXPORT ReadResult {
 // Reads a property list of either form; the first bytes tell which. Any bytes may come: a result is
 // always given, nothing is thrown (but std::bad_alloc), the stack used is bounded, and time and
 // memory stay proportional to the input. A list is refused when it is nested deeper than
-// kMaximumDepth, or when it would have more values than the larger of kMinimumValueLimit and its size
-// in bytes once everything that the binary form shares is written out.
+// kMaximumDepth, or when it would have more values than the larger of kMinimumValueLimit and its
+// size in bytes once everything that the binary form shares is written out.
 PROPERTYLIST_EXPORT ReadResult readPropertyList(std::span<const std::uint8_t> bytes);
 PROPERTYLIST_EXPORT ReadResult readBinaryPropertyList(std::span<const std::uint8_t> bytes);
 PROPERTYLIST_EXPORT ReadResult readXMLPropertyList(std::span<const std::uint8_t> bytes);
 
-// Reads the file at `path` in one go. A link as the last part of the path is not followed, a file that
-// is not regular is not opened for waiting, and one above kMaximumFileSize is refused: each is an
-// error like unreadable content.
+// Reads the file at `path` in one go. A link as the last part of the path is not followed, a file
+// that is not regular is not opened for waiting, and one above kMaximumFileSize is refused: each is
+// an error like unreadable content.
 struct PROPERTYLIST_EXPORT FileReadResult {
   std::optional<Value> value;
   bool exists = false;  // false when there is nothing at `path`; `error` then says so too

@@ -19,6 +19,7 @@
 
 namespace propertylist {
 
+class BinaryReader;
 class Value;
 
 // The eight kinds of value that a property list holds.
@@ -113,7 +114,11 @@ class PROPERTYLIST_EXPORT Dictionary {
 
  private:
   friend class Value;
+  friend class BinaryReader;
   struct Storage;
+  // Takes entries that are in ascending order of their keys already, each key once.
+  static Dictionary _fromAscending(std::vector<Entry> entries);
+  const Entry* _lowerBound(std::string_view key) const;
   std::vector<Entry>& _mutable();
   std::shared_ptr<Storage> _storage;  // null for the empty dictionary
 };
@@ -122,30 +127,29 @@ class PROPERTYLIST_EXPORT Dictionary {
 // unsigned), real, boolean, date or data. There is no null value: absence is an empty optional or a
 // null pointer.
 //
-// Copies share their storage, so a deep copy costs a reference count. Equality is deep and strict by
-// kind: integer 1, real 1.0 and boolean true differ from one another; reals compare bit by bit. A
-// signed and an unsigned integer of equal value are equal.
+// Copies share their storage, so a deep copy costs a reference count. Equality is deep and strict
+// by kind: integer 1, real 1.0 and boolean true differ from one another; reals compare bit by bit.
+// A signed and an unsigned integer of equal value are equal.
 //
 // However deep a value is nested, copying, comparing and destroying it use a bounded stack.
 class PROPERTYLIST_EXPORT Value {
  public:
-  Value(Dictionary dictionary);       // NOLINT(google-explicit-constructor): literals read as values
-  Value(Array array);                 // NOLINT(google-explicit-constructor)
-  Value(std::string string);          // NOLINT(google-explicit-constructor)
-  Value(std::string_view string);     // NOLINT(google-explicit-constructor)
-  Value(const char* string);          // NOLINT(google-explicit-constructor)
-  // A string that shares `string` with other values.
+  Value(Dictionary dictionary);    // NOLINT(google-explicit-constructor): literals read as values
+  Value(Array array);              // NOLINT(google-explicit-constructor)
+  Value(std::string string);       // NOLINT(google-explicit-constructor)
+  Value(std::string_view string);  // NOLINT(google-explicit-constructor)
+  Value(const char* string);       // NOLINT(google-explicit-constructor)
+  // A string that shares `string`, which is not null, with other values.
   explicit Value(std::shared_ptr<const std::string> string);
-  Value(Date date);                   // NOLINT(google-explicit-constructor)
-  Value(Bytes data);                  // NOLINT(google-explicit-constructor)
+  Value(Date date);   // NOLINT(google-explicit-constructor)
+  Value(Bytes data);  // NOLINT(google-explicit-constructor)
   template <typename T>
-    requires std::same_as<T, bool>
-  Value(T boolean);                   // NOLINT(google-explicit-constructor)
+  requires std::same_as<T, bool> Value(T boolean);  // NOLINT(google-explicit-constructor)
   template <typename T>
-    requires(std::integral<T> && !std::same_as<T, bool> && !std::same_as<T, char>)
-  Value(T integer);                   // NOLINT(google-explicit-constructor)
+  requires(std::integral<T> && !std::same_as<T, bool> && !std::same_as<T, char>)
+      Value(T integer);  // NOLINT(google-explicit-constructor)
   template <std::floating_point T>
-  Value(T real);                      // NOLINT(google-explicit-constructor)
+  Value(T real);  // NOLINT(google-explicit-constructor)
 
   Value(const Value&);
   Value(Value&&) noexcept;
@@ -176,13 +180,14 @@ class PROPERTYLIST_EXPORT Value {
  private:
   friend class Array;
   friend class Dictionary;
+  class Comparison;
   struct Integer {
     std::uint64_t bits = 0;
     bool negative = false;
     friend bool operator==(Integer, Integer) = default;
   };
-  using Content = std::variant<Dictionary, Array, std::shared_ptr<const std::string>, Integer, double,
-                               bool, Date, std::shared_ptr<const Bytes>>;
+  using Content = std::variant<Dictionary, Array, std::shared_ptr<const std::string>, Integer,
+                               double, bool, Date, std::shared_ptr<const Bytes>>;
   Content _content;
 };
 
@@ -202,22 +207,25 @@ class PROPERTYLIST_EXPORT Dictionary::Entry {
 };
 
 template <typename T>
-  requires std::same_as<T, bool>
-Value::Value(T boolean) : _content(std::in_place_type<bool>, boolean) {}
+requires std::same_as<T, bool> Value::Value(T boolean)
+    : _content(std::in_place_type<bool>, boolean) {}
 
 template <typename T>
-  requires(std::integral<T> && !std::same_as<T, bool> && !std::same_as<T, char>)
-Value::Value(T integer)
+requires(std::integral<T> && !std::same_as<T, bool> &&
+         !std::same_as<T, char>) Value::Value(T integer)
     : _content(Integer{static_cast<std::uint64_t>(integer), std::cmp_less(integer, 0)}) {}
 
 template <std::floating_point T>
 Value::Value(T real) : _content(std::in_place_type<double>, static_cast<double>(real)) {}
 
-// The value under `key` when it is of the named kind, else null or empty: one step for the usual two.
-PROPERTYLIST_EXPORT const std::string* findString(const Dictionary& dictionary, std::string_view key);
+// The value under `key` when it is of the named kind, else null or empty: one step for the usual
+// two.
+PROPERTYLIST_EXPORT const std::string* findString(const Dictionary& dictionary,
+                                                  std::string_view key);
 PROPERTYLIST_EXPORT const Array* findArray(const Dictionary& dictionary, std::string_view key);
 PROPERTYLIST_EXPORT const Dictionary* findDictionary(const Dictionary& dictionary,
                                                      std::string_view key);
-PROPERTYLIST_EXPORT std::optional<bool> findBoolean(const Dictionary& dictionary, std::string_view key);
+PROPERTYLIST_EXPORT std::optional<bool> findBoolean(const Dictionary& dictionary,
+                                                    std::string_view key);
 
 }  // namespace propertylist

@@ -1,0 +1,26 @@
+#pragma once
+
+#include <cstddef>
+#include <optional>
+#include <string>
+#include <string_view>
+
+// UTF-8 as property lists have it: shortest forms only, no surrogates, nothing above U+10FFFF.
+namespace propertylist {
+
+// The code point that begins at `position`, which is moved behind it. Empty when there is none,
+// with `position` at the first byte that is wrong. `position` is less than the size of `text`.
+std::optional<char32_t> decodeUTF8(std::string_view text, std::size_t& position);
+
+// Where `text` stops being UTF-8; empty when it never does.
+std::optional<std::size_t> findInvalidUTF8(std::string_view text);
+
+// `codePoint` is one that UTF-8 can hold.
+void appendUTF8(std::string& text, char32_t codePoint);
+
+// Whether `codePoint` is a number that UTF-8 can hold.
+constexpr bool isScalarValue(char32_t codePoint) {
+  return codePoint < 0xD800 || (codePoint > 0xDFFF && codePoint <= 0x10FFFF);
+}
+
+}  // namespace propertylist

@@ -1,0 +1,307 @@
+#include "propertylist/XMLScanner.h"
+
+#include <algorithm>
+#include <unordered_set>
+
+#include "propertylist/UTF8.h"
+
+namespace propertylist {
+namespace {
+
+constexpr std::string_view kByteOrderMark = "\xEF\xBB\xBF";
+constexpr std::string_view kBlanks = " \t\r\n";
+
+bool isBlank(char c) { return kBlanks.find(c) != std::string_view::npos; }
+
+bool startsName(char c) {
+  const auto byte = static_cast<unsigned char>(c);
+  return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || c == '_' || c == ':' || byte >= 0x80;
+}
+
+bool continuesName(char c) {
+  return startsName(c) || (c >= '0' && c <= '9') || c == '-' || c == '.';
+}
+
+std::string lowerCase(std::string_view text) {
+  std::string result(text);
+  for (char& c : result) {
+    if (c >= 'A' && c <= 'Z') c = static_cast<char>(c - 'A' + 'a');
+  }
+  return result;
+}
+
+// Line ends of any kind become line feeds.
+void appendLines(std::string& text, std::string_view raw) {
+  for (std::size_t i = 0; i < raw.size(); ++i) {
+    if (raw[i] != '\r') {
+      text += raw[i];
+    } else if (i + 1 == raw.size() || raw[i + 1] != '\n') {
+      text += '\n';
+    }
+  }
+}
+
+}  // namespace
+
+bool isXMLCharacter(char32_t codePoint) {
+  if (codePoint < 0x20) return codePoint == '\t' || codePoint == '\n' || codePoint == '\r';
+  return isScalarValue(codePoint) && codePoint != 0xFFFE && codePoint != 0xFFFF;
+}
+
+bool XMLScanner::readProlog() {
+  if (!_checkCharacters()) return false;
+  _accept(kByteOrderMark);
+  if (_isAt("<?xml") && _text.size() > _at + 5 && isBlank(_text[_at + 5]) && !_readDeclaration()) {
+    return false;
+  }
+  if (!skipBlanks()) return false;
+  if (_accept("<!DOCTYPE") && !(_readDocumentType() && skipBlanks())) return false;
+  return true;
+}
+
+bool XMLScanner::_checkCharacters() {
+  for (std::size_t position = 0; position < _text.size();) {
+    const std::size_t at = position;
+    const std::optional<char32_t> codePoint = decodeUTF8(_text, position);
+    if (!codePoint) return _failAt(at, "not UTF-8");
+    if (!isXMLCharacter(*codePoint)) return _failAt(at, "a character that XML does not allow");
+  }
+  return true;
+}
+
+bool XMLScanner::_readDeclaration() {
+  _accept("<?xml");
+  std::string encoding = "utf-8";
+  if (!_readAttributes("?>", &encoding)) return false;
+  encoding = lowerCase(encoding);
+  return encoding == "utf-8" || encoding == "us-ascii" || fail("an encoding other than UTF-8");
+}
+
+// Reads the names of a document type, which nobody opens.
+bool XMLScanner::_readDocumentType() {
+  if (!_readBlanks() || _readName().empty()) return fail("a document type without a name");
+  bool isSeparate = _readBlanks();
+  const std::size_t literals = _accept("PUBLIC") ? 2 : _accept("SYSTEM") ? 1 : 0;
+  if (literals > 0 && !isSeparate) return fail("a document type that is not well formed");
+  for (std::size_t i = 0; i < literals; ++i) {
+    if (!_readBlanks() || !_readLiteral()) return fail("a document type that is not well formed");
+  }
+  _readBlanks();
+  if (_isAt("[")) return fail("a document type with declarations of its own");
+  return _accept(">") || fail("a document type that is not well formed");
+}
+
+bool XMLScanner::skipBlanks() {
+  while (true) {
+    _readBlanks();
+    if (_isAt("<!--")) {
+      if (!_skipComment()) return false;
+    } else if (_isAt("<?")) {
+      if (!_skipInstruction()) return false;
+    } else {
+      return true;
+    }
+  }
+}
+
+bool XMLScanner::_skipComment() {
+  const std::size_t end = _text.find("--", _at + 4);
+  if (end == std::string_view::npos) return fail("a comment without an end");
+  if (!_text.substr(end).starts_with("-->")) return _failAt(end, "two hyphens in a comment");
+  _at = end + 3;
+  return true;
+}
+
+bool XMLScanner::_skipInstruction() {
+  const std::size_t end = _text.find("?>", _at + 2);
+  if (end == std::string_view::npos) return fail("a processing instruction without an end");
+  const std::size_t start = _at;
+  _at += 2;
+  const std::string_view target = _readName();
+  const bool isSeparate = _at == end || (_at < end && isBlank(_text[_at]));
+  if (target.empty() || !isSeparate || lowerCase(target) == "xml") {
+    return _failAt(start, "a processing instruction that is not well formed");
+  }
+  _at = end + 2;
+  return true;
+}
+
+std::optional<XMLScanner::Tag> XMLScanner::readTag() {
+  Tag tag;
+  tag.at = _at;
+  if (!_accept("<")) {
+    fail(isAtEnd() ? "the end of the document is missing" : "text outside of a value");
+    return std::nullopt;
+  }
+  tag.isEnd = _accept("/");
+  tag.name = _readName();
+  if (tag.name.empty()) {
+    fail(tag, "markup that is no tag");
+    return std::nullopt;
+  }
+  if (tag.isEnd) {
+    _readBlanks();
+    if (_accept(">")) return tag;
+    fail(tag, "an end tag that is not well formed");
+    return std::nullopt;
+  }
+  if (!_readAttributes(">", nullptr)) return std::nullopt;
+  tag.isEmpty = _text[_at - 2] == '/';
+  return tag;
+}
+
+// Reads attributes up to and with `end`, or "/>" for a tag's.
+bool XMLScanner::_readAttributes(std::string_view end, std::string* encoding) {
+  std::unordered_set<std::string_view> names;
+  while (true) {
+    const bool isSeparate = _readBlanks();
+    if (_accept(end) || (end == ">" && _accept("/>"))) return true;
+    if (isAtEnd()) return fail("a tag without an end");
+    std::string_view name;
+    std::string value;
+    if (!isSeparate || !_readAttribute(name, value)) return fail("a tag that is not well formed");
+    if (!names.insert(name).second) return fail("an attribute that comes twice");
+    if (encoding != nullptr && name == "encoding") *encoding = value;
+  }
+}
+
+bool XMLScanner::_readAttribute(std::string_view& name, std::string& value) {
+  name = _readName();
+  _readBlanks();
+  if (name.empty() || !_accept("=")) return false;
+  _readBlanks();
+  if (!_isAt("\"") && !_isAt("'")) return false;
+  const char quote = _text[_at++];
+  while (!isAtEnd() && _text[_at] != quote) {
+    if (_isAt("<")) return false;
+    if (_isAt("&")) {
+      if (!_readReference(value)) return false;
+    } else {
+      value += _text[_at++];
+    }
+  }
+  return !isAtEnd() && _accept(std::string_view(&quote, 1));
+}
+
+bool XMLScanner::readText(std::string& text) {
+  while (!isAtEnd()) {
+    const std::size_t end = std::min(_text.find_first_of("<&", _at), _text.size());
+    const std::string_view raw = _text.substr(_at, end - _at);
+    const std::size_t sectionEnd = raw.find("]]>");
+    if (sectionEnd != std::string_view::npos) {
+      return _failAt(_at + sectionEnd, "the end of a section that has no beginning");
+    }
+    appendLines(text, raw);
+    _at = end;
+    bool isGood = true;
+    if (_isAt("&")) {
+      isGood = _readReference(text);
+    } else if (_isAt("<!--")) {
+      isGood = _skipComment();
+    } else if (_isAt("<?")) {
+      isGood = _skipInstruction();
+    } else if (_isAt("<![CDATA[")) {
+      isGood = _readSection(text);
+    } else {
+      return true;
+    }
+    if (!isGood) return false;
+  }
+  return true;
+}
+
+bool XMLScanner::_readSection(std::string& text) {
+  constexpr std::size_t kStartSize = std::string_view("<![CDATA[").size();
+  const std::size_t end = _text.find("]]>", _at + kStartSize);
+  if (end == std::string_view::npos) return fail("a section without an end");
+  appendLines(text, _text.substr(_at + kStartSize, end - _at - kStartSize));
+  _at = end + 3;
+  return true;
+}
+
+bool XMLScanner::_readReference(std::string& text) {
+  constexpr std::size_t kLongest = 64;  // leading zeros may make a character reference long
+  const std::size_t end = _text.substr(_at, kLongest).find(';');
+  if (end == std::string_view::npos) return fail("a reference without an end");
+  const std::string_view name = _text.substr(_at + 1, end - 1);
+  if (name.starts_with('#')) {
+    if (!_readCharacterReference(name.substr(1), text)) return false;
+  } else if (name == "amp") {
+    text += '&';
+  } else if (name == "lt") {
+    text += '<';
+  } else if (name == "gt") {
+    text += '>';
+  } else if (name == "quot") {
+    text += '"';
+  } else if (name == "apos") {
+    text += '\'';
+  } else {
+    return fail("an entity that is not predefined");
+  }
+  _at += end + 1;
+  return true;
+}
+
+bool XMLScanner::_readCharacterReference(std::string_view digits, std::string& text) {
+  const bool isHexadecimal = digits.starts_with('x');
+  if (isHexadecimal) digits.remove_prefix(1);
+  const char32_t base = isHexadecimal ? 16 : 10;
+  char32_t codePoint = 0;
+  for (const char c : digits) {
+    char32_t digit = base;
+    if (c >= '0' && c <= '9') digit = static_cast<char32_t>(c - '0');
+    if (c >= 'a' && c <= 'f') digit = static_cast<char32_t>(c - 'a' + 10);
+    if (c >= 'A' && c <= 'F') digit = static_cast<char32_t>(c - 'A' + 10);
+    if (digit >= base) return fail("a character reference that is no number");
+    codePoint = std::min<char32_t>(codePoint * base + digit, 0x110000);  // nothing wraps
+  }
+  if (digits.empty() || !isXMLCharacter(codePoint)) {
+    return fail("a reference to a character that XML does not allow");
+  }
+  appendUTF8(text, codePoint);
+  return true;
+}
+
+std::string_view XMLScanner::_readName() {
+  const std::size_t start = _at;
+  if (!isAtEnd() && startsName(_text[_at])) {
+    while (!isAtEnd() && continuesName(_text[_at])) ++_at;
+  }
+  return _text.substr(start, _at - start);
+}
+
+std::optional<std::string_view> XMLScanner::_readLiteral() {
+  if (!_isAt("\"") && !_isAt("'")) return std::nullopt;
+  const std::size_t end = _text.find(_text[_at], _at + 1);
+  if (end == std::string_view::npos) return std::nullopt;
+  const std::string_view literal = _text.substr(_at + 1, end - _at - 1);
+  _at = end + 1;
+  return literal;
+}
+
+// Whether there were blanks.
+bool XMLScanner::_readBlanks() {
+  const std::size_t start = _at;
+  _at = std::min(_text.find_first_not_of(kBlanks, _at), _text.size());
+  return _at > start;
+}
+
+bool XMLScanner::_accept(std::string_view token) {
+  if (!_isAt(token)) return false;
+  _at += token.size();
+  return true;
+}
+
+// The first failure stays.
+bool XMLScanner::_failAt(std::size_t at, std::string what) {
+  if (!_error.what.empty()) return false;
+  const std::string_view before = _text.substr(0, at);
+  const std::size_t lineStart = before.rfind('\n') + 1;  // 0 when there is none
+  _error.what = std::move(what);
+  _error.line = 1 + static_cast<std::size_t>(std::count(before.begin(), before.end(), '\n'));
+  _error.column = at - lineStart + 1;
+  return false;
+}
+
+}  // namespace propertylist
