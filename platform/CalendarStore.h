@@ -30,8 +30,8 @@ enum class CalendarEntityType { events = 2, reminders = 3 };
 class PLATFORM_EXPORT CalendarStore {
  public:
   virtual ~CalendarStore();
-  // Opens the database; empty when it cannot be opened. `options` is the platform's; the system passes
-  // 20.
+  // Opens the database; empty when it cannot be opened. `options` is the platform's; the system
+  // passes 20.
   virtual CalendarDatabasePtr openCalendarDatabase(int options) = 0;
   // All stores; empty when the list cannot be had.
   virtual std::optional<std::vector<CalendarStoreHandlePtr>> allStores(

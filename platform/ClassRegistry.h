@@ -9,9 +9,9 @@
 
 namespace platform {
 
-// A class that code bundles offer by name. What it can do is asked at run time: the class object may
-// implement further interfaces (DataClassMigratorClass, creator and notifier interfaces), and asking
-// is a dynamic_cast.
+// A class that code bundles offer by name. What it can do is asked at run time: the class object
+// may implement further interfaces (DataClassMigratorClass, creator and notifier interfaces), and
+// asking is a dynamic_cast.
 class PLATFORM_EXPORT RuntimeClass {
  public:
   virtual ~RuntimeClass();
@@ -34,15 +34,16 @@ class PLATFORM_EXPORT ClassRegistry {
   virtual ~ClassRegistry();
   // The class registered under `name`, or null. It lives until the process ends.
   virtual RuntimeClass* classNamed(std::string_view name) = 0;
-  // Loads the bundle whose folder is at `path` with all its symbols resolved; empty when that fails.
+  // Loads the bundle whose folder is at `path` with all its symbols resolved; empty when that
+  // fails.
   virtual CodeBundlePtr loadCodeBundle(const std::string& path) = 0;
   // Loads the shared object at `path` with all its symbols resolved. Empty on success, else the
   // loader's text. Loading what is loaded costs nothing.
   virtual std::optional<std::string> loadLibrary(const std::string& path) = 0;
 };
 
-// Registers `registered` for the whole process; the name must be new, else the first one stays. Code
-// bundles call it while they are loaded, so it works before any service is installed.
+// Registers `registered` for the whole process; the name must be new, else the first one stays.
+// Code bundles call it while they are loaded, so it works before any service is installed.
 PLATFORM_EXPORT void registerClass(RuntimeClass& registered);
 // The class registered under `name` in this process, or null.
 PLATFORM_EXPORT RuntimeClass* registeredClass(std::string_view name);

@@ -21,9 +21,9 @@ class PLATFORM_EXPORT ContactsSource {
 };
 using ContactsSourcePtr = std::shared_ptr<ContactsSource>;
 
-// The contacts database with its sources: the local one and one per account. A source may be disabled,
-// which hides it from the user and keeps its contacts. Arguments are objects of this service, never
-// empty. One thread at a time.
+// The contacts database with its sources: the local one and one per account. A source may be
+// disabled, which hides it from the user and keeps its contacts. Arguments are objects of this
+// service, never empty. One thread at a time.
 class PLATFORM_EXPORT ContactsStore {
  public:
   virtual ~ContactsStore();

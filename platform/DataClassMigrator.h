@@ -8,8 +8,8 @@
 
 namespace platform {
 
-// A migrator plug-in as the migration host sees it. The host makes one object, may ask for its name,
-// and calls performMigration once, all on one thread.
+// A migrator plug-in as the migration host sees it. The host makes one object, may ask for its
+// name, and calls performMigration once, all on one thread.
 class PLATFORM_EXPORT DataClassMigrator {
  public:
   virtual ~DataClassMigrator();

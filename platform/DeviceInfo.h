@@ -18,9 +18,9 @@ class PLATFORM_EXPORT DeviceInfo {
   virtual std::string systemRootDirectory() = 0;
 };
 
-// `root` with `path` below it, one "/" between the two ("/" and "/a" give "/a"). The result never leads
-// above `root`, also when `path` begins with "/": "." and ".." in `path` are resolved by their text, and
-// a ".." that would leave `root` is dropped. Links are not looked at.
+// `root` with `path` below it, one "/" between the two ("/" and "/a" give "/a"). The result never
+// leads above `root`, also when `path` begins with "/": "." and ".." in `path` are resolved by
+// their text, and a ".." that would leave `root` is dropped. Links are not looked at.
 PLATFORM_EXPORT std::string joinedPath(std::string_view root, std::string_view path);
 
 }  // namespace platform

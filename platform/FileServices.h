@@ -13,8 +13,8 @@
 
 namespace platform {
 
-// The file operations of loading and saving the settings, one system call each or nearly so, so that a
-// test can let each of them fail. A failure's code is the errno. Any thread.
+// The file operations of loading and saving the settings, one system call each or nearly so, so
+// that a test can let each of them fail. A failure's code is the errno. Any thread.
 class PLATFORM_EXPORT FileServices {
  public:
   struct Opened {
@@ -28,18 +28,19 @@ class PLATFORM_EXPORT FileServices {
   virtual propertylist::FileReadResult readPropertyListFile(const std::string& path) = 0;
   // Whether something is at `path` (links are followed).
   virtual bool fileExists(const std::string& path) = 0;
-  // A name for a temporary file in the process's default temporary directory. The name may be taken by
-  // the time it is used; empty when none can be made.
+  // A name for a temporary file in the process's default temporary directory. The name may be taken
+  // by the time it is used; empty when none can be made.
   virtual std::optional<std::string> temporaryFileName() = 0;
-  // Creates the file at `path`, readable and writable by its owner only. Fails with EEXIST when anything
-  // is there already, a link included, and follows no link.
+  // Creates the file at `path`, readable and writable by its owner only. Fails with EEXIST when
+  // anything is there already, a link included, and follows no link.
   virtual Opened createPrivateFile(const std::string& path) = 0;
   // Writes all of `bytes`, going on after a short write or an interruption.
   virtual Status writeAll(int descriptor, std::span<const std::uint8_t> bytes) = 0;
   virtual Status setOwner(int descriptor, uid_t user, gid_t group) = 0;
   // Makes the file readable and writable by its owner only.
   virtual Status makePrivate(int descriptor) = 0;
-  // Waits until the file's content is on the disk. A failure is final: calling again proves nothing.
+  // Waits until the file's content is on the disk. A failure is final: calling again proves
+  // nothing.
   virtual Status synchronizeFile(int descriptor) = 0;
   // Closes the descriptor, also when it reports a failure.
   virtual Status closeFile(int descriptor) = 0;
@@ -48,8 +49,9 @@ class PLATFORM_EXPORT FileServices {
   // Waits until the directory entry of `path` is on the disk.
   virtual Status synchronizeDirectoryOfFile(const std::string& path) = 0;
   virtual Status removeFile(const std::string& path) = 0;
-  // Keeps what is at `path` under the first free name `path` + ".unreadable-" + n (n from 1), with mode
-  // 0600, and leaves `path` as it is. Answers success without a copy when nothing is at `path`.
+  // Keeps what is at `path` under the first free name `path` + ".unreadable-" + n (n from 1), with
+  // mode 0600, and leaves `path` as it is. Answers success without a copy when nothing is at
+  // `path`.
   virtual Status setAsideUnreadableFile(const std::string& path) = 0;
 };
 

@@ -7,10 +7,10 @@
 
 namespace platform {
 
-// A broken installation or a mistake of the system's own: a missing resource, a class that cannot be
-// found, a caller that breaks an operation's terms. Never raised for what the settings file may hold.
-// It ends the operation that raised it; the plug-in catches it nowhere, the host does at the bundle's
-// border.
+// A broken installation or a mistake of the system's own: a missing resource, a class that cannot
+// be found, a caller that breaks an operation's terms. Never raised for what the settings file may
+// hold. It ends the operation that raised it; the plug-in catches it nowhere, the host does at the
+// bundle's border.
 class PLATFORM_EXPORT InternalConsistencyFailure : public std::runtime_error {
  public:
   // `sourceFile` is the bare name of the source that raised ("ASSBasicAccount"), `line` its line.

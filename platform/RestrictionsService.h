@@ -19,7 +19,8 @@ class PLATFORM_EXPORT RestrictionsService {
   static constexpr int kExplicitlyForbidden = 2;
 
   virtual ~RestrictionsService();
-  // The feature's state now: kExplicitlyForbidden when a profile forbids it; any other number allows.
+  // The feature's state now: kExplicitlyForbidden when a profile forbids it; any other number
+  // allows.
   virtual int featureRestriction(RestrictedFeature feature) = 0;
 };
 

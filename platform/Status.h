@@ -12,9 +12,10 @@ struct Error {
   std::string description;
 };
 
-// How one call of a platform service ended: a code, 0 for success and anything else of the service's
-// own choice, and maybe an error object. The two are independent, because services hand back an error
-// with a success now and then, and a failure without one; callers say which of the two they look at.
+// How one call of a platform service ended: a code, 0 for success and anything else of the
+// service's own choice, and maybe an error object. The two are independent, because services hand
+// back an error with a success now and then, and a failure without one; callers say which of the
+// two they look at.
 struct [[nodiscard]] Status {
   int code = 0;
   std::optional<Error> error;

@@ -28,14 +28,14 @@ class PLATFORM_EXPORT DataSource {
 using DataSourcePtr = std::shared_ptr<DataSource>;
 using DataSourceOptions = std::optional<propertylist::Dictionary>;
 
-// The platform's sync data sources: views of the device-local store and of service accounts' stores,
-// one dataclass at a time.
+// The platform's sync data sources: views of the device-local store and of service accounts'
+// stores, one dataclass at a time.
 //
 // Every operation that takes a data source accepts an empty one and answers with a failure, because
-// callers pass on what they could not open. What migrateRecords and clearAllRecords change waits for
-// commit; clearSyncAnchors and removeStore act at once; deleteDataSource closes the source and drops
-// what was not committed. Several sources may be open at a time, on one store and one database too:
-// they never block each other. One thread at a time.
+// callers pass on what they could not open. What migrateRecords and clearAllRecords change waits
+// for commit; clearSyncAnchors and removeStore act at once; deleteDataSource closes the source and
+// drops what was not committed. Several sources may be open at a time, on one store and one
+// database too: they never block each other. One thread at a time.
 class PLATFORM_EXPORT SyncDataSource {
  public:
   struct Created {
@@ -56,10 +56,10 @@ class PLATFORM_EXPORT SyncDataSource {
   // The name under which createDataSource knows the type; empty for a type that has none.
   virtual std::optional<std::string> dataclassNameForSyncType(SyncDataType type) = 0;
 
-  // Opens the source of one dataclass: of the service account whose store has `accountIdentifier`, or,
-  // without one, the device-local (tethered) source. A store that does not exist yet gives an empty
-  // source; nothing is created before a commit. Without a name, a failure. The caller closes what came
-  // back with deleteDataSource, whatever happened in between.
+  // Opens the source of one dataclass: of the service account whose store has `accountIdentifier`,
+  // or, without one, the device-local (tethered) source. A store that does not exist yet gives an
+  // empty source; nothing is created before a commit. Without a name, a failure. The caller closes
+  // what came back with deleteDataSource, whatever happened in between.
   virtual Created createDataSource(const std::optional<std::string>& syncDataclassName,
                                    const std::optional<std::string>& accountIdentifier,
                                    const DataSourceOptions& options) = 0;
@@ -73,9 +73,9 @@ class PLATFORM_EXPORT SyncDataSource {
   // Forgets the sync state, at once; the next sync starts afresh.
   virtual Status clearSyncAnchors(const DataSourcePtr& source) = 0;
 
-  // Copies every record of `from` into `into`, at the commit of `into`; `from` keeps them. Repeating
-  // it doubles nothing, also after a run that was killed. Two records of one identity and different
-  // content are both kept.
+  // Copies every record of `from` into `into`, at the commit of `into`; `from` keeps them.
+  // Repeating it doubles nothing, also after a run that was killed. Two records of one identity and
+  // different content are both kept.
   virtual Status migrateRecords(const DataSourcePtr& from, const DataSourcePtr& into) = 0;
 
   // Makes the pending changes lasting, all or none.
@@ -84,11 +84,12 @@ class PLATFORM_EXPORT SyncDataSource {
   // Closes the source; the records stay.
   virtual Status deleteDataSource(const DataSourcePtr& source) = 0;
 
-  // Removes the store behind the source, at once. `flag` is passed through; the system passes false.
+  // Removes the store behind the source, at once. `flag` is passed through; the system passes
+  // false.
   virtual Status removeStore(const DataSourcePtr& source, bool flag) = 0;
 
-  // The names of the sources other than the device-local one that serve the type. "DenyTethered" among
-  // them only says that tethered syncing of the type is off.
+  // The names of the sources other than the device-local one that serve the type. "DenyTethered"
+  // among them only says that tethered syncing of the type is off.
   virtual ExternalSources externalSourcesEnabledForSyncType(SyncDataType type) = 0;
 
   // Turns tethered syncing of the type off (true) or on (false).

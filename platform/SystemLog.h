@@ -11,9 +11,9 @@ namespace platform {
 class PLATFORM_EXPORT SystemLog {
  public:
   virtual ~SystemLog();
-  // Writes one line. `text` is already expanded; the log adds its own prefix (time, process) and the
-  // line end, and must keep one call one line: a line break inside `text` may not start a second entry.
-  // Never fails towards the caller. Any thread.
+  // Writes one line. `text` is already expanded; the log adds its own prefix (time, process) and
+  // the line end, and must keep one call one line: a line break inside `text` may not start a
+  // second entry. Never fails towards the caller. Any thread.
   virtual void writeLine(std::string_view text) = 0;
 };
 

@@ -11,8 +11,8 @@ namespace platform {
 class PLATFORM_EXPORT UUIDGenerator {
  public:
   virtual ~UUIDGenerator();
-  // A fresh identifier as five groups of 8, 4, 4, 4 and 12 upper-case hexadecimal digits joined by "-";
-  // empty when none can be made.
+  // A fresh identifier as five groups of 8, 4, 4, 4 and 12 upper-case hexadecimal digits joined by
+  // "-"; empty when none can be made.
   virtual std::optional<std::string> generateUUID() = 0;
 };
 
