@@ -1,0 +1,35 @@
+# shellcheck shell=bash
+# The Debian packages that the project needs, and how ./check and ./demo get them. Sourced, not run.
+
+# shellcheck disable=SC2034  # used by those who source this file
+BUILD_PACKAGES=(g++ cmake ninja-build python3 binutils ca-certificates git
+  libsqlite3-dev sqlite3 libfmt-dev libcli11-dev nlohmann-json3-dev libgtest-dev libgmock-dev)
+# shellcheck disable=SC2034
+CHECK_PACKAGES=(clang-14 clang-tidy-14 clang-format-14 libclang-rt-14-dev shellcheck mandoc)
+
+# need_packages PACKAGE... installs what is missing when we are root, and otherwise says what to install.
+need_packages() {
+  local missing=() package
+  for package in "$@"; do
+    if ! dpkg-query -W -f '${db:Status-Status}\n' "$package" 2>/dev/null | grep -qx installed; then
+      missing+=("$package")
+    fi
+  done
+  [ ${#missing[@]} -eq 0 ] && return 0
+  if [ "$(id -u)" -ne 0 ]; then
+    echo "These Debian packages are missing; install them as root, then start again:" >&2
+    echo "    apt-get install ${missing[*]}" >&2
+    return 1
+  fi
+  echo "Installing ${missing[*]}"
+  local log
+  log=$(mktemp) || return 1
+  if ! { apt-get -qq update && DEBIAN_FRONTEND=noninteractive apt-get -qq install --no-install-recommends \
+    "${missing[@]}"; } >"$log" 2>&1 </dev/null; then
+    cat "$log" >&2
+    rm -f "$log"
+    echo "Could not install the packages above; see apt-get's messages." >&2
+    return 1
+  fi
+  rm -f "$log"
+}

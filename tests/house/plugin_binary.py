@@ -1,0 +1,61 @@
+"""What the built plug-in needs and what it shows.   usage: plugin_binary.py SHARED_OBJECT [--sanitized]
+
+It may need the C and the C++ run time and the two libraries it shares with its host, nothing else; and
+since it is loaded into somebody else's process, none of its own symbols may be seen there.
+--sanitized allows the sanitizers' own run time.
+"""
+
+import re
+import subprocess
+import sys
+from pathlib import Path
+
+from report import finish
+
+NEEDED = re.compile(
+    r"(libstdc\+\+\.so\.6|libm\.so\.6|libgcc_s\.so\.1|libc\.so\.6|ld-linux-[\w-]+\.so\.\d"
+    r"|libpropertylist\.so(\.[\d.]+)?|libplatform\.so(\.[\d.]+)?)"
+)
+SANITIZERS = re.compile(r"lib(asan|ubsan|tsan)\.so\.\d+|lib(pthread|dl|rt|resolv)\.so\.\d")
+# Templates of the standard library, and what describes the shared libraries' classes, are emitted by
+# every object that uses them and are weak everywhere.
+SHARED_WEAK = re.compile(
+    r"(vtable for |typeinfo for |typeinfo name for |guard variable for |VTT for )?"
+    r"([^()]* )?((std|__gnu_cxx|platform|propertylist)::|operator (new|delete))"
+)
+
+
+def lines_of(*command: str) -> list[str]:
+    return subprocess.run(command, check=True, capture_output=True, text=True).stdout.splitlines()
+
+
+def needed(binary: Path) -> list[str]:
+    """The shared libraries that the loader would fetch for `binary`."""
+    rows = (re.search(r"\(NEEDED\).*\[(.*)\]", line) for line in lines_of("readelf", "-dW", str(binary)))
+    return [row[1] for row in rows if row]
+
+
+def exported(binary: Path) -> list[tuple[str, str]]:
+    """Kind letter and readable name of each symbol that `binary` defines for others."""
+    rows = (line.split(maxsplit=2) for line in lines_of("nm", "-DC", "--defined-only", str(binary)))
+    return [(row[1], row[2]) for row in rows if len(row) == 3]
+
+
+def check(binary: Path, sanitized: bool) -> tuple[list[str], int]:
+    """The problems, and the number of libraries and symbols that were looked at."""
+    problems = []
+    libraries = needed(binary)
+    for name in libraries:
+        if not NEEDED.fullmatch(name) and not (sanitized and SANITIZERS.fullmatch(name)):
+            problems.append(f"{binary}: needs {name}")
+    symbols = exported(binary)
+    for kind, name in symbols:
+        weak = kind in "VWu" and SHARED_WEAK.match(name)
+        from_compiler = sanitized and re.match(r"_*(asan|ubsan|tsan|odr)_", name)
+        if not weak and not from_compiler:
+            problems.append(f"{binary}: shows the symbol {name} ({kind})")
+    return problems, len(libraries) + len(symbols)
+
+
+if __name__ == "__main__":
+    finish(*check(Path(sys.argv[1]), "--sanitized" in sys.argv[2:]), "libraries and symbols")

@@ -1,0 +1,58 @@
+"""A shared object that needs or shows too much is found: small ones are built and checked.
+
+usage: plugin_binary_selftest.py COMPILER
+"""
+
+import subprocess
+import sys
+import tempfile
+import unittest
+from pathlib import Path
+
+import plugin_binary
+
+COMPILER = sys.argv.pop(1) if len(sys.argv) > 1 else "c++"
+MODEST = """
+#include <string>
+#include <vector>
+namespace {
+struct Registered {
+  std::vector<std::string> names;
+  Registered() { names.push_back("a name that is too long for the string itself"); }
+} registered;
+}
+"""
+
+
+class PluginBinary(unittest.TestCase):
+    def problems(self, source: str, *options: str) -> list[str]:
+        """What the check says of the shared object built from `source`."""
+        with tempfile.TemporaryDirectory() as folder:
+            file = Path(folder) / "object.cpp"
+            file.write_text(source, encoding="utf-8")
+            command = [COMPILER, "-shared", "-fPIC", "-fvisibility=hidden", str(file)]
+            subprocess.run([*command, "-o", f"{folder}/object.so", *options], check=True)
+            found, _ = plugin_binary.check(Path(folder) / "object.so", sanitized=False)
+            return [problem.removeprefix(f"{folder}/") for problem in found]
+
+    def test_an_object_that_needs_the_run_time_and_shows_nothing_passes(self):
+        self.assertEqual(self.problems(MODEST), [])
+
+    def test_a_library_besides_the_run_time_is_found(self):
+        found = self.problems(MODEST, "-Wl,--no-as-needed", "-lresolv")
+        self.assertEqual(found, ["object.so: needs libresolv.so.2"])
+
+    def test_a_function_that_is_shown_is_found(self):
+        shown = '__attribute__((visibility("default"))) int shown() { return 1; }'
+        self.assertEqual(
+            self.problems(MODEST + shown), ["object.so: shows the symbol shown() (T)"]
+        )
+
+    def test_a_class_that_is_shown_is_found(self):
+        shown = """struct __attribute__((visibility("default"))) Shown { virtual ~Shown() {} };
+        struct __attribute__((visibility("hidden"))) User { Shown shown; } user;"""
+        self.assertIn("object.so: shows the symbol vtable for Shown (V)", self.problems(shown))
+
+
+if __name__ == "__main__":
+    unittest.main()
