@@ -50,8 +50,8 @@ def library(header: str) -> str:
     return header.split("/")[0].removesuffix(".h")
 
 
-def problem_of(floor: str, argument: str) -> str | None:
-    """What is wrong with `#include argument` on this floor, if anything."""
+def problem_of(floor: str, in_tests: bool, argument: str) -> str | None:
+    """What is wrong with `#include argument` on this floor, if anything. Is the file for tests only?"""
     folders, libraries = FLOORS[floor]
     if match := re.match(r"<([^>]+)>", argument):
         name = library(match[1])
@@ -66,6 +66,8 @@ def problem_of(floor: str, argument: str) -> str | None:
             return f"includes {match[0]}, which is not written from the top of the tree"
         if folder != floor and folder not in folders:
             return f"{floor} must not include {match[0]}"
+        if match[1].startswith("platform/testing/") and not in_tests:
+            return f"includes {match[0]}, which is for tests"
         return None
     return f"includes {argument.strip()}, which cannot be read without the preprocessor"
 
@@ -77,12 +79,13 @@ def check(tree: Path) -> tuple[list[str], int]:
         for path in sorted((tree / floor).rglob("*")):
             if path.suffix not in SOURCES or not path.is_file():
                 continue
+            in_tests = "testing" in path.parts
             for number, line in enumerate(path.read_text(encoding="utf-8").splitlines(), 1):
                 match = INCLUDE.match(line)
                 if match is None:
                     continue
                 count += 1
-                if problem := problem_of(floor, match[1]):
+                if problem := problem_of(floor, in_tests, match[1]):
                     problems.append(f"{path}:{number}: {problem}")
     return problems, count
 

@@ -62,6 +62,12 @@ class IncludeWalls(unittest.TestCase):
                 (problem,) = self.problems("host/b.cpp", line)
                 self.assertIn("not written from the top", problem)
 
+    def test_what_is_for_tests_stays_there(self):
+        line = '#include "platform/testing/InMemoryClock.h"'
+        self.assertEqual(self.problems("platform/testing/a.h", line), [])
+        (problem,) = self.problems("host/b.cpp", line)
+        self.assertIn("is for tests", problem)
+
     def test_angle_brackets_and_macros_hide_nothing(self):
         (problem,) = self.problems("host/b.cpp", "#include <migrator/a.h>")
         self.assertIn("is quoted", problem)
