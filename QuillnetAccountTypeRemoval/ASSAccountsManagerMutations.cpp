@@ -54,7 +54,8 @@ void ASSAccountsManager::insertAccount(const AccountPtr& account) {
   ASLog("Inserting account:", account->properties());
   const std::optional<std::string> identifier = account->identifier();
   if (identifier && topLevelAccountsByID_.contains(*identifier)) return;
-  _register(account);
+  // A copy, because the caller's may be an element of the very array that it is appended to.
+  _register(AccountPtr(account));
 }
 
 void ASSAccountsManager::deleteAccount(const AccountPtr& account) {
@@ -178,17 +179,13 @@ void ASSAccountsManager::_placeChild(const AccountPtr& child, const AccountsByID
 void ASSAccountsManager::removeChildWithIdentifierFromAccount(std::string_view identifier,
                                                               const AccountPtr& parent) {
   const Array* children = childrenOf(parent);
-  std::vector<Value> removed;
   std::vector<Value> kept;
   if (children != nullptr) {
     for (const Value& info : *children) {
       const Dictionary* properties = info.asDictionary();
       const AccountPtr child =
           properties != nullptr ? ASSBasicAccount::initWithProperties(*properties) : nullptr;
-      if (child && child->identifier() == identifier) removed.push_back(info);
-    }
-    for (const Value& info : *children) {
-      if (std::find(removed.begin(), removed.end(), info) == removed.end()) kept.push_back(info);
+      if (!child || child->identifier() != identifier) kept.push_back(info);
     }
   }
   parent->setAccountPropertyForKey(

@@ -1,6 +1,7 @@
 // Finding and listing accounts.
 
 #include "QuillnetAccountTypeRemoval/ASSAccountsManager.h"
+#include "QuillnetAccountTypeRemoval/Assertions.h"
 #include "platform/Services.h"
 
 namespace accountsettings {
@@ -20,7 +21,12 @@ AccountPtr ASSAccountsManager::accountWithIdentifier(std::string_view identifier
   if (const auto found = topLevelAccountsByID_.find(identifier);
       found != topLevelAccountsByID_.end())
     return found->second;
-  const auto parent = childAccountIDToParentAccountID_.find(identifier);
+  const auto child = childAccountsByID_.find(identifier);
+  if (child == childAccountsByID_.end()) return nullptr;
+  // By the identifier that the child has now, which may have been changed since it was loaded.
+  const std::optional<std::string> current = child->second->identifier();
+  if (!current) return nullptr;
+  const auto parent = childAccountIDToParentAccountID_.find(*current);
   if (parent == childAccountIDToParentAccountID_.end()) return nullptr;
   const auto found = topLevelAccountsByID_.find(parent->second);
   return found != topLevelAccountsByID_.end() ? found->second : nullptr;
@@ -67,6 +73,9 @@ DeviceLocalAccountPtr ASSAccountsManager::fullDeviceLocalAccount() {
   platform::logToSystem("DeviceLocalAccount missing. Creating...");
   const DeviceLocalAccountPtr created =
       ASSDeviceLocalAccount::initWithProperties(ASSDeviceLocalAccount::basicAccountProperties());
+  if (!created)
+    raiseAssertionFailure("ASSAccountsManager", __LINE__, "The account type (%@) is not supported",
+                          kOnMyDeviceAccountType);
   replaceAccountsWithTypesWithAccounts({std::string(kOnMyDeviceAccountType)}, {created});
   return created;
 }

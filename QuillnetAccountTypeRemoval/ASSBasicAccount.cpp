@@ -36,6 +36,7 @@ AccountPtr ASSBasicAccount::initWithProperties(const Dictionary& properties) {
 
 AccountPtr ASSBasicAccount::_initWithTypeClass(const std::optional<std::string>& type,
                                                const std::optional<std::string>& className) {
+  initialize();
   if (!className || className->empty())
     raiseAssertionFailure(kSourceFile, __LINE__, "The account class is required.");
   if (!_isValidAccountType(type))
@@ -51,8 +52,9 @@ AccountPtr ASSBasicAccount::_initWithTypeClass(const std::optional<std::string>&
 std::optional<ASSBasicAccount::CheckedProperties> ASSBasicAccount::_checkProperties(
     const Dictionary& properties) {
   const Value* type = properties.find(kAccountType);
+  const std::string* typeName = type != nullptr ? type->asString() : nullptr;
   const bool typeIsValid =
-      type != nullptr && type->asString() != nullptr && _isValidAccountType(*type->asString());
+      _isValidAccountType(typeName != nullptr ? std::optional(*typeName) : std::nullopt);
   if (!typeIsValid)
     platform::logToSystem("[%s] Invalid account type: %@", kInitWithProperties, type);
   // A missing class is told also of properties whose type was refused already.

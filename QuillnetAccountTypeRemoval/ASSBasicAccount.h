@@ -123,8 +123,9 @@ class ASSBasicAccount : public platform::Describable,
 
   // --- The catalogue of account types and dataclasses ---
 
-  // Loads the catalogue of account types, once per process. Every operation that needs it calls
-  // this first. An InternalConsistencyFailure when the resource is missing or unreadable; the next
+  // Loads the catalogue of account types, once per process. Every initialiser and every class
+  // operation but init, createNewAccountUID, isMultitaskingEnabled and allSupportedDataclasses does
+  // so first. An InternalConsistencyFailure when the resource is missing or unreadable; the next
   // call tries again.
   static void initialize();
   // Whether the device runs several applications at once; without it there are no notes to sync.

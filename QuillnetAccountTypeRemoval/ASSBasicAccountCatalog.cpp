@@ -97,9 +97,8 @@ void ASSBasicAccount::initialize() {
 }
 
 bool ASSBasicAccount::_isValidAccountType(const std::optional<std::string>& type) {
-  if (!type || type->empty()) return false;
   initialize();
-  return AccountTypesCatalog->contains(*type);
+  return type && !type->empty() && AccountTypesCatalog->contains(*type);
 }
 
 bool ASSBasicAccount::isMultitaskingEnabled() {
@@ -138,6 +137,7 @@ std::optional<StringList> ASSBasicAccount::userActionsToDisableDataclassForAccou
 
 StringList ASSBasicAccount::removeActionsIncompatibleWithSingleStoreDataclass(
     const StringList& actions) {
+  initialize();
   StringList kept = actions;
   const auto last = std::find(kept.rbegin(), kept.rend(), kDataclassToggleActionKeepLocalData);
   if (last != kept.rend()) kept.erase(std::next(last).base());
@@ -155,6 +155,7 @@ bool ASSBasicAccount::showRemindersSeparatelyForAccountType(std::string_view typ
 }
 
 std::optional<Dictionary> ASSBasicAccount::_dataclassesProperties() {
+  initialize();
   const platform::Services& services = platform::services();
   const std::optional<std::string> path =
       services.bundleResources.pathForResource(bundleAnchor(), "DataclassesProperties", "plist");
@@ -165,6 +166,7 @@ std::optional<Dictionary> ASSBasicAccount::_dataclassesProperties() {
 }
 
 bool ASSBasicAccount::_flagOfDataclass(std::string_view dataclass, std::string_view flag) {
+  initialize();
   std::call_once(dataclassesOnce, [] { DataclassesCatalog = _dataclassesProperties(); });
   if (!DataclassesCatalog) return false;
   const Dictionary* entry = propertylist::findDictionary(*DataclassesCatalog, dataclass);
