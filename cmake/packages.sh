@@ -2,10 +2,10 @@
 # The Debian packages that the project needs, and how ./check and ./demo get them. Sourced, not run.
 
 # shellcheck disable=SC2034  # used by those who source this file
-BUILD_PACKAGES=(g++ cmake ninja-build python3 binutils ca-certificates git
+BUILD_PACKAGES=(g++ cmake ninja-build python3 binutils
   libsqlite3-dev sqlite3 libfmt-dev libcli11-dev nlohmann-json3-dev libgtest-dev libgmock-dev)
 # shellcheck disable=SC2034
-CHECK_PACKAGES=(clang-14 clang-tidy-14 clang-format-14 libclang-rt-14-dev shellcheck mandoc)
+CHECK_PACKAGES=(git clang-14 clang-tidy-14 clang-format-14 libclang-rt-14-dev shellcheck mandoc)
 
 # need_packages PACKAGE... installs what is missing when we are root, and otherwise says what to install.
 need_packages() {
