@@ -1,5 +1,7 @@
 #pragma once
 
+#include <gtest/gtest.h>
+
 #include <memory>
 #include <ostream>
 #include <string>
@@ -7,6 +9,7 @@
 #include <vector>
 
 #include "QuillnetAccountTypeRemoval/ASSAccountsManager.h"
+#include "platform/InternalConsistencyFailure.h"
 #include "platform/testing/InMemoryDevice.h"
 #include "propertylist/Value.h"
 #include "propertylist/Writing.h"
@@ -70,6 +73,20 @@ Dictionary without(Dictionary dictionary, std::string_view key);
 // The identifiers of accounts, in order; "(null)" for an account without one.
 Lines identifiersOf(const AccountArray& accounts);
 Lines identifiersOf(const Array& accountInfos);
+
+// Expects `operation` to end in an assertion failure of this text and source file.
+template <typename Operation>
+void expectAssertionFailure(const std::string& text, const std::string& sourceFile,
+                            Operation operation) {
+  try {
+    operation();
+    ADD_FAILURE() << "nothing was raised";
+  } catch (const platform::InternalConsistencyFailure& failure) {
+    EXPECT_EQ(failure.what(), text);
+    EXPECT_EQ(failure.sourceFile(), sourceFile);
+    EXPECT_GT(failure.line(), 0);
+  }
+}
 
 // Records that let a test reach what only subclasses see.
 class OpenAccount : public ASSBasicAccount {
