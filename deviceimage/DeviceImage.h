@@ -2,8 +2,10 @@
 
 #include <sys/types.h>
 
+#include <cstdint>
 #include <memory>
 #include <optional>
+#include <span>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -28,6 +30,13 @@ struct OpenedImage {
 struct OpenedFile {
   platform::Status status;
   int descriptor = -1;
+};
+
+// What is at a name of the image, seen without opening it.
+struct FileLook {
+  enum class Kind { nothing, file, directory, other };  // a link is "other", also on the way there
+  Kind kind = Kind::nothing;
+  std::int64_t size = 0;  // bytes, of a file
 };
 
 // Something about an image's files that stands in the way, and what to do about it.
@@ -104,6 +113,7 @@ class DeviceImage {
   OpenedFile openFile(std::string_view relative, int flags) const;
   // Makes the directory with those above it; success when it is there.
   platform::Status makeDirectory(std::string_view relative) const;
+  FileLook lookAt(std::string_view relative) const;
   // Whether a file or directory is there; a link is not.
   bool exists(std::string_view relative) const;
   // The plain names in a directory, sorted; empty when it cannot be read.
@@ -112,10 +122,21 @@ class DeviceImage {
 
   // The property list in the file; limits and errors as propertylist::readPropertyListFile.
   propertylist::FileReadResult readPropertyList(std::string_view relative) const;
-  // Replaces the file in one step by the binary form of `value`, lasting when it succeeds: private,
-  // synchronised, moved over the old one.
+  // The value under `key` in the file's dictionary. What cannot be read counts as absent.
+  std::optional<propertylist::Value> readProperty(std::string_view relative,
+                                                  std::string_view key) const;
+  // writeFile with the binary form of `value`; EINVAL when that form cannot hold it.
   platform::Status writePropertyList(std::string_view relative,
                                      const propertylist::Value& value) const;
+
+  // Makes the file hold `bytes` in one step, lasting when it succeeds: a private file is written
+  // beside it, synchronised and moved into place. writeFile replaces what is there, createFile
+  // fails with EEXIST. A program that is killed meanwhile may leave the private file behind, which
+  // removeLeftovers removes.
+  platform::Status writeFile(std::string_view relative, std::span<const std::uint8_t> bytes) const;
+  platform::Status createFile(std::string_view relative, std::span<const std::uint8_t> bytes) const;
+  // Removes what killed programs left of writeFile and createFile. Only under the image's lock.
+  void removeLeftovers() const;
 
   // The number of the user (group) with that name in the image's own etc/passwd (etc/group).
   std::optional<uid_t> userNumber(std::string_view name) const;
@@ -137,6 +158,8 @@ class DeviceImage {
   // Gives what root has just made under var/mobile to the image's user.
   platform::Status _handOver(int descriptor, std::string_view relative) const;
   platform::Status _populate() const;
+  platform::Status _placeFile(std::string_view relative, std::span<const std::uint8_t> bytes,
+                              bool mayReplace) const;
 
   std::string _rootPath;
   int _root;

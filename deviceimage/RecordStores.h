@@ -15,11 +15,15 @@
 
 namespace deviceimage {
 
+class DatabaseSet;
+class RecordPlacer;
+
 // The row of something in its database; unique there, never used again. Rows of different databases
 // have nothing to do with one another, so a dataclass goes with each.
 using Row = std::int64_t;
 
-// One store as one dataclass sees it; a calendar store is listed for calendars and for reminders.
+// One store as one dataclass sees it. A calendar store is listed for each of calendars and
+// reminders that it has collections of; the local one, and one without any, for both.
 struct Store {
   Dataclass dataclass = Dataclass::contacts;
   Row row = 0;
@@ -105,6 +109,8 @@ class RecordStores {
     platform::Status status;
     std::vector<Store> stores;  // by dataclass, the local one first, active before retired
   };
+  // On failure the status is that of the first database that could not be read, and the stores are
+  // those of the others.
   Stores listStores();
   Stores listStores(Dataclass dataclass);
 
@@ -158,6 +164,9 @@ class RecordStores {
   };
   Purged purgeRetiredStore(Dataclass dataclass, Row retiredStore);
 
+  // Shows or hides the store's records of the dataclass.
+  platform::Status setVisible(Dataclass dataclass, Row store, bool visible);
+
   // How far a sync with another device has come. Empty when it has not begun.
   platform::Status setSyncAnchor(Dataclass dataclass, Row store, std::string_view anchor);
   struct Anchor {
@@ -175,8 +184,9 @@ class RecordStores {
   platform::Status recoverDatabases();
 
  private:
-  class Implementation;
-  std::unique_ptr<Implementation> _implementation;
+  Added _addTo(Dataclass dataclass, const std::optional<std::string>& account,
+               const std::function<void(RecordPlacer& placer)>& add);
+  std::unique_ptr<DatabaseSet> _databases;
 };
 
 }  // namespace deviceimage

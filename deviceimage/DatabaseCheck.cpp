@@ -1,0 +1,66 @@
+// Looking whether the databases are sound.
+#include "deviceimage/ContentHash.h"
+#include "deviceimage/Database.h"
+#include "deviceimage/RecordStores.h"
+
+namespace deviceimage {
+namespace {
+
+constexpr std::size_t kMostProblems = 100;  // of one database; more say nothing new
+
+void checkIntegrity(Database& database, std::vector<std::string>& problems) {
+  Statement integrity(database, "PRAGMA integrity_check");
+  while (integrity.step())
+    if (integrity.bytes(0) != "ok") problems.push_back(integrity.text(0));
+  Statement references(database, "PRAGMA foreign_key_check");
+  while (references.step() && problems.size() < kMostProblems)
+    problems.push_back("row " + references.text(1) + " of table \"" + references.text(0) +
+                       "\" refers to a row of \"" + references.text(2) + "\" that is not there");
+}
+
+void checkHashes(Database& database, std::vector<std::string>& problems) {
+  Statement records(database, "SELECT id, uid, content_hash, content FROM records");
+  while (records.step() && problems.size() < kMostProblems)
+    if (contentHash(records.bytes(3)) != records.bytes(2))
+      problems.push_back("record " + records.text(0) + " (\"" + records.text(1) +
+                         "\") has another content than its hash says");
+}
+
+}  // namespace
+
+std::vector<DatabaseReport> RecordStores::checkDatabases() {
+  std::vector<DatabaseReport> reports;
+  for (const Dataclass dataclass : kDataclasses) {
+    if (dataclass == Dataclass::reminders) continue;  // in the calendars' database
+    const platform::SyncDataType type = syncTypeOf(dataclass);
+    DatabaseReport report;
+    report.path = DeviceImage::databaseFile(type);
+    const platform::Status status = statusOf([&] {
+      report.exists = _databases->image().lookAt(report.path).kind != FileLook::Kind::nothing;
+      if (Database* const database = _databases->find(type)) {
+        checkIntegrity(*database, report.problems);
+        if (report.problems.empty()) checkHashes(*database, report.problems);
+      }
+      return platform::Status::success();
+    });
+    if (!status.isSuccess()) report.problems.push_back(status.error->description);
+    reports.push_back(std::move(report));
+  }
+  return reports;
+}
+
+platform::Status RecordStores::recoverDatabases() {
+  platform::Status first;
+  for (const Dataclass dataclass : kDataclasses) {
+    // Opening reads the schema, and the first read rolls back.
+    platform::Status status = statusOf([&] {
+      if (Database* const database = _databases->find(syncTypeOf(dataclass)))
+        Statement(*database, "SELECT count(*) FROM stores").run();
+      return platform::Status::success();
+    });
+    if (first.isSuccess()) first = std::move(status);
+  }
+  return first;
+}
+
+}  // namespace deviceimage

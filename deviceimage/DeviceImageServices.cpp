@@ -1,0 +1,79 @@
+#include "deviceimage/DeviceImageServices.h"
+
+#include <utility>
+
+#include "deviceimage/Database.h"
+#include "deviceimage/ImageCalendarStore.h"
+#include "deviceimage/ImageContactsStore.h"
+#include "deviceimage/ImageLock.h"
+#include "deviceimage/ImageMessages.h"
+#include "deviceimage/ImagePreferences.h"
+#include "deviceimage/ImageProcesses.h"
+#include "deviceimage/ImageProperties.h"
+#include "deviceimage/ImageSyncDataSource.h"
+#include "platform/posix/DlAddrBundleResources.h"
+#include "platform/posix/MonotonicClock.h"
+#include "platform/posix/PosixFileServices.h"
+#include "platform/posix/ProcessClassRegistry.h"
+#include "platform/posix/RandomUUIDGenerator.h"
+
+namespace deviceimage {
+
+class DeviceImageServices::Implementation {
+ public:
+  Implementation(const std::shared_ptr<const DeviceImage>& image, ServiceOptions options)
+      : _databases(image, DatabaseAccess::readWrite),
+        _accountFramework(image),
+        _bundleResources(std::move(options.preferredLanguages)),
+        _calendarStore(_databases),
+        _contactsStore(_databases),
+        _deviceInfo(image),
+        _fileLocks(image),
+        _preferences(image),
+        _restrictions(image),
+        _syncDataSource(_databases),
+        _systemLog(image, std::move(options.processName), std::move(options.logSink)),
+        _notifyCenter(image),
+        _userDatabase(image),
+        _services{
+            _accountFramework, _bundleResources, _calendarStore, _classRegistry,  _clock,
+            _contactsStore,    _deviceInfo,      _fileLocks,     _fileServices,   _preferences,
+            _processTable,     _restrictions,    _runLoop,       _syncDataSource, _systemLog,
+            _notifyCenter,     _uuidGenerator,   _userDatabase} {}
+
+  const platform::Services& services() const { return _services; }
+
+ private:
+  DatabaseSet _databases;
+  ImageAccountFramework _accountFramework;
+  platform::DlAddrBundleResources _bundleResources;
+  ImageCalendarStore _calendarStore;
+  platform::ProcessClassRegistry _classRegistry;
+  platform::MonotonicClock _clock;
+  ImageContactsStore _contactsStore;
+  ImageDeviceInfo _deviceInfo;
+  ImageFileLocks _fileLocks;
+  platform::PosixFileServices _fileServices;
+  ImagePreferences _preferences;
+  ImageProcessTable _processTable;
+  ImageRestrictions _restrictions;
+  WaitingRunLoop _runLoop;
+  ImageSyncDataSource _syncDataSource;
+  ImageSystemLog _systemLog;
+  ImageNotifyCenter _notifyCenter;
+  platform::RandomUUIDGenerator _uuidGenerator;
+  ImageUserDatabase _userDatabase;
+  platform::Services _services;
+};
+
+DeviceImageServices::DeviceImageServices(std::shared_ptr<const DeviceImage> image,
+                                         ServiceOptions options)
+    : _implementation(std::make_unique<Implementation>(image, std::move(options))) {}
+
+DeviceImageServices::~DeviceImageServices() = default;
+
+const platform::Services& DeviceImageServices::services() const {
+  return _implementation->services();
+}
+
+}  // namespace deviceimage
