@@ -1,5 +1,6 @@
 #pragma once
 
+#include <atomic>
 #include <cstddef>
 #include <cstdint>
 #include <map>
@@ -14,6 +15,7 @@
 #include "QuillnetAccountTypeRemoval/ASSBasicAccount.h"
 #include "QuillnetAccountTypeRemoval/ASSDeviceLocalAccount.h"
 #include "QuillnetAccountTypeRemoval/ASSRuntimeFixMailAccount.h"
+#include "QuillnetAccountTypeRemoval/AccountChanges.h"
 #include "QuillnetAccountTypeRemoval/StringLists.h"
 #include "propertylist/Value.h"
 
@@ -77,6 +79,16 @@ class ASSAccountsManager {
   // file at the next save. A plain record of type "OnMyDevice" does not count and is replaced or
   // removed. (The store's own record, whatever the name says; no full account is made.)
   DeviceLocalAccountPtr fullDeviceLocalAccount();
+  // The full account of the top-level or child account with the identifier (see
+  // ASSBasicAccount::fullAccountUsingLoader); null for an empty or unknown identifier.
+  FullAccountPtr fullAccountWithIdentifierLoader(std::string_view identifier,
+                                                 FullAccountLoader* loader);
+  // The full accounts of these types: every top-level account's, followed by its children's, which
+  // are listed whatever their parent's type. A child without one is left out.
+  std::vector<FullAccountPtr> accountsWithTypes(const StringList& types);
+  std::vector<FullAccountPtr> accountsWithTypesWithLoader(const StringList& types,
+                                                          FullAccountLoader* loader);
+  std::vector<FullAccountPtr> allMailAccounts();
 
   // --- Changes in memory: the file changes at the next save ---
 
@@ -121,7 +133,40 @@ class ASSAccountsManager {
       const std::optional<propertylist::Dictionary>& original,
       const std::optional<propertylist::Dictionary>& onDisk) const;
 
+  // --- Change notifications ---
+  //
+  // Notifier classes live in code bundles that the catalogue of account creators names for a type.
+  // They are looked up, and their bundles loaded, at every call. A malformed catalogue, a bundle
+  // that does not load and a class that is not there are InternalConsistencyFailures.
+
+  // Tell the notifiers of the account's type and the dataclass, whatever the skip flag says. A
+  // class that does not listen is passed over.
+  static void accountWillChangeForDataclass(const AccountPtr& account, std::string_view dataclass);
+  static void accountDidChangeForDataclass(const AccountPtr& account, std::string_view dataclass);
+  // Whether saves of this process tell the notifiers nothing; true until somebody says otherwise.
+  // What is skipped is told by the first save after the flag is cleared.
+  static void _setShouldSkipNotifications(bool skip);
+  // How a list of accounts of the type is headed; empty but for subscribed calendars.
+  static std::optional<std::string> displayNameForGroupOfAccountTypeForBeginningOfSentence(
+      std::string_view type, bool beginningOfSentence);
+
  protected:
+  // Change records by the name of the notifier class that is to hear of them.
+  using NotificationTable = std::map<std::string, propertylist::Array>;
+
+  static StringList _notifierClassNamesForAccountTypeDataclass(const std::string& type,
+                                                               std::string_view dataclass);
+  // Adds a record for every notifier that serves a dataclass which the change affects: one for
+  // each, however many dataclasses it serves. Compares what is stored, not what is provisioned or
+  // allowed.
+  void _addNotificationToDictionaryForChangeTypeOriginalPropertiesCurrentProperties(
+      NotificationTable& table, AccountChangeType change,
+      const std::optional<propertylist::Dictionary>& original,
+      const std::optional<propertylist::Dictionary>& current) const;
+  // Tells every notifier what changed since the snapshot. An account that is listed but not
+  // registered by its identifier counts as deleted.
+  void _sendNotificationsForChangedAccounts() const;
+
   // Makes an object without accounts; _initFromSettingsFile or _initWithAccountsInfo completes it.
   ASSAccountsManager();
   void _initFromSettingsFile();
@@ -147,6 +192,8 @@ class ASSAccountsManager {
 
  private:
   using AccountsByID = std::map<std::string, AccountPtr, std::less<>>;
+
+  static std::atomic<bool> shouldSkipNotifications;
 
   void _loadAccount(const propertylist::Value& info, bool& fixedAny);
   void _register(const AccountPtr& account);

@@ -80,4 +80,52 @@ DeviceLocalAccountPtr ASSAccountsManager::fullDeviceLocalAccount() {
   return created;
 }
 
+FullAccountPtr ASSAccountsManager::fullAccountWithIdentifierLoader(std::string_view identifier,
+                                                                   FullAccountLoader* loader) {
+  if (identifier.empty()) return nullptr;
+  if (const auto found = topLevelAccountsByID_.find(identifier);
+      found != topLevelAccountsByID_.end())
+    return found->second->fullAccountUsingLoader(loader);
+  const auto child = childAccountsByID_.find(identifier);
+  return child != childAccountsByID_.end() ? child->second->fullAccountUsingLoader(loader)
+                                           : nullptr;
+}
+
+std::vector<FullAccountPtr> ASSAccountsManager::accountsWithTypes(const StringList& types) {
+  return accountsWithTypesWithLoader(types, nullptr);
+}
+
+std::vector<FullAccountPtr> ASSAccountsManager::accountsWithTypesWithLoader(
+    const StringList& types, FullAccountLoader* loader) {
+  // The children of each parent object, so that they are not walked once for every parent.
+  std::unordered_map<const ASSBasicAccount*, StringList> matchingChildren;
+  for (const auto& [identifier, child] : childAccountsByID_) {
+    if (isOfOneType(*child, types))
+      matchingChildren[child->parentAccount().get()].push_back(identifier);
+  }
+  std::vector<FullAccountPtr> accounts;
+  for (const AccountPtr& account : *orderedTopLevelAccounts_) {
+    if (isOfOneType(*account, types)) {
+      FullAccountPtr full =
+          fullAccountWithIdentifierLoader(account->identifier().value_or(""), loader);
+      // Listed without being registered by its identifier: never skipped silently.
+      if (!full)
+        raiseAssertionFailure("ASSAccountsManager", __LINE__, "%@ has no full account", account);
+      accounts.push_back(std::move(full));
+    }
+    const auto children = matchingChildren.find(account.get());
+    if (children == matchingChildren.end()) continue;
+    for (const std::string& identifier : children->second) {
+      if (FullAccountPtr full = fullAccountWithIdentifierLoader(identifier, loader))
+        accounts.push_back(std::move(full));
+    }
+  }
+  return accounts;
+}
+
+std::vector<FullAccountPtr> ASSAccountsManager::allMailAccounts() {
+  return accountsWithTypes({std::string(kMailAccountType), std::string(kQuillnetAccountType),
+                            std::string(kGmailAccountType), std::string(kYahooAccountType)});
+}
+
 }  // namespace accountsettings

@@ -109,6 +109,11 @@ void ASSAccountsManager::saveAllAccounts() {
   if (fixedAny) {
     for (const RuntimeFixerPtr& fixer : runtimeFixers_) fixer->accountsHaveBeenSaved(true);
   }
+  if (saved && !shouldSkipNotifications) {
+    // The snapshot is renewed only when everybody has been told.
+    _sendNotificationsForChangedAccounts();
+    _setOriginalAccountDictionaries();
+  }
 }
 
 }  // namespace accountsettings

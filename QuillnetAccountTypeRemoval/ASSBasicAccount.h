@@ -1,35 +1,18 @@
 #pragma once
 
+#include <functional>
 #include <memory>
 #include <optional>
 #include <string>
 #include <string_view>
 
 #include "QuillnetAccountTypeRemoval/AccountConstants.h"
+#include "QuillnetAccountTypeRemoval/AccountCreatorClasses.h"
 #include "QuillnetAccountTypeRemoval/StringLists.h"
 #include "platform/LogFormat.h"
 #include "propertylist/Value.h"
 
 namespace accountsettings {
-
-class ASSBasicAccount;
-using AccountPtr = std::shared_ptr<ASSBasicAccount>;
-
-// A full account: the object that speaks to an account's service. Made by a class of the service's
-// own code bundle and held by the record.
-class AccountFullAccountProtocol {
- public:
-  virtual ~AccountFullAccountProtocol() = default;
-  // Tells the full account the parent of its record.
-  virtual void setParentAccount(const AccountPtr& parent) = 0;
-};
-
-// A sync account: the object that refreshes an account's sync containers. Made by a class of the
-// service's own code bundle and held by the record.
-class AccountSyncAccountProtocol {
- public:
-  virtual ~AccountSyncAccountProtocol() = default;
-};
 
 // The record of one account: its properties, the properties it was made from (the base of the
 // three-way merge at a save), the link to its parent, and its companions, the full and sync
@@ -113,7 +96,7 @@ class ASSBasicAccount : public platform::Describable,
   void setDisplayName(const std::string& name);
 
   const AccountPtr& parentAccount() const { return parentAccount_; }
-  void setParentAccount(const AccountPtr& parent) { parentAccount_ = parent; }
+  virtual void setParentAccount(const AccountPtr& parent) { parentAccount_ = parent; }
   std::optional<std::string> parentAccountIdentifier() const;
 
   // The name of the record's own class, as log lines print it; not the property "Class".
@@ -169,7 +152,46 @@ class ASSBasicAccount : public platform::Describable,
   // record is left without a list, as if nothing had ever been stored.
   void setEnabledForDataclasses(const StringList& dataclasses);
 
+  // --- Full and sync account ---
+  //
+  // Which class makes them for a type stands in the catalogue of account creators, a resource that
+  // is read once per process; the bundles that define the classes are loaded when they are first
+  // needed and stay loaded. A creation that failed is tried again at the next call.
+
+  // The full account, made at the first call and then kept. Asks the creator class for the class to
+  // instantiate when it can tell one, else for the account. An InternalConsistencyFailure when the
+  // catalogue is malformed, a bundle does not load, the class is not there or no account comes
+  // back.
+  //   loader  null, or one that is asked first whether it has loaded the code itself
+  FullAccountPtr fullAccountUsingLoader(FullAccountLoader* loader);
+  // Holds `account` as the full account from here on.
+  void setFullAccount(const FullAccountPtr& account);
+  // The name of the class that creates full (sync) accounts of the type; empty when nobody does.
+  // Loads the bundle of every entry that matches; the last one's class counts. Malformed entries
+  // are an InternalConsistencyFailure.
+  std::optional<std::string> fullAccountCreatorClassNameForAccountTypeLoader(
+      const std::string& type, FullAccountLoader* loader) const;
+  std::optional<std::string> syncAccountCreatorClassNameForAccountType(
+      const std::string& type) const;
+  // Have the sync account refresh one container, the list of containers, or all containers of a
+  // dataclass; what it answers, and false without one. The short forms pass false to the long ones
+  // of the same record.
+  virtual bool refreshContainerWithIdentifierForDataclassIsUserRequested(
+      std::string_view containerIdentifier, std::string_view dataclass, bool isUserRequested);
+  virtual bool refreshContainerListForDataclassIsUserRequested(std::string_view dataclass,
+                                                               bool isUserRequested);
+  virtual bool refreshContainersForDataclassIsUserRequested(std::string_view dataclass,
+                                                            bool isUserRequested);
+  bool refreshContainerWithIdentifierForDataclass(std::string_view containerIdentifier,
+                                                  std::string_view dataclass);
+  bool refreshContainerListForDataclass(std::string_view dataclass);
+  bool refreshContainersForDataclass(std::string_view dataclass);
+  // Renews nothing, and tells the handler so, with 3, before it returns.
+  void renewAccountCredentialsWithHandler(const std::function<void(int)>& handler);
+
  protected:
+  friend class ASSAccountsManager;  // reads the catalogue of creators for its notifiers
+
   // Makes a record of a subclass as initWithProperties does.
   template <typename Account>
   static std::shared_ptr<Account> _recordWithProperties(
@@ -185,6 +207,17 @@ class ASSBasicAccount : public platform::Describable,
   static bool _isValidAccountType(const std::optional<std::string>& type);
   // Reads the catalogue of dataclasses afresh; empty when it is missing or unreadable.
   static std::optional<propertylist::Dictionary> _dataclassesProperties();
+
+  // The catalogue of account creators; empty when it is missing or unreadable.
+  static const std::optional<propertylist::Dictionary>& _accountCreationMap();
+  // Reads that catalogue afresh.
+  static std::optional<propertylist::Dictionary> _creatorsInfo();
+  std::optional<std::string> _creatorClassNameForAccountTypeCreatorTypeLoader(
+      const std::string& type, std::string_view creatorType, FullAccountLoader* loader) const;
+  // The sync account, made at the first call and then kept; null when the type has no creator of
+  // one, and, with a log line, when it could not be made. A malformed catalogue is an
+  // InternalConsistencyFailure here too.
+  SyncAccountPtr _cachedSyncAccount();
 
   // Like setAccountPropertyForKey, "Type" and "Class" included.
   void _forcedSetAccountPropertyForKey(const std::optional<propertylist::Value>& value,
@@ -203,8 +236,8 @@ class ASSBasicAccount : public platform::Describable,
   AccountPtr parentAccount_;
   propertylist::Dictionary originalProperties_;
   propertylist::Dictionary properties_;
-  std::shared_ptr<AccountFullAccountProtocol> fullAccount_;
-  std::shared_ptr<AccountSyncAccountProtocol> syncAccount_;
+  FullAccountPtr fullAccount_;
+  SyncAccountPtr syncAccount_;
 };
 
 // Whether the account's type is one of `types`.

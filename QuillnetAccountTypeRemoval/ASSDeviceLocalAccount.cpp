@@ -7,6 +7,22 @@ namespace accountsettings {
 
 using propertylist::Dictionary;
 
+namespace {
+
+// The class as creators of full accounts are looked up: by name.
+class DeviceLocalAccountClass final : public platform::RuntimeClass, public FullAccountCreator {
+ public:
+  DeviceLocalAccountClass() { platform::registerClass(*this); }
+  std::string className() const override { return "ASSDeviceLocalAccount"; }
+  FullAccountPtr accountWithBasicAccount(const AccountPtr& account) override {
+    return ASSDeviceLocalAccount::accountWithBasicAccount(*account);
+  }
+};
+
+DeviceLocalAccountClass deviceLocalAccountClass;
+
+}  // namespace
+
 DeviceLocalAccountPtr ASSDeviceLocalAccount::accountWithProperties(const Dictionary& properties) {
   return initWithProperties(properties);
 }
@@ -46,6 +62,10 @@ std::optional<std::string> ASSDeviceLocalAccount::identifier() const { return _i
 
 std::optional<std::string> ASSDeviceLocalAccount::syncStoreIdentifier() const {
   return identifier();
+}
+
+void ASSDeviceLocalAccount::setParentAccount(const AccountPtr& parent) {
+  ASSBasicAccount::setParentAccount(parent);
 }
 
 std::optional<std::string> ASSDeviceLocalAccount::displayName() const { return classTypeString(); }

@@ -20,7 +20,7 @@ using DeviceLocalAccountPtr = std::shared_ptr<ASSDeviceLocalAccount>;
 //
 // The operations under "Local stores" reach the platform's stores. They log what fails and raise
 // nothing; they are defined in localdata/.
-class ASSDeviceLocalAccount : public ASSBasicAccount {
+class ASSDeviceLocalAccount : public ASSBasicAccount, public AccountFullAccountProtocol {
  public:
   using ASSBasicAccount::ASSBasicAccount;
 
@@ -42,6 +42,7 @@ class ASSDeviceLocalAccount : public ASSBasicAccount {
   std::optional<std::string> syncStoreIdentifier() const override;
   std::optional<std::string> displayName() const override;
   std::string className() const override { return "ASSDeviceLocalAccount"; }
+  void setParentAccount(const AccountPtr& parent) override;
 
   // --- Local stores (AccountSettingsUI) ---
 

@@ -1,0 +1,221 @@
+// Telling the notifier classes of code bundles what changed.
+
+#include <set>
+
+#include "QuillnetAccountTypeRemoval/ASSAccountsManager.h"
+#include "QuillnetAccountTypeRemoval/Assertions.h"
+#include "QuillnetAccountTypeRemoval/BundleAnchor.h"
+#include "platform/Services.h"
+
+namespace accountsettings {
+
+using propertylist::Array;
+using propertylist::Dictionary;
+using propertylist::Value;
+
+namespace {
+
+constexpr std::string_view kSourceFile = "ASSAccountsManager";
+
+// Operators know the failures of this file by these lines.
+constexpr int kWillChangeLine = 638;
+constexpr int kDidChangeLine = 652;
+constexpr int kNoEntryLine = 820;
+constexpr int kNoFrameworkLine = 829;
+constexpr int kNotLoadedLine = 834;
+constexpr int kNoClassNameLine = 842;
+constexpr int kSendingLine = 992;
+
+StringList enabledOf(const std::optional<Dictionary>& properties) {
+  if (!properties) return {};
+  return stringsOfArray(properties->find(kAccountEnabledDataclasses)).value_or(StringList());
+}
+
+// A string of the current properties or, where they have none, of the original ones.
+const std::string* stringOfEither(const std::optional<Dictionary>& current,
+                                  const std::optional<Dictionary>& original, std::string_view key) {
+  const std::string* string = current ? propertylist::findString(*current, key) : nullptr;
+  if (string == nullptr && original) string = propertylist::findString(*original, key);
+  return string;
+}
+
+// What a change of the account is told for: not which dataclasses are on (that is looked at apart),
+// nor its children, nor whether it is active.
+Dictionary comparable(Dictionary properties) {
+  properties.remove(kAccountEnabledDataclasses);
+  properties.remove(kAccountChildAccounts);
+  properties.remove("IsActive");
+  return properties;
+}
+
+std::set<std::string> affectedDataclasses(AccountChangeType change,
+                                          const std::optional<Dictionary>& original,
+                                          const std::optional<Dictionary>& current) {
+  const StringList before = enabledOf(original);
+  const StringList now = enabledOf(current);
+  const std::set<std::string> beforeSet(before.begin(), before.end());
+  const std::set<std::string> nowSet(now.begin(), now.end());
+  if (change == AccountChangeType::deleted) return beforeSet;
+  if (change == AccountChangeType::added) return nowSet;
+  std::set<std::string> affected;
+  for (const std::string& dataclass : beforeSet) {
+    if (!nowSet.contains(dataclass)) affected.insert(dataclass);
+  }
+  for (const std::string& dataclass : nowSet) {
+    if (!beforeSet.contains(dataclass)) affected.insert(dataclass);
+  }
+  // Any other change concerns every dataclass that is still on; with none on, nobody.
+  if (!nowSet.empty() &&
+      comparable(original.value_or(Dictionary())) != comparable(current.value_or(Dictionary())))
+    affected.insert(nowSet.begin(), nowSet.end());
+  return affected;
+}
+
+// Ends at the first value that is missing.
+AccountChangeRecord changeRecord(AccountChangeType change, const std::string* identifier,
+                                 const std::string* type, const StringList& originallyEnabled) {
+  AccountChangeRecord record{{kASChangeAccountChangeTypeKey, static_cast<int>(change)}};
+  if (identifier == nullptr) return record;
+  record.set(kASChangeAccountIdentifierKey, *identifier);
+  if (type == nullptr) return record;
+  record.set(kASChangeAccountTypeKey, *type);
+  record.set(kASChangeAccountOriginallyEnabledDataclassesKey, arrayOfStrings(originallyEnabled));
+  return record;
+}
+
+void loadFramework(const Dictionary& description, const std::string& type) {
+  const std::string* framework = propertylist::findString(description, "Framework");
+  if (framework == nullptr)
+    raiseAssertionFailure(kSourceFile, kNoFrameworkLine,
+                          "Malformed AccountCreators information. Could not find the path to the "
+                          "framework for the notifier with type %@",
+                          type);
+  const platform::Services& services = platform::services();
+  const std::string path =
+      platform::joinedPath(services.deviceInfo.systemRootDirectory(), *framework);
+  if (const std::optional<std::string> error = services.classRegistry.loadLibrary(path))
+    raiseAssertionFailure(kSourceFile, kNotLoadedLine,
+                          "Could not load the account creator framework %@. Error %s", path, error);
+}
+
+// The class of a notifier, which must be there.
+platform::RuntimeClass& notifierClass(const std::string& name, int line) {
+  platform::RuntimeClass* const found = platform::services().classRegistry.classNamed(name);
+  if (found == nullptr)
+    raiseAssertionFailure(kSourceFile, line, "Could not find a class for class name %@", name);
+  return *found;
+}
+
+}  // namespace
+
+std::atomic<bool> ASSAccountsManager::shouldSkipNotifications = true;
+
+void ASSAccountsManager::_setShouldSkipNotifications(bool skip) { shouldSkipNotifications = skip; }
+
+StringList ASSAccountsManager::_notifierClassNamesForAccountTypeDataclass(
+    const std::string& type, std::string_view dataclass) {
+  const std::optional<Dictionary>& map = ASSBasicAccount::_accountCreationMap();
+  const Array* entries = map ? propertylist::findArray(*map, type) : nullptr;
+  if (entries == nullptr)
+    raiseAssertionFailure(kSourceFile, kNoEntryLine,
+                          "Malformed AccountCreators information. Could not find the information "
+                          "for the type %@",
+                          type);
+  StringList names;
+  for (const Value& value : *entries) {
+    const Dictionary* entry = value.asDictionary();
+    const std::string* entryType =
+        entry != nullptr ? propertylist::findString(*entry, "Type") : nullptr;
+    if (entryType == nullptr || *entryType != "NotifierAccount") continue;
+    const Dictionary* description = propertylist::findDictionary(*entry, "Description");
+    const Array* dataclasses = description != nullptr
+                                   ? propertylist::findArray(*description, "Supported Dataclasses")
+                                   : nullptr;
+    if (dataclasses == nullptr || !dataclasses->contains(dataclass)) continue;
+    loadFramework(*description, type);
+    const std::string* className = propertylist::findString(*description, "Class");
+    if (className == nullptr || className->empty())
+      raiseAssertionFailure(kSourceFile, kNoClassNameLine,
+                            "Malformed AccountCreators information. Could not find the name of the "
+                            "class for notificatinos with the type %@",
+                            type);
+    names.push_back(*className);
+  }
+  return names;
+}
+
+void ASSAccountsManager::accountWillChangeForDataclass(const AccountPtr& account,
+                                                       std::string_view dataclass) {
+  for (const std::string& name :
+       _notifierClassNamesForAccountTypeDataclass(account->type().value_or(""), dataclass)) {
+    platform::RuntimeClass& found = notifierClass(name, kWillChangeLine);
+    if (auto* const notifier = dynamic_cast<AccountWillChangeNotifier*>(&found))
+      notifier->accountWillChangeForDataclass(account->identifier().value_or(""), dataclass);
+  }
+}
+
+void ASSAccountsManager::accountDidChangeForDataclass(const AccountPtr& account,
+                                                      std::string_view dataclass) {
+  for (const std::string& name :
+       _notifierClassNamesForAccountTypeDataclass(account->type().value_or(""), dataclass)) {
+    platform::RuntimeClass& found = notifierClass(name, kDidChangeLine);
+    if (auto* const notifier = dynamic_cast<AccountDidChangeNotifier*>(&found))
+      notifier->accountDidChangeForDataclass(account->identifier().value_or(""), dataclass);
+  }
+}
+
+void ASSAccountsManager::
+    _addNotificationToDictionaryForChangeTypeOriginalPropertiesCurrentProperties(
+        NotificationTable& table, AccountChangeType change,
+        const std::optional<Dictionary>& original, const std::optional<Dictionary>& current) const {
+  const std::string* type = stringOfEither(current, original, kAccountType);
+  const std::string* identifier = stringOfEither(current, original, kAccountIdentifier);
+  std::set<std::string> names;
+  for (const std::string& dataclass : affectedDataclasses(change, original, current)) {
+    for (std::string& name : _notifierClassNamesForAccountTypeDataclass(
+             type != nullptr ? *type : std::string(), dataclass))
+      names.insert(std::move(name));
+  }
+  for (const std::string& name : names)
+    table[name].append(changeRecord(change, identifier, type, enabledOf(original)));
+}
+
+void ASSAccountsManager::_sendNotificationsForChangedAccounts() const {
+  NotificationTable table;
+  const auto add = [&](AccountChangeType change, const std::optional<Dictionary>& original,
+                       const std::optional<Dictionary>& current) {
+    _addNotificationToDictionaryForChangeTypeOriginalPropertiesCurrentProperties(table, change,
+                                                                                 original, current);
+  };
+  for (const auto& [identifier, original] : originalAccountsByID_) {
+    if (!topLevelAccountsByID_.contains(identifier))
+      add(AccountChangeType::deleted, original, std::nullopt);
+  }
+  for (const auto& [identifier, account] : topLevelAccountsByID_) {
+    if (!originalAccountsByID_.contains(identifier))
+      add(AccountChangeType::added, std::nullopt, account->propertiesToSave());
+  }
+  for (const auto& [identifier, original] : originalAccountsByID_) {
+    const auto current = topLevelAccountsByID_.find(identifier);
+    if (current != topLevelAccountsByID_.end())
+      add(AccountChangeType::modified, original, current->second->propertiesToSave());
+  }
+  for (const auto& [name, changes] : table) {
+    platform::RuntimeClass& found = notifierClass(name, kSendingLine);
+    // Every notifier must hear of changes: one that cannot is a broken installation.
+    dynamic_cast<AccountChangesNotifier&>(found).noteAccountChanges(changes);
+  }
+}
+
+std::optional<std::string>
+ASSAccountsManager::displayNameForGroupOfAccountTypeForBeginningOfSentence(
+    std::string_view type, bool beginningOfSentence) {
+  if (type != kSubscribedCalendarAccountType) return std::nullopt;
+  return platform::services().bundleResources.localizedString(
+      bundleAnchor(),
+      beginningOfSentence ? "SUBSCRIBED_CALENDAR_GROUP_TITLE"
+                          : "SUBSCRIBED_CALENDAR_GROUP_MID_SENTENCE_TITLE",
+      "AccountsManager");
+}
+
+}  // namespace accountsettings
