@@ -206,7 +206,7 @@ void AccountSettingsUISyncDataController::clearAnchorsForLocalDataclass(
   const Status cleared = dataSources().clearSyncAnchors(local);
   if (!cleared.isSuccess())
     logToSystem("Could not clear the anchors for %@ of account %@. Error: %@", dataclass,
-                syncAccount_->displayName(), cleared.error);
+                syncAccount_ ? syncAccount_->displayName() : std::nullopt, cleared.error);
   closeLocalSource(local);
 }
 

@@ -12,15 +12,13 @@ namespace localdata {
 
 // Moves the records of one dataclass at a time between the store of a service account and the store
 // of the device-local account, and empties or removes these stores. One controller serves one
-// account: set its syncAccount, use it, drop it.
+// account: set its syncAccount, use it, drop it. What touches the service's store needs one.
 //
 // No operation reports failure: what the platform could not do is logged, and the next step is
 // taken all the same. Every data source that an operation opens is closed by it. One thread at a
 // time.
 class AccountSettingsUISyncDataController {
  public:
-  virtual ~AccountSettingsUISyncDataController() = default;
-
   // The account whose data is merged or removed.
   const accountsettings::AccountPtr& syncAccount() const { return syncAccount_; }
   void setSyncAccount(const accountsettings::AccountPtr& account) { syncAccount_ = account; }
@@ -35,24 +33,24 @@ class AccountSettingsUISyncDataController {
   platform::DataSourcePtr createDeviceLocalSyncDataSourceForDataclass(std::string_view dataclass);
 
   // Copies the service's records into the device-local store.
-  virtual void mergeSyncDataForDataclass(std::string_view dataclass);
+  void mergeSyncDataForDataclass(std::string_view dataclass);
   // Copies the device-local records into the service's store. When calendars or reminders were
   // copied the account is marked as having its calendars migrated; it is not saved.
   void mergeLocalDataForDataclass(std::string_view dataclass);
   // Removes the service's store. Events and reminders share one: it is emptied, and removed only
   // when the account has the other of the two turned off.
-  virtual void removeDataStoreForDataclass(std::string_view dataclass);
+  void removeDataStoreForDataclass(std::string_view dataclass);
   // Empties the device-local store of calendars or reminders and hides it; of another dataclass,
   // turns it off for the device-local account and removes the store.
   void removeLocalDataStoreForDataclass(std::string_view dataclass);
   // The device-local account takes over the dataclass: it is turned on for it, and its source is
   // created and committed, also when turning it on failed.
-  virtual void createLocalDataSourceForDataclass(std::string_view dataclass);
+  void createLocalDataSourceForDataclass(std::string_view dataclass);
   // Forgets the sync state of the device-local source, so that the next tethered sync starts
   // afresh.
-  virtual void clearAnchorsForLocalDataclass(std::string_view dataclass);
+  void clearAnchorsForLocalDataclass(std::string_view dataclass);
   void hideLocalStoreForDataclass(std::string_view dataclass);
-  virtual void showLocalStoreIfAppropriateForDataclass(std::string_view dataclass);
+  void showLocalStoreIfAppropriateForDataclass(std::string_view dataclass);
   // Puts the device-local account into a fresh store and saves it.
   void saveDeviceLocalAccount();
 
