@@ -3,13 +3,11 @@
 #include <unistd.h>
 
 #include <algorithm>
-#include <cerrno>
 #include <cstdlib>
 #include <filesystem>
 #include <fstream>
 #include <iterator>
 #include <stdexcept>
-#include <system_error>
 
 #include "propertylist/Reading.h"
 #include "propertylist/Writing.h"
@@ -19,17 +17,10 @@ namespace {
 
 constexpr const char* kTemporaryDirectoryVariable = "TMPDIR";
 
-std::string newDirectory() {
-  std::string path = std::filesystem::temp_directory_path() / "in-memory-device-XXXXXX";
-  if (::mkdtemp(path.data()) == nullptr)
-    throw std::system_error(errno, std::generic_category(), "cannot make " + path);
-  return std::filesystem::canonical(path);
-}
-
 }  // namespace
 
 InMemoryDevice::InMemoryDevice()
-    : deviceInfo(newDirectory()),
+    : deviceInfo(rootDirectory.path()),
       _roles(&accountFramework, &bundleResources, &calendarStore, &classRegistry, &clock,
              &contactsStore, &deviceInfo, &fileLock, &fileServices, &preferences, &processTable,
              &restrictions, &runLoop, &syncDataSource, &systemLog, &notifyCenter, &uuidGenerator,
@@ -51,8 +42,6 @@ InMemoryDevice::~InMemoryDevice() {
     ::setenv(kTemporaryDirectoryVariable, _formerTemporaryDirectory->c_str(), 1);
   else
     ::unsetenv(kTemporaryDirectoryVariable);
-  std::error_code ignored;  // what a test made unremovable stays
-  std::filesystem::remove_all(root(), ignored);
 }
 
 std::string InMemoryDevice::settingsPath() const {

@@ -27,6 +27,7 @@
 #include "platform/testing/InMemoryUserDatabase.h"
 #include "platform/testing/InMemoryWebEngineThreadLock.h"
 #include "platform/testing/JournaledFileServices.h"
+#include "platform/testing/TemporaryDirectory.h"
 
 namespace platform {
 
@@ -50,6 +51,8 @@ class InMemoryDevice {
   ~InMemoryDevice();  // removes the directory; no service may be used any more
   InMemoryDevice(const InMemoryDevice&) = delete;
   InMemoryDevice& operator=(const InMemoryDevice&) = delete;
+
+  const TemporaryDirectory rootDirectory;
 
   // What the code under test did to the device, in order: the calls of syncDataSource,
   // contactsStore, calendarStore, notifyCenter, fileLock, processTable and runLoop. Each service's

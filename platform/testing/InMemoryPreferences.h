@@ -2,6 +2,8 @@
 
 #include <map>
 #include <string>
+#include <utility>
+#include <vector>
 
 #include "platform/PreferencesService.h"
 #include "platform/testing/FakeService.h"
@@ -13,6 +15,7 @@ class InMemoryPreferences : public PreferencesService, public FakeService {
  public:
   propertylist::Dictionary defaults;                                          // the process's own
   std::map<std::string, propertylist::Dictionary, std::less<>> applications;  // the others'
+  std::vector<std::pair<std::string, std::string>> posted;  // changes: application and key
 
   std::optional<propertylist::Value> readDefault(std::string_view key) override {
     if (_fails("readDefault", {key})) return std::nullopt;
@@ -26,7 +29,8 @@ class InMemoryPreferences : public PreferencesService, public FakeService {
     return _valueIn(found->second, key);
   }
   void postPreferencesChanged(std::string_view application, std::string_view key) override {
-    _received("postPreferencesChanged", {application, key});
+    if (!_fails("postPreferencesChanged", {application, key}))
+      posted.emplace_back(application, key);
   }
 
  private:
