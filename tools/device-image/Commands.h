@@ -1,0 +1,21 @@
+#pragma once
+
+#include <CLI/CLI.hpp>
+
+#include "tools/device-image/ExitCode.h"
+
+namespace deviceimagetool {
+
+// Each function adds one command to `app`: its options, its help and, as the callback that the
+// parser calls when the command line names it, its work. The callback sets `outcome` or throws a
+// CommandFailure. `outcome` outlives the parsing.
+void addCreateCommand(CLI::App& app, ExitCode& outcome);
+void addAddAccountCommand(CLI::App& app, ExitCode& outcome);
+void addImportCommand(CLI::App& app, ExitCode& outcome);
+void addExportCommand(CLI::App& app, ExitCode& outcome);
+void addShowCommand(CLI::App& app, ExitCode& outcome);
+void addCheckCommand(CLI::App& app, ExitCode& outcome);
+void addRestoreCommand(CLI::App& app, ExitCode& outcome);
+void addPurgeCommand(CLI::App& app, ExitCode& outcome);
+
+}  // namespace deviceimagetool

@@ -1,0 +1,51 @@
+#include <fmt/format.h>
+
+#include <memory>
+
+#include "deviceimage/SyncAgent.h"
+#include "tools/device-image/Commands.h"
+#include "tools/device-image/Images.h"
+#include "tools/device-image/import/TextLines.h"
+
+namespace deviceimagetool {
+namespace {
+
+struct Options {
+  std::string directory;
+  std::string syncAccountName;
+};
+
+void setSyncAccountName(const deviceimage::DeviceImage& image, const std::string& name) {
+  const std::string file =
+      *deviceimage::DeviceImage::preferencesFile(deviceimage::SyncAgent::kApplication);
+  const platform::Status written = image.writePropertyList(
+      file, propertylist::Dictionary{{deviceimage::SyncAgent::kAccountNameKey, name}});
+  if (!written.isSuccess())
+    throw CommandFailure(ExitCode::unexpectedFailure,
+                         fmt::format("cannot write {}: {}; remove the image and make it anew",
+                                     image.absolutePath(file), written.error->description));
+}
+
+ExitCode run(const Options& options) {
+  if (!isText(options.syncAccountName))
+    throw CommandFailure(ExitCode::wrongUsage, "the account name is not UTF-8 text");
+  const deviceimage::OpenedImage made = deviceimage::DeviceImage::create(options.directory);
+  if (!made.image) throw CommandFailure(ExitCode::refused, made.error);
+  if (!options.syncAccountName.empty()) setSyncAccountName(*made.image, options.syncAccountName);
+  return ExitCode::done;
+}
+
+}  // namespace
+
+void addCreateCommand(CLI::App& app, ExitCode& outcome) {
+  const auto options = std::make_shared<Options>();
+  CLI::App* const command = app.add_subcommand("create", "Make an image without accounts");
+  command->add_option("DIR", options->directory, "A new name, or an empty directory")->required();
+  command->add_option("--sync-account-name", options->syncAccountName,
+                      "The account name that the Quillnet sync agent knows; the stores of Quillnet "
+                      "accounts are named after it");
+  command->footer("Example:\n  device-image create my-device --sync-account-name ada");
+  command->callback([options, &outcome] { outcome = run(*options); });
+}
+
+}  // namespace deviceimagetool

@@ -1,0 +1,114 @@
+#include "tools/device-image/Files.h"
+
+#include <fcntl.h>
+#include <fmt/format.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <system_error>
+#include <utility>
+
+#include "tools/device-image/ExitCode.h"
+
+namespace deviceimagetool {
+namespace {
+
+std::string reason(int errorNumber) { return std::generic_category().message(errorNumber); }
+
+[[noreturn]] void refuse(const std::string& path, const std::string& why) {
+  throw CommandFailure(ExitCode::refused, fmt::format("{}: {}; nothing was written", path, why));
+}
+
+// A file descriptor that closes itself.
+class Descriptor {
+ public:
+  explicit Descriptor(int number) : _number(number) {}
+  ~Descriptor() {
+    if (_number >= 0) ::close(_number);
+  }
+  Descriptor(const Descriptor&) = delete;
+  Descriptor& operator=(const Descriptor&) = delete;
+  int number() const { return _number; }
+
+ private:
+  int _number;
+};
+
+}  // namespace
+
+std::string readWholeFile(const std::string& path, std::size_t limit) {
+  // Opening a pipe must not wait for a writer.
+  const Descriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
+  if (file.number() < 0) refuse(path, reason(errno));
+  struct stat status {};
+  if (::fstat(file.number(), &status) != 0) refuse(path, reason(errno));
+  if (!S_ISREG(status.st_mode)) refuse(path, "it is no regular file");
+  std::string bytes;
+  const std::size_t expected = static_cast<std::size_t>(status.st_size);
+  for (;;) {
+    if (bytes.size() > limit || expected > limit)
+      refuse(path, fmt::format("it is larger than {} MiB; divide it", limit >> 20U));
+    const std::size_t size = bytes.size();
+    // One byte more than expected shows the end at the second read.
+    bytes.resize(size < expected ? expected + 1 : size + 65'536);
+    const ssize_t count = ::read(file.number(), bytes.data() + size, bytes.size() - size);
+    if (count < 0 && errno != EINTR) refuse(path, reason(errno));
+    bytes.resize(size + (count > 0 ? static_cast<std::size_t>(count) : 0));
+    if (count == 0) return bytes;
+  }
+}
+
+Output::Output(std::string path) : _path(std::move(path)) {
+  if (_path.empty()) {
+    _file = stdout;
+    return;
+  }
+  _temporaryPath = _path + ".XXXXXX";
+  const int descriptor = ::mkostemp(_temporaryPath.data(), O_CLOEXEC);  // mode 0600
+  if (descriptor < 0) {
+    const int errorNumber = errno;
+    _temporaryPath.clear();
+    refuse(_path, reason(errorNumber));
+  }
+  _file = ::fdopen(descriptor, "w");
+  if (_file == nullptr) _fail(errno);
+}
+
+Output::~Output() {
+  if (_file != nullptr && _file != stdout) std::fclose(_file);
+  if (!_temporaryPath.empty()) ::unlink(_temporaryPath.c_str());
+}
+
+void Output::write(std::string_view bytes) {
+  if (std::fwrite(bytes.data(), 1, bytes.size(), _file) != bytes.size()) _fail(errno);
+}
+
+void Output::finish() {
+  if (std::fflush(_file) != 0) _fail(errno);
+  if (_file == stdout) return;
+  if (::fsync(::fileno(_file)) != 0) _fail(errno);
+  if (std::fclose(std::exchange(_file, nullptr)) != 0) _fail(errno);
+  if (::rename(_temporaryPath.c_str(), _path.c_str()) != 0) _fail(errno);
+  _temporaryPath.clear();
+}
+
+void Output::_fail(int errorNumber) {
+  throw CommandFailure(ExitCode::unexpectedFailure,
+                       fmt::format("cannot write {}: {}; make room or give another --output",
+                                   _path.empty() ? "standard output" : _path, reason(errorNumber)));
+}
+
+Progress::Progress(std::string_view what, std::size_t total)
+    : _what(what), _total(total), _isShown(total > 1 && ::isatty(STDERR_FILENO) == 1) {}
+
+void Progress::step() {
+  ++_done;
+  if (_isShown) fmt::print(stderr, "\r{} {} of {}", _what, _done, _total);
+}
+
+void Progress::clear() {
+  if (_isShown) fmt::print(stderr, "\r\x1B[K");
+}
+
+}  // namespace deviceimagetool

@@ -1,0 +1,52 @@
+#pragma once
+
+#include <cstddef>
+#include <cstdio>
+#include <string>
+#include <string_view>
+
+namespace deviceimagetool {
+
+// The folder that holds the bookmarks which lie in no folder.
+inline constexpr std::string_view kTopBookmarksFolder = "Bookmarks";
+
+// The content of a regular file. A file that cannot be read, or is larger than `limit`, ends the
+// command before anything is written.
+std::string readWholeFile(const std::string& path, std::size_t limit);
+
+// Where a command writes records: standard output, or a file that takes its name only when it is
+// complete, readable by its owner only.
+class Output {
+ public:
+  // An empty path is standard output. Ends the command when the file cannot be made.
+  explicit Output(std::string path);
+  ~Output();  // removes what was not finished
+  Output(const Output&) = delete;
+  Output& operator=(const Output&) = delete;
+
+  void write(std::string_view bytes);
+  // Makes what was written lasting. Ends the command when that fails.
+  void finish();
+
+ private:
+  [[noreturn]] void _fail(int errorNumber);
+  std::string _path;
+  std::string _temporaryPath;
+  std::FILE* _file = nullptr;
+};
+
+// Counts steps on a terminal, in one line that it wipes; silent when standard error is none.
+class Progress {
+ public:
+  Progress(std::string_view what, std::size_t total);
+  void step();
+  void clear();
+
+ private:
+  std::string_view _what;
+  std::size_t _total;
+  std::size_t _done = 0;
+  bool _isShown;
+};
+
+}  // namespace deviceimagetool

@@ -1,0 +1,142 @@
+#include <fmt/format.h>
+
+#include <memory>
+#include <utility>
+#include <vector>
+
+#include "deviceimage/RecordStores.h"
+#include "tools/device-image/AccountStores.h"
+#include "tools/device-image/Commands.h"
+#include "tools/device-image/Files.h"
+#include "tools/device-image/Images.h"
+#include "tools/device-image/import/BookmarksReader.h"
+#include "tools/device-image/import/CalendarReader.h"
+#include "tools/device-image/import/CardReader.h"
+#include "tools/device-image/import/NotesReader.h"
+#include "tools/device-image/import/TextLines.h"
+
+namespace deviceimagetool {
+namespace {
+
+using deviceimage::Dataclass;
+using deviceimage::NewRecord;
+using deviceimage::RecordStores;
+
+struct Options {
+  std::string directory, dataclass, account, collection;
+  std::vector<std::string> files;
+};
+
+// What a run has read so far.
+struct Gathered {
+  std::vector<NewRecord> records;
+  std::size_t badCount = 0;
+};
+
+ReadText readText(Dataclass dataclass, std::string_view bytes) {
+  switch (dataclass) {
+    case Dataclass::calendars:
+    case Dataclass::reminders:
+      return readCalendars(bytes);
+    case Dataclass::bookmarks:
+      return readBookmarks(bytes);
+    case Dataclass::notes:
+      return readNotes(bytes);
+    case Dataclass::contacts:
+    case Dataclass::mail:
+      break;
+  }
+  return readCards(bytes);
+}
+
+// Where the record goes in its store; empty for the store's usual place.
+std::vector<std::string> collectionPath(const TextRecord& record, const std::string& collection) {
+  std::vector<std::string> path;
+  if (!collection.empty()) path.push_back(collection);
+  if (record.folder) path.insert(path.end(), record.folder->begin(), record.folder->end());
+  if (record.folder && path.empty()) path.emplace_back(kTopBookmarksFolder);
+  return path;
+}
+
+void reportProblems(const std::string& file, const ReadText& text) {
+  for (const Problem& problem : text.problems)
+    printMessage(fmt::format("{}:{}: {}; {}", file, problem.line, problem.what, problem.remedy));
+}
+
+// Says which records of the file belong to the other dataclass of calendars.
+void reportSkipped(const std::string& file, Dataclass dataclass, std::size_t skipped) {
+  if (skipped == 0) return;
+  const bool areEvents = dataclass == Dataclass::reminders;
+  printMessage(fmt::format("{}: {} {} left out; import them with --dataclass {}", file, skipped,
+                           areEvents ? "events" : "to-dos", areEvents ? "calendars" : "reminders"));
+}
+
+void gather(const Options& options, Dataclass dataclass, const std::string& file,
+            Gathered& gathered) {
+  ReadText text = readText(dataclass, readWholeFile(file, kMaximumFileSize));
+  reportProblems(file, text);
+  gathered.badCount += text.problems.size();
+  std::size_t skipped = 0;
+  for (TextRecord& record : text.records) {
+    if (record.dataclass != dataclass) {
+      ++skipped;
+      continue;
+    }
+    gathered.records.push_back({collectionPath(record, options.collection), std::move(record.uid),
+                                std::move(record.bytes), record.modified.value_or(0)});
+  }
+  reportSkipped(file, dataclass, skipped);
+}
+
+ExitCode run(const Options& options) {
+  const Dataclass dataclass = recordDataclassNamed(options.dataclass);
+  if (!isText(options.collection))
+    throw CommandFailure(ExitCode::wrongUsage, "the collection's name is not UTF-8 text");
+  const LockedImage locked = openImageForWriting(options.directory);
+  const ChosenStore store = chooseStore(*locked.image, dataclass, options.account);
+  Gathered gathered;
+  Progress progress("reading", options.files.size());
+  for (const std::string& file : options.files) {
+    progress.step();
+    gather(options, dataclass, file, gathered);
+  }
+  progress.clear();
+  RecordStores stores(locked.image, RecordStores::Access::readWrite);
+  const RecordStores::Added added =
+      stores.addRecords(dataclass, store.storeIdentifier, gathered.records);
+  requireSuccess(added.status, "nothing was imported");
+  fmt::print("{}: {} added, {} already there, {} conflicting copies, {} bad; {}\n",
+             deviceimage::dataclassName(dataclass), added.placed.added, added.placed.alreadyThere,
+             added.placed.conflicts, gathered.badCount, store.description);
+  return gathered.badCount == 0 ? ExitCode::done : ExitCode::someRecordsBad;
+}
+
+}  // namespace
+
+void addImportCommand(CLI::App& app, ExitCode& outcome) {
+  const auto options = std::make_shared<Options>();
+  CLI::App* const command = app.add_subcommand("import", "Put the records of files into a store");
+  command->add_option("DIR", options->directory, "The image")->required();
+  command
+      ->add_option("FILE", options->files,
+                   "vCard (contacts), iCalendar (calendars, reminders), bookmarks HTML or text "
+                   "notes")
+      ->required();
+  command
+      ->add_option("--dataclass", options->dataclass,
+                   "contacts, calendars, reminders, bookmarks or notes")
+      ->required();
+  command->add_option("--account", options->account,
+                      "The identifier of the account whose store takes them; otherwise the local "
+                      "store does");
+  command->add_option("--collection", options->collection,
+                      "The address book, calendar, list or folder in the store");
+  command->footer(
+      "A bad record is named with its file and line, the others are imported (exit code 4).\n\n"
+      "Examples:\n"
+      "  device-image import my-device --dataclass contacts family.vcf friends.vcf\n"
+      "  device-image import my-device --dataclass calendars --account Q1 work.ics");
+  command->callback([options, &outcome] { outcome = run(*options); });
+}
+
+}  // namespace deviceimagetool

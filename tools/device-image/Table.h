@@ -1,0 +1,20 @@
+#pragma once
+
+#include <string>
+#include <vector>
+
+namespace deviceimagetool {
+
+// Rows of texts, printed in aligned columns two blanks apart.
+class Table {
+ public:
+  explicit Table(std::vector<std::string> heading) { addRow(std::move(heading)); }
+  // As many cells as the heading has. Control characters are shown as "?".
+  void addRow(std::vector<std::string> cells);
+  std::string text() const;
+
+ private:
+  std::vector<std::vector<std::string>> _rows;
+};
+
+}  // namespace deviceimagetool

@@ -1,0 +1,92 @@
+#include "tools/device-image/TypedProperty.h"
+
+#include <fmt/format.h>
+
+#include <charconv>
+#include <cmath>
+#include <optional>
+
+#include "tools/device-image/ExitCode.h"
+#include "tools/device-image/import/TextLines.h"
+#include "tools/device-image/import/Timestamps.h"
+
+namespace deviceimagetool {
+
+using propertylist::Value;
+
+namespace {
+
+constexpr std::int64_t kSecondsFrom1970To2001 = 978'307'200;
+
+template <typename Number>
+std::optional<Value> numberOf(std::string_view text) {
+  Number number = 0;
+  const auto parsed = std::from_chars(text.data(), text.data() + text.size(), number);
+  if (parsed.ec != std::errc{} || parsed.ptr != text.data() + text.size()) return std::nullopt;
+  return Value(number);
+}
+
+std::optional<Value> integerOf(std::string_view text) {
+  if (auto number = numberOf<std::int64_t>(text)) return number;
+  return numberOf<std::uint64_t>(text);
+}
+
+std::optional<Value> booleanOf(std::string_view text) {
+  if (text == "true" || text == "yes") return Value(true);
+  if (text == "false" || text == "no") return Value(false);
+  return std::nullopt;
+}
+
+std::optional<Value> dateOf(std::string_view text) {
+  const std::optional<std::int64_t> seconds = secondsOfISODate(text);
+  if (!seconds) return std::nullopt;
+  return Value(propertylist::Date{static_cast<double>(*seconds - kSecondsFrom1970To2001)});
+}
+
+std::optional<Value> dataOf(std::string_view text) {
+  if (text.size() % 2 != 0) return std::nullopt;
+  propertylist::Bytes bytes;
+  for (std::size_t i = 0; i < text.size(); i += 2) {
+    std::uint8_t byte = 0;
+    const auto parsed = std::from_chars(text.data() + i, text.data() + i + 2, byte, 16);
+    if (parsed.ec != std::errc{} || parsed.ptr != text.data() + i + 2) return std::nullopt;
+    bytes.push_back(byte);
+  }
+  return Value(bytes);
+}
+
+std::optional<Value> valueOf(std::string_view kind, std::string_view text) {
+  if (kind == "integer") return integerOf(text);
+  if (kind == "real") return numberOf<double>(text);
+  if (kind == "boolean") return booleanOf(text);
+  if (kind == "date") return dateOf(text);
+  if (kind == "data") return dataOf(text);
+  if (kind == "string" && isText(text)) return Value(text);
+  return std::nullopt;
+}
+
+}  // namespace
+
+std::pair<std::string, Value> typedProperty(const std::string& text) {
+  const std::size_t equals = text.find('=');
+  std::string key = text.substr(0, equals);
+  if (equals == std::string::npos || key.empty() || !isText(key))
+    throw CommandFailure(ExitCode::wrongUsage,
+                         fmt::format("\"{}\" is no property; write KEY=VALUE", text));
+  std::string kind = "string";
+  const std::size_t colon = key.rfind(':');
+  if (colon != std::string::npos && colon != 0) {
+    kind = key.substr(colon + 1);
+    key.resize(colon);
+  }
+  std::optional<Value> value = valueOf(kind, std::string_view(text).substr(equals + 1));
+  if (!value)
+    throw CommandFailure(
+        ExitCode::wrongUsage,
+        fmt::format("the value of \"{}\" is no {}; write KEY:KIND=VALUE, where KIND is string, "
+                    "integer, real, boolean, date or data",
+                    text, kind));
+  return {std::move(key), *std::move(value)};
+}
+
+}  // namespace deviceimagetool

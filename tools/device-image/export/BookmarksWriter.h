@@ -1,0 +1,13 @@
+#pragma once
+
+#include "deviceimage/RecordStores.h"
+#include "tools/device-image/Files.h"
+
+namespace deviceimagetool {
+
+// Writes the bookmarks of stores as the HTML that browsers import: one list for each folder, each
+// bookmark as it lies in its store. Empty folders are kept.
+void writeBookmarks(deviceimage::RecordStores& records,
+                    const std::vector<deviceimage::Store>& stores, Output& output);
+
+}  // namespace deviceimagetool

@@ -1,0 +1,89 @@
+#include "tools/device-image/import/ContentLines.h"
+
+#include <algorithm>
+
+namespace deviceimagetool {
+namespace {
+
+constexpr std::size_t kNone = std::string_view::npos;
+
+bool isNameLetter(char c) {
+  return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9') || c == '-' ||
+         c == '_';
+}
+
+// The offset of the first of `wanted` outside quotation marks, at or after `position`.
+std::size_t findOutsideQuotes(std::string_view text, std::string_view wanted,
+                              std::size_t position) {
+  bool quoted = false;
+  for (std::size_t i = position; i < text.size(); ++i) {
+    if (text[i] == '"') quoted = !quoted;
+    if (!quoted && wanted.find(text[i]) != kNone) return i;
+  }
+  return kNone;
+}
+
+// Fills name, parameters and value from the unfolded text; leaves the name empty when it is none.
+void splitProperty(std::string_view text, ContentLine& line) {
+  const std::size_t nameEnd = text.find_first_of(";:");
+  if (nameEnd == kNone) return;
+  const std::size_t colon = text[nameEnd] == ':' ? nameEnd : findOutsideQuotes(text, ":", nameEnd);
+  if (colon == kNone) return;
+  std::string_view name = text.substr(0, nameEnd);
+  const std::size_t dot = name.find('.');
+  if (dot != kNone) name.remove_prefix(dot + 1);
+  if (!std::all_of(name.begin(), name.end(), isNameLetter)) return;
+  line.name = upperCased(name);
+  if (nameEnd < colon) line.parameters = text.substr(nameEnd + 1, colon - nameEnd - 1);
+  line.value = trimmed(text.substr(colon + 1));
+}
+
+}  // namespace
+
+bool ContentLine::is(std::string_view propertyName, std::string_view propertyValue) const {
+  return name == propertyName && equalsIgnoringCase(value, propertyValue);
+}
+
+std::optional<std::string> ContentLine::parameter(std::string_view parameterName) const {
+  for (std::size_t start = 0; start < parameters.size();) {
+    const std::size_t stop = std::min(findOutsideQuotes(parameters, ";", start), parameters.size());
+    const std::string_view one = std::string_view(parameters).substr(start, stop - start);
+    const std::size_t equals = one.find('=');
+    if (equals != kNone && equalsIgnoringCase(one.substr(0, equals), parameterName)) {
+      std::string_view found = one.substr(equals + 1);
+      if (found.size() >= 2 && found.front() == '"' && found.back() == '"')
+        found = found.substr(1, found.size() - 2);
+      return std::string(found);
+    }
+    start = stop + 1;
+  }
+  return std::nullopt;
+}
+
+std::optional<ContentLine> ContentLines::next() {
+  const std::optional<TextLine> first = _lines.next();
+  if (!first) return std::nullopt;
+  ContentLine line;
+  line.begin = first->begin;
+  line.end = first->end;
+  line.number = first->number;
+  std::string_view text = first->text;
+  if (text.starts_with(kByteOrderMark)) {
+    text.remove_prefix(kByteOrderMark.size());
+    line.begin += kByteOrderMark.size();
+  }
+  std::string unfolded;
+  for (std::optional<char> c = _lines.peek(); c == ' ' || c == '\t'; c = _lines.peek()) {
+    if (unfolded.empty()) unfolded = text;
+    const std::optional<TextLine> more = _lines.next();
+    unfolded += more->text.substr(1);
+    line.end = more->end;
+    text = unfolded;
+  }
+  line.isBlank = trimmed(text).empty();
+  line.isText = deviceimagetool::isText(text);
+  splitProperty(text, line);
+  return line;
+}
+
+}  // namespace deviceimagetool

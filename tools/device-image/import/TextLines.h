@@ -1,0 +1,48 @@
+#pragma once
+
+#include <cstddef>
+#include <optional>
+#include <string>
+#include <string_view>
+
+namespace deviceimagetool {
+
+// One line of a text. `text` leaves out the line end (LF or CR LF); `begin` and `end` are the
+// offsets of the whole line, its line end included.
+struct TextLine {
+  std::string_view text;
+  std::size_t begin = 0;
+  std::size_t end = 0;
+  std::size_t number = 0;  // from 1
+};
+
+// Walks the lines of a text, which outlives it.
+class TextLines {
+ public:
+  explicit TextLines(std::string_view bytes) : _bytes(bytes) {}
+  // The next line; empty at the end. A last line without a line end counts.
+  std::optional<TextLine> next();
+  // The byte that the next line begins with; empty at the end.
+  std::optional<char> peek() const;
+
+ private:
+  std::string_view _bytes;
+  std::size_t _position = 0;
+  std::size_t _number = 0;
+};
+
+// The byte order mark that some programs put before UTF-8.
+inline constexpr std::string_view kByteOrderMark = "\xEF\xBB\xBF";
+
+// Whether the bytes are UTF-8: no overlong form, no surrogate, nothing above U+10FFFF, and no NUL,
+// which no text holds.
+bool isText(std::string_view bytes);
+
+// Without blanks, tabs and line ends on both sides.
+std::string_view trimmed(std::string_view text);
+
+// ASCII letters only; other bytes stay.
+std::string upperCased(std::string_view text);
+bool equalsIgnoringCase(std::string_view a, std::string_view b);
+
+}  // namespace deviceimagetool
