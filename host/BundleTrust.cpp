@@ -1,0 +1,62 @@
+#include "host/BundleTrust.h"
+
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <filesystem>
+#include <system_error>
+
+namespace host {
+namespace {
+
+std::string errorText(int number) { return std::generic_category().message(number); }
+
+// A group counts as the caller's own when its number is the caller's: the private group of a user.
+bool othersMayWrite(const struct stat& status) {
+  const bool groupIsOwn = status.st_gid == 0 || status.st_gid == geteuid();
+  return (status.st_mode & S_IWOTH) != 0 || ((status.st_mode & S_IWGRP) != 0 && !groupIsOwn);
+}
+
+bool ownerIsTrusted(const struct stat& status) {
+  return status.st_uid == 0 || status.st_uid == geteuid();
+}
+
+std::optional<std::string> whyFolderAboveIsNotTrusted(const std::string& path) {
+  struct stat status = {};
+  if (lstat(path.c_str(), &status) != 0)
+    return path + " cannot be looked at: " + errorText(errno) + ".";
+  if (!S_ISDIR(status.st_mode)) return path + " is no folder.";
+  if (othersMayWrite(status) && (status.st_mode & S_ISVTX) == 0)
+    return path +
+           " may be written by others, who could replace the migrator in it; take the right " +
+           "from them with chmod go-w.";
+  if (!ownerIsTrusted(status))
+    return path +
+           " belongs to another user, who could replace the migrator in it; give it to the " +
+           "user who runs the host or to root with chown.";
+  return std::nullopt;
+}
+
+}  // namespace
+
+std::optional<std::string> whyNotTrusted(const std::string& path) {
+  struct stat status = {};
+  if (lstat(path.c_str(), &status) != 0)
+    return path + " cannot be looked at: " + errorText(errno) + "; install the migrator again.";
+  if (!S_ISREG(status.st_mode) && !S_ISDIR(status.st_mode))
+    return path + " is neither a file nor a folder; install the migrator again.";
+  if (othersMayWrite(status))
+    return path + " may be written by others; take the right from them with chmod go-w.";
+  if (!ownerIsTrusted(status))
+    return path +
+           " belongs to another user; give it to the user who runs the host or to root with " +
+           "chown.";
+  for (std::filesystem::path above = std::filesystem::path(path).parent_path();;
+       above = above.parent_path()) {
+    if (auto reason = whyFolderAboveIsNotTrusted(above.string())) return reason;
+    if (above == above.parent_path()) return std::nullopt;
+  }
+}
+
+}  // namespace host

@@ -1,0 +1,247 @@
+#include "host/MigrationHost.h"
+
+#include <algorithm>
+#include <utility>
+
+#include "deviceimage/DeviceImageServices.h"
+#include "deviceimage/ImageLock.h"
+#include "deviceimage/RecordStores.h"
+#include "deviceimage/SyncAgent.h"
+#include "host/AccountComparison.h"
+#include "host/ProcessTree.h"
+#include "host/RecordAccounting.h"
+#include "host/StaleFiles.h"
+#include "host/StartChecks.h"
+
+namespace host {
+namespace {
+
+using deviceimage::DeviceImage;
+using deviceimage::ImageLock;
+using deviceimage::RecordStores;
+
+// A report stays readable whatever a migrator writes; the image's system log has every line.
+constexpr std::size_t kMaximumLogSize = std::size_t{64} << 20U;  // bytes
+
+std::string sentenceFor(const MigratorOutcome& migrator) {
+  const std::string detail = migrator.detail.empty() ? "." : " (" + migrator.detail + ").";
+  switch (migrator.ending) {
+    case Ending::succeeded:
+      return {};
+    case Ending::failed:
+      return migrator.name + " reports that its migration failed" + detail;
+    case Ending::notLoaded:
+      return migrator.name + " could not be loaded" + detail;
+    case Ending::raised:
+      return migrator.name + " raised a failure" + detail;
+    case Ending::crashed:
+      return migrator.name + " crashed" + detail;
+    case Ending::left:
+      return migrator.name + " ended its process without an answer" + detail;
+    case Ending::timedOut:
+      return migrator.name + " ran past its limit and was stopped" + detail;
+    case Ending::interrupted:
+      return migrator.name + " was stopped because the run was interrupted" + detail;
+    case Ending::notStarted:
+      return migrator.name + " could not be given a process" + detail;
+  }
+  return {};
+}
+
+std::string textOf(const platform::Status& status) {
+  return status.error ? status.error->description : "error " + std::to_string(status.code);
+}
+
+Selection selectionOf(const std::shared_ptr<const DeviceImage>& image,
+                      const std::vector<MigratorBundle>& bundles) {
+  const deviceimage::DeviceImageServices services(image);
+  Selection selection;
+  selection.statusKey = services.services().accountFramework.QuillnetStatusKey();
+  for (const MigratorBundle& bundle : bundles)
+    if (!bundle.retiredAccountTypes.empty())
+      selection.rules.push_back({bundle.retiredAccountTypes, bundle.retiredServiceStatus});
+  return selection;
+}
+
+std::vector<std::string> correctedKeysOf(const std::vector<MigratorBundle>& bundles) {
+  std::vector<std::string> keys;
+  for (const MigratorBundle& bundle : bundles)
+    keys.insert(keys.end(), bundle.correctedAccountKeys.begin(), bundle.correctedAccountKeys.end());
+  return keys;
+}
+
+void append(std::vector<std::string>& target, const std::vector<std::string>& added) {
+  target.insert(target.end(), added.begin(), added.end());
+}
+
+}  // namespace
+
+MigrationHost::MigrationHost(RunListener& listener, Interruption& interruption)
+    : _listener(listener), _interruption(interruption) {}
+
+MigrationReport MigrationHost::run(const RunOptions& options) {
+  _report.image = options.image;
+  const deviceimage::OpenedImage opened = DeviceImage::open(options.image);
+  if (!opened.image) {
+    _refuse(opened.error);
+    return std::move(_report);
+  }
+  _image = opened.image;
+  _report.image = _image->rootPath();
+  const ImageLock::Attempt attempt = ImageLock::tryAcquire(*_image);
+  switch (attempt.outcome) {
+    case ImageLock::Outcome::held:
+      _runUnderLock(options);
+      break;
+    case ImageLock::Outcome::heldByAnother:
+      _report.outcome = RunOutcome::busy;
+      _report.reasons.push_back(attempt.error);
+      break;
+    case ImageLock::Outcome::failed:
+      _refuse(_report.image + " cannot be locked: " + attempt.error +
+              "; give the right to write, or mount the image so that it can be written.");
+      break;
+  }
+  return std::move(_report);
+}
+
+void MigrationHost::_refuse(std::string reason) {
+  _report.outcome = RunOutcome::refused;
+  _report.reasons.push_back(std::move(reason));
+}
+
+void MigrationHost::_runUnderLock(const RunOptions& options) {
+  _listener.stageBegan("Checking the image");
+  _readBundles(options);
+  for (std::string& reason : reasonsNotToStart(*_image, readSettings(*_image), _bundles))
+    _refuse(std::move(reason));
+  if (!_report.reasons.empty() || !_prepare()) return;
+
+  _listener.stageBegan("Looking at the image before");
+  const Observation before = observe(_image);
+  if (!before.error.empty()) return _refuse(before.error);
+  const Selection selection = selectionOf(_image, _bundles);
+  const deviceimage::SyncAgent agent(*_image);
+  if (!_interruption.requested()) _runMigrators(options);
+
+  _listener.stageBegan("Looking at the image after");
+  const Observation after = observe(_image);
+  _compare(before, after, selection, agent);
+  _judge();
+}
+
+void MigrationHost::_readBundles(const RunOptions& options) {
+  std::vector<ReadBundle> read;
+  if (options.bundle) {
+    read.push_back(readMigratorBundle(*options.bundle));
+  } else {
+    read = readMigratorBundlesOfImage(*_image);
+    read.insert(read.begin(), readInstalledMigratorBundle(options.installedMigrators));
+  }
+  for (ReadBundle& each : read) {
+    for (std::string& problem : each.problems) _refuse(std::move(problem));
+    if (each.bundle) _bundles.push_back(std::move(*each.bundle));
+  }
+}
+
+// Puts right what a killed run may have left. False when the databases are not fit to be migrated.
+bool MigrationHost::_prepare() {
+  RecordStores stores(_image, RecordStores::Access::readWrite);
+  const platform::Status recovered = stores.recoverDatabases();
+  if (!recovered.isSuccess()) {
+    _refuse(textOf(recovered));
+    return false;
+  }
+  removeStaleTemporaryFiles(*_image);
+  return _checkDatabases(RunOutcome::refused);
+}
+
+bool MigrationHost::_checkDatabases(RunOutcome whenDamaged) {
+  RecordStores stores(_image, RecordStores::Access::readOnly);
+  bool isFit = true;
+  for (const deviceimage::DatabaseReport& database : stores.checkDatabases()) {
+    for (const std::string& problem : database.problems) {
+      _report.outcome = whenDamaged;
+      _report.reasons.push_back(_image->absolutePath(database.path) + " is damaged: " + problem +
+                                "; bring back a sound copy.");
+      isFit = false;
+    }
+  }
+  return isFit;
+}
+
+void MigrationHost::_runMigrators(const RunOptions& options) {
+  adoptOrphans();
+  for (const MigratorBundle& bundle : _bundles) {
+    _listener.stageBegan("Running " + bundle.name);
+    const MigratorTask task = {_image->rootPath(), _image->temporaryDirectory(), bundle,
+                               options.limit};
+    MigratorOutcome outcome =
+        runMigrator(task, _interruption, [this](std::string_view line) { _keepLogLine(line); });
+    std::string sentence = sentenceFor(outcome);
+    if (!sentence.empty()) _report.reasons.push_back(std::move(sentence));
+    _report.migrators.push_back(std::move(outcome));
+    if (_interruption.requested()) return;
+  }
+}
+
+void MigrationHost::_keepLogLine(std::string_view line) {
+  _listener.logLineCame(line);
+  _report.logWasCut = _report.logWasCut || _logSize + line.size() > kMaximumLogSize;
+  if (_report.logWasCut) return;
+  _logSize += line.size() + sizeof(std::string);
+  _report.log.emplace_back(line);
+}
+
+void MigrationHost::_compare(const Observation& before, const Observation& after,
+                             const Selection& selection, const deviceimage::SyncAgent& agent) {
+  std::vector<std::string> contradictions;
+  if (!after.error.empty()) contradictions.push_back(after.error);
+  if (!after.settings.error.empty())
+    contradictions.push_back(_image->settingsFile() +
+                             " cannot be read any more: " + after.settings.error + ".");
+  AccountComparison accounts = compareAccounts(before.settings.accounts, after.settings.accounts,
+                                               selection, correctedKeysOf(_bundles));
+  _report.accounts = std::move(accounts.accounts);
+  append(contradictions, accounts.contradictions);
+  std::vector<std::string> leftBehind = std::move(accounts.leftBehind);
+  if (after.error.empty()) {
+    RecordAccounting records = accountForRecords(before, after, selection, agent);
+    _report.dataclasses = std::move(records.dataclasses);
+    append(contradictions, records.contradictions);
+    append(leftBehind, records.leftBehind);
+  }
+  append(_report.reasons, contradictions);
+  append(_report.reasons, leftBehind);
+  const bool databasesAreFit = _checkDatabases(RunOutcome::verificationFailed);
+  _report.balanced = contradictions.empty() && databasesAreFit;
+  _isAnythingLeftBehind = !leftBehind.empty();
+}
+
+// The gravest of what has happened decides.
+void MigrationHost::_judge() {
+  const auto hasEnded = [this](std::initializer_list<Ending> endings) {
+    return std::any_of(
+        _report.migrators.begin(), _report.migrators.end(), [&](const MigratorOutcome& migrator) {
+          return std::find(endings.begin(), endings.end(), migrator.ending) != endings.end();
+        });
+  };
+  const bool noneWasLoaded =
+      std::all_of(_report.migrators.begin(), _report.migrators.end(),
+                  [](const MigratorOutcome& each) { return each.ending == Ending::notLoaded; });
+  if (_interruption.requested())
+    _report.outcome = RunOutcome::interrupted;
+  else if (!_report.balanced)
+    _report.outcome = RunOutcome::verificationFailed;
+  else if (!_report.migrators.empty() && noneWasLoaded)
+    _report.outcome = RunOutcome::refused;
+  else if (hasEnded({Ending::notLoaded, Ending::raised, Ending::crashed, Ending::left,
+                     Ending::timedOut}))
+    _report.outcome = RunOutcome::migratorFailed;
+  else if (hasEnded({Ending::failed, Ending::notStarted}))
+    _report.outcome = RunOutcome::failed;
+  else
+    _report.outcome = _isAnythingLeftBehind ? RunOutcome::leftBehind : RunOutcome::done;
+}
+
+}  // namespace host

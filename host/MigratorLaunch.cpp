@@ -1,0 +1,141 @@
+#include "host/MigratorLaunch.h"
+
+#include <fcntl.h>
+#include <sys/prctl.h>
+#include <sys/resource.h>
+#include <sys/stat.h>
+#include <sys/syscall.h>
+#include <unistd.h>
+
+#include <array>
+#include <cerrno>
+#include <csignal>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "host/MigratorChild.h"
+
+namespace host {
+namespace {
+
+constexpr const char* kThisProgram = "/proc/self/exe";
+
+#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
+#define HOST_HAS_SHADOW_MEMORY 1
+#elif defined(__has_feature)
+#if __has_feature(address_sanitizer) || __has_feature(thread_sanitizer)
+#define HOST_HAS_SHADOW_MEMORY 1
+#endif
+#endif
+// A sanitizer reserves terabytes of address space for itself.
+#ifdef HOST_HAS_SHADOW_MEMORY
+constexpr rlim_t kAddressSpace = RLIM_INFINITY;
+#else
+constexpr rlim_t kAddressSpace = rlim_t{4} << 30U;  // bytes
+#endif
+
+// TMPDIR, and what those need who look into the process: the loader, sanitizers and coverage.
+std::vector<std::string> migratorEnvironment(const std::string& temporaryDirectory) {
+  std::vector<std::string> environment = {"TMPDIR=" + temporaryDirectory};
+  constexpr std::array<std::string_view, 6> kKept = {"LD_",   "ASAN_", "UBSAN_",
+                                                     "LSAN_", "TSAN_", "GCOV_"};
+  for (char** variable = environ; variable != nullptr && *variable != nullptr; ++variable)
+    for (const std::string_view prefix : kKept)
+      if (std::string_view(*variable).starts_with(prefix)) environment.emplace_back(*variable);
+  return environment;
+}
+
+std::vector<char*> pointersTo(std::vector<std::string>& strings) {
+  std::vector<char*> pointers;
+  for (std::string& string : strings) pointers.push_back(string.data());
+  pointers.push_back(nullptr);
+  return pointers;
+}
+
+// From here to the new program only what is safe after a fork is called.
+void lowerLimits() {
+  const rlimit none = {0, 0};
+  setrlimit(RLIMIT_CORE, &none);
+  rlimit space = {};
+  if (kAddressSpace == RLIM_INFINITY || getrlimit(RLIMIT_AS, &space) != 0) return;
+  if (space.rlim_max == RLIM_INFINITY || space.rlim_max > kAddressSpace) {
+    const rlimit limited = {kAddressSpace, kAddressSpace};
+    setrlimit(RLIMIT_AS, &limited);
+  }
+}
+
+void restoreSignals() {
+  struct sigaction standard = {};
+  standard.sa_handler = SIG_DFL;
+  for (int number = 1; number < NSIG; ++number) sigaction(number, &standard, nullptr);
+  sigset_t none;
+  sigemptyset(&none);
+  sigprocmask(SIG_SETMASK, &none, nullptr);
+}
+
+// The descriptors 0 to 3 become the null device, the output twice, and the channel. The sources lie
+// above 3, so that none is overwritten before its turn.
+bool arrangeDescriptors(int null, int output, int channel) {
+  const std::array<int, 4> sources = {null, output, output, channel};
+  for (int target = 0; target < 4; ++target)
+    if (dup2(sources[static_cast<std::size_t>(target)], target) < 0) return false;
+  return close_range(4, ~0U, 0) == 0;
+}
+
+[[noreturn]] void becomeMigrator(pid_t host, int null, int output, int channel,
+                                 char* const* arguments, char* const* environment) {
+  setsid();
+  prctl(PR_SET_PDEATHSIG, SIGKILL);
+  if (getppid() != host) _exit(EXIT_FAILURE);  // the host has ended already
+  umask(077);
+  lowerLimits();
+  if (arrangeDescriptors(null, output, channel)) {
+    restoreSignals();
+    execve(kThisProgram, arguments, environment);
+  }
+  sendMessage(kChannelDescriptor, MessageKind::notLoaded, "the host could not start itself anew");
+  _exit(EXIT_FAILURE);
+}
+
+// The same descriptor above those that the new process needs for itself.
+deviceimage::Descriptor movedUp(deviceimage::Descriptor descriptor) {
+  return deviceimage::Descriptor(
+      fcntl(descriptor.number(), F_DUPFD_CLOEXEC, kChannelDescriptor + 1));
+}
+
+}  // namespace
+
+std::optional<LaunchedMigrator> launchMigrator(const MigratorTask& task) {
+  std::optional<Channel> channel = makeChannel();
+  int pipeEnds[2] = {-1, -1};
+  if (!channel || pipe2(pipeEnds, O_CLOEXEC) != 0) return std::nullopt;
+  LaunchedMigrator launched;
+  launched.channel = std::move(channel->host);
+  launched.output = deviceimage::Descriptor(pipeEnds[0]);
+  const deviceimage::Descriptor childOutput = movedUp(deviceimage::Descriptor(pipeEnds[1]));
+  const deviceimage::Descriptor childChannel = movedUp(std::move(channel->child));
+  const deviceimage::Descriptor null =
+      movedUp(deviceimage::Descriptor(open("/dev/null", O_RDWR | O_CLOEXEC)));
+  if (!childOutput.isOpen() || !childChannel.isOpen() || !null.isOpen()) return std::nullopt;
+  if (fcntl(launched.output.number(), F_SETFL, O_NONBLOCK) != 0) return std::nullopt;
+
+  std::vector<std::string> arguments = {"migration-host",       kRunMigratorArgument,
+                                        task.imagePath,         task.bundle.path,
+                                        task.bundle.executable, task.bundle.principalClass};
+  std::vector<std::string> environment = migratorEnvironment(task.temporaryDirectory);
+  const std::vector<char*> argumentPointers = pointersTo(arguments);
+  const std::vector<char*> environmentPointers = pointersTo(environment);
+  const pid_t host = getpid();
+  launched.identifier = fork();
+  if (launched.identifier < 0) return std::nullopt;
+  if (launched.identifier == 0)
+    becomeMigrator(host, null.number(), childOutput.number(), childChannel.number(),
+                   argumentPointers.data(), environmentPointers.data());
+  // By its number: the library's declaration of the function does not fit C++.
+  launched.ended =
+      deviceimage::Descriptor(static_cast<int>(syscall(SYS_pidfd_open, launched.identifier, 0)));
+  return launched;
+}
+
+}  // namespace host

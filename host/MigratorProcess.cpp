@@ -1,0 +1,190 @@
+#include "host/MigratorProcess.h"
+
+#include <poll.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <array>
+#include <cerrno>
+#include <csignal>
+#include <cstring>
+#include <system_error>
+
+#include "host/MigratorLaunch.h"
+#include "host/ProcessTree.h"
+
+namespace host {
+namespace {
+
+using Clock = std::chrono::steady_clock;
+using std::chrono::milliseconds;
+
+// How much is taken from each source before the others and the clock have their turn.
+constexpr int kMessagesATurn = 256;
+constexpr int kReadsATurn = 16;
+
+// Watches one process from its start to its end.
+class Watch {
+ public:
+  Watch(LaunchedMigrator launched, const MigratorTask& task, const LineSink& sink)
+      : _process(std::move(launched)), _sink(sink), _deadline(Clock::now() + task.limit) {
+    _outcome.name = task.bundle.name;
+    _outcome.ending = Ending::left;
+  }
+
+  MigratorOutcome untilItEnds(Interruption& interruption) {
+    while (!_hasEnded()) {
+      _waitForNews(interruption);
+      _takeNews();
+      if (interruption.requested())
+        _stop(Ending::interrupted);
+      else if (Clock::now() >= _deadline)
+        _stop(Ending::timedOut);
+    }
+    _collectEnd();
+    return std::move(_outcome);
+  }
+
+ private:
+  bool _hasEnded() {
+    siginfo_t information = {};
+    return waitid(P_PID, static_cast<id_t>(_process.identifier), &information,
+                  WEXITED | WNOHANG | WNOWAIT) != 0 ||
+           information.si_pid == _process.identifier;
+  }
+
+  void _waitForNews(const Interruption& interruption) {
+    // A process that was killed needs a moment to end.
+    const auto left =
+        _stopped ? milliseconds(1000) : std::chrono::ceil<milliseconds>(_deadline - Clock::now());
+    std::array<pollfd, 4> sources = {
+        pollfd{_process.ended.number(), POLLIN, 0},
+        pollfd{_channelIsOpen ? _process.channel.number() : -1, POLLIN, 0},
+        pollfd{_outputIsOpen ? _process.output.number() : -1, POLLIN, 0},
+        pollfd{interruption.descriptor(), POLLIN, 0}};
+    poll(sources.data(), sources.size(),
+         static_cast<int>(std::clamp<milliseconds::rep>(left.count(), 0, 1000)));
+  }
+
+  void _takeNews() {
+    if (_channelIsOpen)
+      _channelIsOpen =
+          _reader.receive(_process.channel.number(), kMessagesATurn,
+                          [this](MessageKind kind, std::string_view text) { _note(kind, text); });
+    if (_outputIsOpen) _outputIsOpen = _readOutput();
+  }
+
+  void _note(MessageKind kind, std::string_view text) {
+    switch (kind) {
+      case MessageKind::line:
+        _sink(text);
+        return;
+      case MessageKind::name:
+        _outcome.name = text;
+        return;
+      case MessageKind::succeeded:
+        _answer = Ending::succeeded;
+        return;
+      case MessageKind::failed:
+        _answer = Ending::failed;
+        return;
+      case MessageKind::notLoaded:
+        _answer = Ending::notLoaded;
+        _outcome.detail = text;
+        return;
+      case MessageKind::raised:
+        _answer = Ending::raised;
+        _outcome.detail = text;
+        return;
+      case MessageKind::linePart:
+        return;
+    }
+  }
+
+  // False when nobody holds the other end any more.
+  bool _readOutput() {
+    std::array<char, 16 * 1024> buffer = {};
+    for (int count = 0; count < kReadsATurn; ++count) {
+      const ssize_t size = read(_process.output.number(), buffer.data(), buffer.size());
+      if (size < 0 && errno == EINTR) continue;
+      if (size < 0) return errno == EAGAIN;
+      if (size == 0) return false;
+      const std::size_t room = kMaximumOutput - _outcome.output.size();
+      const auto length = static_cast<std::size_t>(size);
+      _outcome.output.append(buffer.data(), std::min(room, length));
+      _outcome.outputWasCut |= length > room;
+    }
+    return true;
+  }
+
+  void _stop(Ending why) {
+    if (_stopped) return;
+    _stopped = why;
+    kill(-_process.identifier, SIGKILL);
+    kill(_process.identifier, SIGKILL);
+  }
+
+  void _collectEnd() {
+    int status = 0;
+    while (waitpid(_process.identifier, &status, 0) < 0 && errno == EINTR) {
+    }
+    kill(-_process.identifier, SIGKILL);
+    killAllChildren();
+    // The rest of what was sent; all senders are gone, so this comes to an end.
+    do _takeNews();
+    while (_isAnythingLeft());
+    _judge(status);
+  }
+
+  bool _isAnythingLeft() {
+    std::array<pollfd, 2> sources = {
+        pollfd{_channelIsOpen ? _process.channel.number() : -1, POLLIN, 0},
+        pollfd{_outputIsOpen ? _process.output.number() : -1, POLLIN, 0}};
+    return poll(sources.data(), sources.size(), 0) > 0;
+  }
+
+  void _judge(int status) {
+    if (_stopped) {
+      _outcome.ending = *_stopped;
+    } else if (WIFSIGNALED(status)) {
+      _outcome.ending = Ending::crashed;
+      _outcome.detail =
+          "signal " + std::to_string(WTERMSIG(status)) + ", " + strsignal(WTERMSIG(status));
+    } else if (_answer && (WEXITSTATUS(status) == 0 || *_answer == Ending::notLoaded ||
+                           *_answer == Ending::raised)) {
+      _outcome.ending = *_answer;
+    } else {
+      _outcome.ending = Ending::left;
+      _outcome.detail = "exit status " + std::to_string(WEXITSTATUS(status));
+    }
+  }
+
+  LaunchedMigrator _process;
+  const LineSink& _sink;
+  Clock::time_point _deadline;
+  MessageReader _reader;
+  MigratorOutcome _outcome;
+  std::optional<Ending> _answer;
+  std::optional<Ending> _stopped;
+  bool _channelIsOpen = true;
+  bool _outputIsOpen = true;
+};
+
+}  // namespace
+
+MigratorOutcome runMigrator(const MigratorTask& task, Interruption& interruption,
+                            const LineSink& sink) {
+  const Clock::time_point start = Clock::now();
+  MigratorOutcome outcome;
+  if (std::optional<LaunchedMigrator> launched = launchMigrator(task)) {
+    outcome = Watch(std::move(*launched), task, sink).untilItEnds(interruption);
+  } else {
+    outcome.name = task.bundle.name;
+    outcome.detail = std::generic_category().message(errno);
+  }
+  outcome.duration = std::chrono::duration_cast<milliseconds>(Clock::now() - start);
+  return outcome;
+}
+
+}  // namespace host

@@ -1,0 +1,60 @@
+#pragma once
+
+#include <chrono>
+#include <cstddef>
+#include <functional>
+#include <string>
+#include <string_view>
+
+#include "host/Interruption.h"
+#include "host/MigratorBundle.h"
+
+namespace host {
+
+// How one run of a migrator ended.
+enum class Ending {
+  succeeded,    // performMigration answered true, and the process ended as it should
+  failed,       // performMigration answered false
+  notLoaded,    // no code of the migrator's own was run but that of its loading
+  raised,       // an exception came out of it
+  crashed,      // a signal ended its process
+  left,         // its process ended without an answer
+  timedOut,     // it ran past its limit and was killed
+  interrupted,  // the user stopped it
+  notStarted    // the system gave no process
+};
+
+struct MigratorOutcome {
+  Ending ending = Ending::notStarted;
+  std::string detail;  // more than the ending says, for people; may be empty
+  std::string name;    // what the migrator calls itself, else the bundle's name
+  std::chrono::milliseconds duration{0};
+  std::string output;  // what it wrote to its standard output and error, cut at kMaximumOutput
+  bool outputWasCut = false;
+};
+
+inline constexpr std::size_t kMaximumOutput = 64 * 1024;
+
+struct MigratorTask {
+  std::string imagePath;  // absolute
+  std::string temporaryDirectory;
+  MigratorBundle bundle;
+  std::chrono::seconds limit{0};
+};
+
+// Gets each line that the migrator writes to the system log, as it comes.
+using LineSink = std::function<void(std::string_view line)>;
+
+// Runs the migrator of a bundle in a process of its own and comes back in time, whatever it does:
+//
+// - The process is this program anew (/proc/self/exe with kRunMigratorArgument), so that it
+// inherits
+//   nothing but an environment with TMPDIR in it, umask 077, and its end of the channel. It is in a
+//   session of its own, its address space is limited, and it dies with the host.
+// - Past the limit of the task, or when the user interrupts, it is killed.
+// - When it has ended, every process that it left behind is killed, and none remains a zombie. The
+//   caller has no other children meanwhile.
+MigratorOutcome runMigrator(const MigratorTask& task, Interruption& interruption,
+                            const LineSink& sink);
+
+}  // namespace host

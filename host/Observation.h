@@ -1,0 +1,37 @@
+#pragma once
+
+#include <memory>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "deviceimage/Dataclass.h"
+#include "deviceimage/DeviceImage.h"
+#include "host/Settings.h"
+
+namespace host {
+
+// What the host remembers of one record: enough to find it again, wherever it went.
+struct ObservedRecord {
+  std::string uid;
+  std::string contentHash;  // SHA-256 in 32 bytes
+  bool operator==(const ObservedRecord&) const = default;
+};
+
+// One store as one dataclass sees it, with its records by UID.
+struct ObservedStore {
+  deviceimage::Dataclass dataclass = deviceimage::Dataclass::contacts;
+  std::optional<std::string> account;  // the account's store identifier; empty: the local store
+  bool retired = false;
+  std::vector<ObservedRecord> records;
+};
+
+// Accounts and records of an image at one moment, read without changing anything.
+struct Observation {
+  Settings settings;
+  std::vector<ObservedStore> stores;
+  std::string error;  // what could not be read, in one sentence; empty when all could
+};
+Observation observe(const std::shared_ptr<const deviceimage::DeviceImage>& image);
+
+}  // namespace host

@@ -1,0 +1,67 @@
+#include "host/ProcessTree.h"
+
+#include <dirent.h>
+#include <poll.h>
+#include <sys/prctl.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <chrono>
+#include <csignal>
+#include <cstdlib>
+#include <fstream>
+#include <string>
+#include <vector>
+
+namespace host {
+namespace {
+
+using Seconds = std::chrono::seconds;
+
+// The parent of the process, as /proc tells; 0 when it has gone. The command name in front of it
+// may hold anything, so the last ")" counts.
+pid_t parentOf(const std::string& process) {
+  std::ifstream file("/proc/" + process + "/stat");
+  std::string line;
+  if (!std::getline(file, line)) return 0;
+  const std::size_t end = line.rfind(") ");
+  if (end == std::string::npos || end + 4 > line.size()) return 0;
+  return static_cast<pid_t>(std::strtol(line.c_str() + end + 4, nullptr, 10));
+}
+
+std::vector<pid_t> childrenOf(pid_t parent) {
+  std::vector<pid_t> children;
+  DIR* directory = opendir("/proc");
+  if (directory == nullptr) return children;
+  while (const dirent* entry = readdir(directory)) {
+    const std::string name = entry->d_name;
+    if (name.find_first_not_of("0123456789") != std::string::npos) continue;
+    if (parentOf(name) == parent) children.push_back(static_cast<pid_t>(std::atol(name.c_str())));
+  }
+  closedir(directory);
+  return children;
+}
+
+// Takes away the ends of children that have ended. False when there are no children at all.
+bool reapEndedChildren() {
+  for (;;) {
+    const pid_t reaped = waitpid(-1, nullptr, WNOHANG);
+    if (reaped == 0) return true;
+    if (reaped < 0 && errno != EINTR) return false;
+  }
+}
+
+}  // namespace
+
+bool adoptOrphans() { return prctl(PR_SET_CHILD_SUBREAPER, 1, 0, 0, 0) == 0; }
+
+void killAllChildren() {
+  const auto deadline = std::chrono::steady_clock::now() + Seconds(10);
+  while (reapEndedChildren() && std::chrono::steady_clock::now() < deadline) {
+    for (const pid_t child : childrenOf(getpid())) kill(child, SIGKILL);
+    poll(nullptr, 0, 1);  // a killed process ends a moment later
+  }
+}
+
+}  // namespace host

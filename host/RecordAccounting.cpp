@@ -1,0 +1,213 @@
+#include "host/RecordAccounting.h"
+
+#include <map>
+#include <optional>
+#include <unordered_map>
+#include <unordered_set>
+#include <utility>
+
+#include "host/StoreOwners.h"
+
+namespace host {
+namespace {
+
+using deviceimage::Dataclass;
+using deviceimage::dataclassName;
+
+using Counts = std::unordered_map<std::string, std::int64_t>;
+
+// Finds an active store of an observation, which must live on.
+class ActiveStores {
+ public:
+  explicit ActiveStores(const Observation& observation) {
+    for (const ObservedStore& store : observation.stores)
+      if (!store.retired) _stores.emplace(std::pair(store.dataclass, store.account), &store);
+  }
+  // The account's store, without one the local store; null when there is none.
+  const ObservedStore* find(Dataclass dataclass, const std::optional<std::string>& account) const {
+    const auto found = _stores.find({dataclass, account});
+    return found != _stores.end() ? found->second : nullptr;
+  }
+
+ private:
+  std::map<std::pair<Dataclass, std::optional<std::string>>, const ObservedStore*> _stores;
+};
+
+std::int64_t countOf(const ObservedStore* store) {
+  return store != nullptr ? static_cast<std::int64_t>(store->records.size()) : 0;
+}
+
+std::string amount(std::int64_t count, Dataclass dataclass) {
+  return std::to_string(count) + (count == 1 ? " record of " : " records of ") +
+         std::string(dataclassName(dataclass));
+}
+
+// Follows the records of one dataclass from before to after.
+class DataclassAccounting {
+ public:
+  DataclassAccounting(Dataclass dataclass, const ObservedStore* localBefore,
+                      const ObservedStore* localAfter, RecordAccounting& result)
+      : _dataclass(dataclass), _result(result) {
+    _takeLocalStores(localBefore, localAfter);
+  }
+
+  void takeRetiredStores(const Observation& before, const Observation& after) {
+    for (const ObservedStore& store : after.stores)
+      if (store.dataclass == _dataclass && store.retired)
+        for (const ObservedRecord& record : store.records) _retired.insert(record.contentHash);
+    _checkThatRetiredRecordsStayed(before);
+  }
+
+  // Gives each record of an account's store its place in the account's line.
+  void follow(const ObservedStore& before, const ObservedStore* after, DataclassReport& line) {
+    std::unordered_set<std::string> stillThere;
+    if (after != nullptr)
+      for (const ObservedRecord& record : after->records) stillThere.insert(record.contentHash);
+    std::int64_t lost = 0;
+    for (const ObservedRecord& record : before.records) {
+      ++line.serviceBefore;
+      if (_wasThere(record))
+        ++line.alreadyThere;
+      else if (_takeFresh(record.contentHash))
+        ++(_localContent.emplace(record.uid, record.contentHash).second ? line.moved
+                                                                        : line.conflictCopies);
+      else if (_localAfter.contains(record.contentHash))
+        ++line.alreadyThere;
+      else if (_retired.contains(record.contentHash))
+        ++line.retired;
+      else if (stillThere.contains(record.contentHash))
+        ++line.leftBehind;
+      else
+        ++lost;
+    }
+    if (lost > 0)
+      _contradict(amount(lost, _dataclass) + " from the store of account " + line.account +
+                  " cannot be found any more.");
+  }
+
+  void fillLocalFigures(DataclassReport& line) const {
+    line.localBefore = _before;
+    line.localAfter = _after;
+  }
+
+  // To be called when every store has been followed.
+  void checkThatNothingElseCame() {
+    std::int64_t unexplained = 0;
+    for (const auto& [content, count] : _fresh) unexplained += count;
+    if (unexplained > 0)
+      _contradict(amount(unexplained, _dataclass) +
+                  " in the local store were in no store of an account to be retired, or are there "
+                  "more than once.");
+  }
+
+ private:
+  void _contradict(std::string sentence) { _result.contradictions.push_back(std::move(sentence)); }
+
+  void _takeLocalStores(const ObservedStore* before, const ObservedStore* after) {
+    _before = countOf(before);
+    _after = countOf(after);
+    if (after != nullptr)
+      for (const ObservedRecord& record : after->records) {
+        _localAfter.insert(record.contentHash);
+        ++_fresh[record.contentHash];
+      }
+    std::int64_t gone = 0;
+    if (before != nullptr)
+      for (const ObservedRecord& record : before->records) {
+        _localContent.emplace(record.uid, record.contentHash);
+        if (!_takeFresh(record.contentHash)) ++gone;
+      }
+    if (gone > 0)
+      _contradict(amount(gone, _dataclass) + " in the local store are gone or have changed.");
+  }
+
+  void _checkThatRetiredRecordsStayed(const Observation& before) {
+    std::int64_t gone = 0;
+    for (const ObservedStore& store : before.stores)
+      if (store.dataclass == _dataclass && store.retired)
+        for (const ObservedRecord& record : store.records)
+          if (!_retired.contains(record.contentHash) && !_localAfter.contains(record.contentHash))
+            ++gone;
+    if (gone > 0)
+      _contradict(amount(gone, _dataclass) + " in retired stores are gone or have changed.");
+  }
+
+  // Whether the local store had the very record before, and still has it.
+  bool _wasThere(const ObservedRecord& record) const {
+    const auto local = _localContent.find(record.uid);
+    return local != _localContent.end() && local->second == record.contentHash &&
+           _localAfter.contains(record.contentHash);
+  }
+
+  // Takes one of the local store's records of this content that were not there before.
+  bool _takeFresh(const std::string& content) {
+    const auto fresh = _fresh.find(content);
+    if (fresh == _fresh.end() || fresh->second == 0) return false;
+    --fresh->second;
+    return true;
+  }
+
+  Dataclass _dataclass;
+  RecordAccounting& _result;
+  std::int64_t _before = 0;
+  std::int64_t _after = 0;
+  // By UID: what the local store had before, and then what came into it account by account.
+  std::unordered_map<std::string, std::string> _localContent;
+  std::unordered_set<std::string> _localAfter;
+  Counts _fresh;  // what the local store has more than before, by content
+  std::unordered_set<std::string> _retired;
+};
+
+void checkOtherStore(const ObservedStore& before, const ObservedStore* after,
+                     RecordAccounting& result) {
+  const bool isEmpty = before.records.empty() && countOf(after) == 0;
+  if (isEmpty || (after != nullptr && after->records == before.records)) return;
+  result.contradictions.push_back("The store " + *before.account + " with " +
+                                  std::string(dataclassName(before.dataclass)) +
+                                  " belongs to no account to be retired and has changed.");
+}
+
+void listWhatIsNotLocal(RecordAccounting& result) {
+  for (const DataclassReport& line : result.dataclasses) {
+    if (line.leftBehind > 0)
+      result.leftBehind.push_back(amount(line.leftBehind, line.dataclass) + " of account " +
+                                  line.account + " are still in the account's own store alone.");
+    if (line.retired > 0)
+      result.leftBehind.push_back(
+          amount(line.retired, line.dataclass) + " of account " + line.account +
+          " are in a retired store alone, from where they can be exported or "
+          "brought back.");
+  }
+}
+
+}  // namespace
+
+RecordAccounting accountForRecords(const Observation& before, const Observation& after,
+                                   const Selection& selection,
+                                   const deviceimage::SyncAgent& agent) {
+  RecordAccounting result;
+  StoreOwners owners(before, selection, agent);
+  const ActiveStores activeBefore(before);
+  const ActiveStores activeAfter(after);
+  for (const Dataclass dataclass : deviceimage::kDataclasses) {
+    DataclassAccounting accounting(dataclass, activeBefore.find(dataclass, std::nullopt),
+                                   activeAfter.find(dataclass, std::nullopt), result);
+    accounting.takeRetiredStores(before, after);
+    for (const ObservedStore& store : before.stores) {
+      if (store.dataclass != dataclass || !store.account || store.retired) continue;
+      const ObservedStore* now = activeAfter.find(dataclass, store.account);
+      if (DataclassReport* line = owners.lineOf(store))
+        accounting.follow(store, now, *line);
+      else
+        checkOtherStore(store, now, result);
+    }
+    for (DataclassReport& line : owners.lines())
+      if (line.dataclass == dataclass) accounting.fillLocalFigures(line);
+    accounting.checkThatNothingElseCame();
+  }
+  result.dataclasses = std::move(owners.lines());
+  listWhatIsNotLocal(result);
+  return result;
+}
+
+}  // namespace host

@@ -1,0 +1,86 @@
+#include "host/Settings.h"
+
+#include <algorithm>
+#include <cmath>
+#include <limits>
+
+namespace host {
+namespace {
+
+using propertylist::Dictionary;
+using propertylist::Value;
+
+constexpr std::int64_t kLargest = std::numeric_limits<std::int64_t>::max();
+constexpr std::int64_t kSmallest = std::numeric_limits<std::int64_t>::min();
+
+std::int64_t truncated(double real) {
+  if (std::isnan(real)) return 0;
+  if (real >= static_cast<double>(kLargest)) return kLargest;
+  if (real <= static_cast<double>(kSmallest)) return kSmallest;
+  return static_cast<std::int64_t>(real);
+}
+
+std::int64_t leadingInteger(std::string_view text) {
+  const std::size_t start = text.find_first_not_of(" \t\n\v\f\r");
+  if (start == std::string_view::npos) return 0;
+  text.remove_prefix(start);
+  const bool negative = text.starts_with('-');
+  if (negative || text.starts_with('+')) text.remove_prefix(1);
+  std::int64_t number = 0;  // kept negative, where there is room for one more
+  for (const char digit : text) {
+    if (digit < '0' || digit > '9') break;
+    if (__builtin_mul_overflow(number, 10, &number) ||
+        __builtin_sub_overflow(number, digit - '0', &number))
+      return negative ? kSmallest : kLargest;
+  }
+  if (negative) return number;
+  return number == kSmallest ? kLargest : -number;
+}
+
+}  // namespace
+
+Settings readSettings(const deviceimage::DeviceImage& image) {
+  Settings settings;
+  const auto read = image.readPropertyList(deviceimage::DeviceImage::kSettingsFile);
+  settings.exists = read.exists;
+  const Dictionary* root = read.value ? read.value->asDictionary() : nullptr;
+  if (root == nullptr) {
+    if (read.exists) settings.error = read.value ? "it holds no dictionary" : read.error;
+    return settings;
+  }
+  const propertylist::Array* accounts = propertylist::findArray(*root, "Accounts");
+  if (accounts == nullptr) return settings;
+  for (const Value& entry : *accounts) {
+    if (const Dictionary* account = entry.asDictionary())
+      settings.accounts.push_back(*account);
+    else
+      ++settings.strangeEntries;
+  }
+  return settings;
+}
+
+std::string textUnder(const Dictionary& account, std::string_view key) {
+  const std::string* text = propertylist::findString(account, key);
+  return text != nullptr ? *text : std::string();
+}
+
+std::int64_t integerValue(const Value* value) {
+  if (value == nullptr) return 0;
+  if (const auto integer = value->asInteger()) return *integer;
+  if (value->asUnsigned()) return kLargest;
+  if (const auto boolean = value->asBoolean()) return *boolean ? 1 : 0;
+  if (const auto real = value->asReal()) return truncated(*real);
+  if (const std::string* text = value->asString()) return leadingInteger(*text);
+  return 0;
+}
+
+bool Selection::covers(const Dictionary& account) const {
+  const std::string type = typeOf(account);
+  const std::int64_t status = integerValue(account.find(statusKey));
+  return std::any_of(rules.begin(), rules.end(), [&](const Rule& rule) {
+    return status == rule.status &&
+           std::find(rule.types.begin(), rule.types.end(), type) != rule.types.end();
+  });
+}
+
+}  // namespace host

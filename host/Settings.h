@@ -1,0 +1,49 @@
+#pragma once
+
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "deviceimage/DeviceImage.h"
+#include "propertylist/Value.h"
+
+namespace host {
+
+// The account settings of an image, as the host looks at them: read only, and top-level accounts
+// only.
+struct Settings {
+  bool exists = false;
+  std::string error;  // why an existing file cannot be read as a dictionary; empty when it can
+  std::vector<propertylist::Dictionary> accounts;  // in file order
+  std::size_t strangeEntries = 0;                  // entries of "Accounts" that are no dictionary
+};
+Settings readSettings(const deviceimage::DeviceImage& image);
+
+// The text under `key`; empty without one.
+std::string textUnder(const propertylist::Dictionary& account, std::string_view key);
+inline std::string identifierOf(const propertylist::Dictionary& account) {
+  return textUnder(account, "Identifier");
+}
+inline std::string typeOf(const propertylist::Dictionary& account) {
+  return textUnder(account, "Type");
+}
+
+// The number that the device's account framework reads from a property: an integer itself, a
+// boolean 1 or 0, a real without its fraction, a string by its leading blanks, sign and digits;
+// else 0. What is beyond 64 bits counts as the nearest number there is.
+std::int64_t integerValue(const propertylist::Value* value);
+
+// Which accounts a run of migrators is to retire.
+struct Selection {
+  std::string statusKey;  // the account framework's
+  struct Rule {
+    std::vector<std::string> types;
+    std::int64_t status = 0;
+  };
+  std::vector<Rule> rules;  // one a migrator
+  bool covers(const propertylist::Dictionary& account) const;
+};
+
+}  // namespace host

@@ -1,0 +1,26 @@
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "deviceimage/DeviceImage.h"
+#include "host/MigratorBundle.h"
+#include "host/Settings.h"
+
+namespace host {
+
+// Why the image cannot be migrated, one sentence each that names the file and the remedy; none when
+// it can. Only looks:
+//
+// - the settings file, when there is one, is readable as a dictionary, and every account in it is
+// of a
+//   type that each bundle knows which lists its types: an account that a migrator cannot read would
+//   be gone after its first save;
+// - tmp/ is a directory on the settings file's file system, else no save could replace the file;
+// - "mobile" is in the image's user database as a user and a group;
+// - settings, databases and logs can be written.
+std::vector<std::string> reasonsNotToStart(const deviceimage::DeviceImage& image,
+                                           const Settings& settings,
+                                           const std::vector<MigratorBundle>& bundles);
+
+}  // namespace host

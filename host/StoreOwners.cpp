@@ -1,0 +1,63 @@
+#include "host/StoreOwners.h"
+
+#include <set>
+
+namespace host {
+namespace {
+
+using deviceimage::Dataclass;
+using propertylist::Dictionary;
+
+std::set<Dataclass> enabledDataclasses(const Dictionary& account) {
+  std::set<Dataclass> enabled;
+  const propertylist::Array* names = propertylist::findArray(account, "Enabled Dataclasses");
+  if (names == nullptr) return enabled;
+  for (const propertylist::Value& name : *names)
+    if (const std::string* text = name.asString())
+      if (const auto dataclass = deviceimage::dataclassWithIdentifier(*text))
+        enabled.insert(*dataclass);
+  return enabled;
+}
+
+}  // namespace
+
+StoreOwners::StoreOwners(const Observation& before, const Selection& selection,
+                         const deviceimage::SyncAgent& agent) {
+  std::set<LineName> lineNames;
+  std::map<StoreName, std::size_t> claims;        // to an account
+  std::map<std::string, std::size_t> firstOwner;  // of a store's name, whatever it holds
+  const std::vector<Dictionary>& accounts = before.settings.accounts;
+  for (std::size_t index = 0; index < accounts.size(); ++index) {
+    if (!selection.covers(accounts[index])) continue;
+    const std::set<Dataclass> enabled = enabledDataclasses(accounts[index]);
+    for (const Dataclass dataclass : deviceimage::kDataclasses) {
+      if (enabled.contains(dataclass)) lineNames.emplace(index, dataclass);
+      const auto store = agent.storeIdentifier(accounts[index], dataclass);
+      if (!store) continue;
+      firstOwner.emplace(*store, index);
+      if (enabled.contains(dataclass)) claims.emplace(StoreName(dataclass, *store), index);
+    }
+  }
+  for (const ObservedStore& store : before.stores) {
+    if (!store.account || store.retired || store.records.empty()) continue;
+    const auto owner = firstOwner.find(*store.account);
+    if (owner == firstOwner.end()) continue;
+    const auto claim = claims.emplace(StoreName(store.dataclass, *store.account), owner->second);
+    lineNames.emplace(claim.first->second, store.dataclass);
+  }
+  std::map<LineName, std::size_t> lineNumbers;
+  for (const LineName& name : lineNames) {
+    lineNumbers.emplace(name, _lines.size());
+    _lines.push_back({identifierOf(accounts[name.first]), name.second});
+  }
+  for (const auto& [store, account] : claims)
+    _owners.emplace(store, lineNumbers.at({account, store.first}));
+}
+
+DataclassReport* StoreOwners::lineOf(const ObservedStore& store) {
+  if (!store.account || store.retired) return nullptr;
+  const auto owner = _owners.find({store.dataclass, *store.account});
+  return owner != _owners.end() ? &_lines[owner->second] : nullptr;
+}
+
+}  // namespace host

@@ -1,0 +1,5 @@
+#include <cstdlib>
+
+#include "tests/host/bundles/TestMigrator.h"
+
+bool migrate() { std::abort(); }

@@ -1,0 +1,54 @@
+// Does to the settings file what the process default "TestChange" says: "retire" takes the accounts
+// that are to be retired out and nothing else, "drop" takes all of them out, "change" renames those
+// that are to stay, "reverse" turns their order round, "destroy" writes what is no property list.
+#include <fstream>
+#include <string>
+#include <vector>
+
+#include "platform/Services.h"
+#include "propertylist/Writing.h"
+#include "tests/host/bundles/TestMigrator.h"
+
+namespace {
+
+using propertylist::Array;
+using propertylist::Dictionary;
+
+bool isRetired(const Dictionary& account) {
+  const std::string* type = propertylist::findString(account, "Type");
+  const propertylist::Value* status = account.find("QuillnetStatus");
+  return type != nullptr && *type == "Quillnet" && status != nullptr && status->asInteger() == 1;
+}
+
+Array changed(const Array& accounts, const std::string& change) {
+  std::vector<propertylist::Value> result;
+  for (const propertylist::Value& entry : accounts) {
+    Dictionary account = *entry.asDictionary();
+    if (change == "drop" || (change == "retire" && isRetired(account))) continue;
+    if (change == "change" && !isRetired(account)) account.set("DisplayName", "renamed");
+    if (change == "reverse")
+      result.insert(result.begin(), account);
+    else
+      result.emplace_back(account);
+  }
+  return Array(result);
+}
+
+}  // namespace
+
+bool migrate() {
+  const platform::Services& services = platform::services();
+  const std::string path = services.deviceInfo.systemRootDirectory() +
+                           "/var/mobile/Library/Preferences/com.vantor.accountsettings.plist";
+  const auto change = services.preferences.readDefault("TestChange");
+  const auto settings = services.fileServices.readPropertyListFile(path);
+  if (!change || !settings.value) return false;
+  Dictionary root = *settings.value->asDictionary();
+  root.set("Accounts", changed(*propertylist::findArray(root, "Accounts"), *change->asString()));
+  propertylist::Bytes bytes = *propertylist::writeBinaryPropertyList(root);
+  if (*change->asString() == "destroy") bytes.resize(bytes.size() / 2);
+  std::ofstream file(path, std::ios::binary | std::ios::trunc);
+  file.write(reinterpret_cast<const char*>(bytes.data()),
+             static_cast<std::streamsize>(bytes.size()));
+  return file.good();
+}

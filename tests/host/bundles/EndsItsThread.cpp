@@ -1,0 +1,5 @@
+#include <pthread.h>
+
+#include "tests/host/bundles/TestMigrator.h"
+
+bool migrate() { pthread_exit(nullptr); }

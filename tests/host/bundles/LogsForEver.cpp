@@ -1,0 +1,5 @@
+#include "tests/host/bundles/TestMigrator.h"
+
+bool migrate() {
+  for (;;) platform::logToSystem("again");
+}

@@ -1,0 +1,3 @@
+#include "tests/host/bundles/TestMigrator.h"
+
+bool migrate() { return false; }

@@ -1,0 +1,73 @@
+// The command line of the migration host.
+#include <unistd.h>
+
+#include <cstdio>
+#include <cstdlib>
+#include <exception>
+#include <filesystem>
+#include <string>
+#include <system_error>
+
+#include "host/MigrationHost.h"
+#include "host/MigratorChild.h"
+#include "tools/migration-host/CommandLine.h"
+#include "tools/migration-host/JsonReport.h"
+#include "tools/migration-host/Terminal.h"
+#include "tools/migration-host/TextReport.h"
+
+namespace {
+
+using namespace migration_host;
+
+// Where the installed migrator lies, seen from this program: the same in the build tree and
+// installed.
+std::string installedMigrators() {
+  std::error_code error;
+  const std::filesystem::path program = std::filesystem::read_symlink("/proc/self/exe", error);
+  return (program.parent_path() / MIGRATORS_FROM_PROGRAM).lexically_normal().string();
+}
+
+bool print(const std::string& text) {
+  return std::fwrite(text.data(), 1, text.size(), stdout) == text.size() &&
+         std::fflush(stdout) == 0;
+}
+
+int run(const CommandLine& command) {
+  Terminal terminal(command.quiet);
+  if (command.logFile) {
+    const std::string problem = terminal.openLogFile(*command.logFile);
+    if (!problem.empty()) {
+      std::fprintf(stderr, "migration-host: %s\n", printable(problem).c_str());
+      return kExitWrongUsage;
+    }
+  }
+  host::MigrationReport report;
+  {
+    host::Interruption interruption;
+    report = host::MigrationHost(terminal, interruption)
+                 .run({command.image, command.bundle, installedMigrators(), command.limit});
+  }
+  terminal.stageEnded();
+  const std::string logProblem = terminal.closeLogFile();
+  if (!logProblem.empty()) std::fprintf(stderr, "migration-host: %s\n", logProblem.c_str());
+  const bool colours = isatty(STDOUT_FILENO) != 0;
+  if (!print(command.json ? jsonReport(report) : textReport(report, colours)) &&
+      report.outcome == host::RunOutcome::done)
+    return EXIT_FAILURE;  // done, but nobody can have read the report
+  return static_cast<int>(report.outcome);
+}
+
+}  // namespace
+
+int main(int argumentCount, char** arguments) {
+  if (host::isMigratorProcess(argumentCount, arguments))
+    return host::runMigratorInThisProcess(arguments);
+  const ParsedCommandLine parsed = parseCommandLine(argumentCount, arguments);
+  if (!parsed.command) return parsed.exitCode;
+  try {
+    return run(*parsed.command);
+  } catch (const std::exception& exception) {
+    std::fprintf(stderr, "migration-host: unexpected failure: %s\n", exception.what());
+    return EXIT_FAILURE;
+  }
+}
