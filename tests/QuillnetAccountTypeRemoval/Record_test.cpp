@@ -213,7 +213,18 @@ Value mortal(Lines& ends, const std::string& name) {
       }));
 }
 
-TEST_F(Record, ReleasesParentThenOriginalPropertiesThenProperties) {
+// A full account that notes its end.
+class MortalFullAccount : public AccountFullAccountProtocol {
+ public:
+  explicit MortalFullAccount(Lines& ends) : _ends(ends) {}
+  ~MortalFullAccount() override { _ends.push_back("full account"); }
+  void setParentAccount(const AccountPtr&) override {}
+
+ private:
+  Lines& _ends;
+};
+
+TEST_F(Record, ReleasesParentThenOriginalPropertiesThenPropertiesThenFullAccount) {
   Lines ends;
   AccountPtr parent = ASSBasicAccount::initWithProperties(accountInfo("p"));
   parent->setOriginalProperties({});
@@ -222,8 +233,9 @@ TEST_F(Record, ReleasesParentThenOriginalPropertiesThenProperties) {
   account->setParentAccount(std::exchange(parent, nullptr));
   account->setOriginalProperties({{"k", mortal(ends, "original properties")}});
   account->setAccountPropertyForKey(mortal(ends, "properties"), "k");
+  account->setFullAccount(std::make_shared<MortalFullAccount>(ends));
   account = nullptr;
-  EXPECT_EQ(ends, (Lines{"parent", "original properties", "properties"}));
+  EXPECT_EQ(ends, (Lines{"parent", "original properties", "properties", "full account"}));
 }
 
 class NarrowAccount : public OpenAccount {
