@@ -40,7 +40,7 @@ class Descriptor {
 std::string readWholeFile(const std::string& path, std::size_t limit) {
   // Opening a pipe must not wait for a writer.
   const Descriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
-  if (file.number() < 0) refuse(path, reason(errno));
+  if (file.number() < 0) refuse(path, reason(errno) + " (check its name and its rights)");
   struct stat status {};
   if (::fstat(file.number(), &status) != 0) refuse(path, reason(errno));
   if (!S_ISREG(status.st_mode)) refuse(path, "it is no regular file");

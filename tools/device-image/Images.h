@@ -27,8 +27,8 @@ LockedImage lockImage(ImagePtr image);
 // The dataclass of that name: one that records are imported to and exported from.
 deviceimage::Dataclass recordDataclassNamed(const std::string& name);
 
-// Passes on a success; a failure of the image's databases ends the command. A change that failed has
-// changed nothing.
+// Passes on a success; a failure of the image's databases ends the command. A change that failed
+// has changed nothing.
 void requireSuccess(const platform::Status& status, std::string_view whatFailed);
 
 // One line on standard error: "device-image: " and the text, whose control characters are escaped.

@@ -101,13 +101,17 @@ ExitCode run(const Options& options) {
     gather(options, dataclass, file, gathered);
   }
   progress.clear();
-  RecordStores stores(locked.image, RecordStores::Access::readWrite);
-  const RecordStores::Added added =
-      stores.addRecords(dataclass, store.storeIdentifier, gathered.records);
-  requireSuccess(added.status, "nothing was imported");
+  deviceimage::Placed placed;
+  if (!gathered.records.empty()) {
+    RecordStores stores(locked.image, RecordStores::Access::readWrite);
+    const RecordStores::Added added =
+        stores.addRecords(dataclass, store.storeIdentifier, gathered.records);
+    requireSuccess(added.status, "nothing was imported");
+    placed = added.placed;
+  }
   fmt::print("{}: {} added, {} already there, {} conflicting copies, {} bad; {}\n",
-             deviceimage::dataclassName(dataclass), added.placed.added, added.placed.alreadyThere,
-             added.placed.conflicts, gathered.badCount, store.description);
+             deviceimage::dataclassName(dataclass), placed.added, placed.alreadyThere,
+             placed.conflicts, gathered.badCount, store.description);
   return gathered.badCount == 0 ? ExitCode::done : ExitCode::someRecordsBad;
 }
 

@@ -14,8 +14,7 @@ using deviceimage::Dataclass;
 using testing::ElementsAre;
 using testing::IsEmpty;
 
-const std::string kHead =
-    "BEGIN:VCALENDAR\r\nVERSION:2.0\r\nPRODID:-//x//EN\r\nX-WR-CALNAME:Büro\r\n";
+const std::string kHead = "BEGIN:VCALENDAR\r\nVERSION:2.0\r\nPRODID:-//x//EN\r\nNAME:Büro\r\n";
 const std::string kTail = "END:VCALENDAR\r\n";
 const std::string kParis =
     "BEGIN:VTIMEZONE\r\nTZID:Europe/Paris\r\nBEGIN:STANDARD\r\nDTSTART:19701025T030000\r\n"
