@@ -24,7 +24,7 @@ class Recipe {
 
  private:
   static constexpr std::size_t kMaximumStack = 300;
-  static constexpr std::size_t kMaximumMade = 4000;  // values, what is shared counted everywhere
+  static constexpr std::size_t kMaximumMade = 600;  // values, what is shared counted everywhere
 
   std::uint8_t _byte() { return _next == _end ? std::uint8_t{0} : *_next++; }
 
