@@ -6,7 +6,7 @@
 namespace deviceimagetool {
 
 // Writes the bookmarks of stores as the HTML that browsers import: one list for each folder, each
-// bookmark as it lies in its store. Empty folders are kept.
+// bookmark as it lies in its store.
 void writeBookmarks(deviceimage::RecordStores& records,
                     const std::vector<deviceimage::Store>& stores, Output& output);
 

@@ -11,7 +11,7 @@ namespace deviceimagetool {
 //
 // A record is one bookmark as it stands in the file, from its <DT> to its </A>, or to the end of
 // the <DD> description after it, byte for byte. Its UID is derived from its folder and its address.
-// The folders' own attributes are not kept, their names are.
+// The folders' names are kept; their other attributes are not, nor are folders without bookmarks.
 ReadText readBookmarks(std::string_view bytes);
 
 }  // namespace deviceimagetool

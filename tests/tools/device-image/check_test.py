@@ -1,0 +1,87 @@
+"""device-image check, and what the other commands say of a damaged image."""
+
+import json
+import plistlib
+import unittest
+
+from imagetest import SETTINGS, ImageTest, run
+
+CARD = "BEGIN:VCARD\r\nVERSION:3.0\r\nUID:ada\r\nFN:Ada\r\nEND:VCARD\r\n"
+
+
+class Check(ImageTest):
+    def findings(self) -> dict:
+        """What check says, by path in the image; asked twice, since looking changes nothing."""
+        ended = run("check", self.image, "--json")
+        report = json.loads(ended.stdout)
+        self.assertEqual(set(report), {"image", "sound", "findings"})
+        self.assertEqual(report["sound"], not report["findings"])
+        self.assertEqual(ended.returncode, 6 if report["findings"] else 0)
+        self.assertEqual(run("check", self.image, "--json").stdout, ended.stdout)
+        return {finding["path"]: finding["text"] for finding in report["findings"]}
+
+    def contacts_database(self):
+        (path,) = self.databases()
+        return path
+
+    def test_a_new_image_is_sound(self):
+        self.assertEqual(self.findings(), {})
+        self.assertEqual(self.succeed("check", self.image).decode(), f"{self.image.resolve()}: sound\n")
+
+    def test_an_image_in_use_is_sound(self):
+        self.add_account("Quillnet", "Q1")
+        self.import_text("contacts", "a.vcf", CARD, "--account", "Q1")
+        self.retire_stores()
+        self.assertEqual(self.findings(), {})
+
+    def test_finds_what_stopped_programs_left_behind(self):
+        (self.image / "tmp/settings.abc").touch(0o600)
+        (self.image / "tmp/AccountMigrationInProgress").touch(0o600)
+        (self.image / (SETTINGS + ".unreadable-1")).touch(0o600)
+        self.assertEqual(set(self.findings()), {"tmp/settings.abc", SETTINGS + ".unreadable-1"})
+
+    def test_finds_files_that_others_can_read(self):
+        (self.image / SETTINGS).chmod(0o644)
+        self.assertEqual(set(self.findings()), {SETTINGS})
+
+    def test_finds_unreadable_settings(self):
+        (self.image / SETTINGS).write_bytes(b"rubbish")
+        self.assertEqual(set(self.findings()), {SETTINGS})
+        self.assertIn(SETTINGS, self.fail_with(6, "check", self.image))
+        self.fail_with(6, "show", self.image)
+
+    def test_finds_accounts_that_the_device_would_drop(self):
+        cases = [
+            ({"Identifier": "X", "Type": "Nope", "Class": "C"}, 'unknown type "Nope"'),
+            ({"Identifier": "X", "Type": "Gmail"}, "no class"),
+            ({"Identifier": "X", "Type": "Mail", "Class": "Nope"}, 'no mail class "Nope"'),
+        ]
+        for account, text in cases:
+            with self.subTest(text):
+                (self.image / SETTINGS).write_bytes(plistlib.dumps({"Accounts": [account]}))
+                self.assertIn(text, self.findings()[SETTINGS])
+
+    def test_finds_a_record_whose_content_was_changed(self):
+        self.import_text("contacts", "a.vcf", CARD)
+        for database in self.databases().values():
+            with database:
+                database.execute("UPDATE records SET content = X'00'")
+            database.close()
+        self.assertEqual(set(self.findings()), {str(self.contacts_database().relative_to(self.image))})
+
+    def test_finds_a_damaged_database_and_nobody_writes_to_it(self):
+        self.import_text("contacts", "a.vcf", CARD)
+        path = self.contacts_database()
+        damaged = b"not a database" * 100
+        path.write_bytes(damaged)
+        name = str(path.relative_to(self.image))
+        self.assertEqual(set(self.findings()), {name})
+        file = self.file("b.vcf", CARD)
+        self.assertIn(name, self.fail_with(6, "import", self.image, "--dataclass", "contacts", file))
+        self.assertIn(name, self.fail_with(6, "export", self.image, "--dataclass", "contacts"))
+        self.assertIn(name, self.fail_with(6, "show", self.image))
+        self.assertEqual(path.read_bytes(), damaged)
+
+
+if __name__ == "__main__":
+    unittest.main()
