@@ -153,6 +153,7 @@ bool MigrationHost::_prepare() {
     return false;
   }
   removeStaleTemporaryFiles(*_image);
+  _image->removeLeftovers();
   return _checkDatabases(RunOutcome::refused);
 }
 

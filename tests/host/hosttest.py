@@ -10,11 +10,13 @@ import os
 import pathlib
 import plistlib
 import shutil
-import signal
+import sqlite3
 import subprocess
 import sys
 import tempfile
 import unittest
+
+import jsonschema
 
 HOST = os.environ["MIGRATION_HOST"]
 MAKE_IMAGE = os.environ["MAKE_TEST_IMAGE"]
@@ -22,9 +24,17 @@ BUNDLES = pathlib.Path(os.environ["TEST_BUNDLES"])
 MIGRATORS = pathlib.Path(os.environ["INSTALLED_MIGRATORS"])
 SETTINGS = "var/mobile/Library/Preferences/com.vantor.accountsettings.plist"
 LOCK = "var/run/image.lock"
+REPORT_VALIDATOR = jsonschema.Draft202012Validator(
+    json.loads(pathlib.Path(os.environ["SCHEMA"]).read_text()))
 SERVICE = "Quillnet:ada"
 
 DATACLASS = "com.vantor.Dataclass."
+# The kind of a dataclass's records and the database that holds them.
+KINDS = {"contacts": ("contact", "var/mobile/Library/Contacts/Contacts.sqlite"),
+         "calendars": ("event", "var/mobile/Library/Calendars/Calendars.sqlite"),
+         "reminders": ("todo", "var/mobile/Library/Calendars/Calendars.sqlite"),
+         "bookmarks": ("bookmark", "var/mobile/Library/Bookmarks/Bookmarks.sqlite"),
+         "notes": ("note", "var/mobile/Library/Notes/Notes.sqlite")}
 
 
 def account(identifier, kind, dataclasses=(), status=None, **more):
@@ -42,6 +52,11 @@ def record(dataclass, store, uid, content, modified=1_600_000_000):
             "modified": modified}
 
 
+def event(uid, title):
+    return (f"BEGIN:VCALENDAR\r\nVERSION:2.0\r\nBEGIN:VEVENT\r\nUID:{uid}\r\nSUMMARY:{title}\r\n"
+            f"END:VEVENT\r\nEND:VCALENDAR\r\n")
+
+
 def card(uid, name):
     return f"BEGIN:VCARD\r\nVERSION:3.0\r\nUID:{uid}\r\nFN:{name}\r\nEND:VCARD\r\n"
 
@@ -54,7 +69,28 @@ class Run:
 
     @property
     def report(self):
-        return json.loads(self.output)
+        """The report, which keeps to its schema and to what its figures promise."""
+        report = json.loads(self.output)
+        REPORT_VALIDATOR.validate(report)
+        check_sums(report)
+        return report
+
+
+def check_sums(report):
+    if not report["balanced"]:
+        return
+    growth, local = {}, {}
+    for line in report["dataclasses"]:
+        places = sum(line[key] for key in ("moved", "already_there", "conflict_copies", "retired",
+                                           "left_behind"))
+        assert places == line["service_before"], line
+        name = line["dataclass"]
+        growth[name] = growth.get(name, 0) + line["moved"] + line["conflict_copies"]
+        local.setdefault(name, set()).add((line["local_before"], line["local_after"]))
+    for name, figures in local.items():
+        assert len(figures) == 1, (name, figures)
+        before, after = figures.pop()
+        assert after == before + growth[name], (name, before, after, growth[name])
 
 
 class HostTestCase(unittest.TestCase):
@@ -90,6 +126,18 @@ class HostTestCase(unittest.TestCase):
     def write_agent_name(self, name):
         self.write_plist("var/mobile/Library/Preferences/com.vantor.OTASyncAgent.plist",
                          {"AccountName": name})
+
+    def contents(self, dataclass, store=None, retired=False):
+        """The contents of a store's records, sorted; read with no help of the programs under test."""
+        kind, file = KINDS[dataclass]
+        with contextlib.closing(sqlite3.connect(f"file:{self.image / file}?mode=ro", uri=True)) as database:
+            self.assertEqual([("ok",)], database.execute("PRAGMA integrity_check").fetchall())
+            self.assertEqual([], database.execute("PRAGMA foreign_key_check").fetchall())
+            rows = database.execute(
+                "SELECT content FROM records r JOIN stores s ON s.id = r.store WHERE r.kind = ?"
+                " AND ifnull(s.account, '') = ? AND (s.retired_at IS NOT NULL) = ?",
+                (kind, store or "", retired)).fetchall()
+        return sorted(row[0] for row in rows)
 
     def digest(self, leave_out=()):
         """Every file and directory of the image: its mode, owner and content."""

@@ -65,8 +65,7 @@ std::string textOf(const host::DataclassReport& line) {
   std::string text;
   for (const auto& [count, word] : parts)
     if (count != 0) text += fmt::format("{}{} {}", text.empty() ? "" : ", ", count, word);
-  return fmt::format("{} {}", deviceimage::dataclassName(line.dataclass),
-                     text.empty() ? "none" : text);
+  return fmt::format("{} {}", deviceimage::dataclassName(line.dataclass), text);
 }
 
 struct Columns {
@@ -115,7 +114,7 @@ std::string accountLines(const host::AccountReport& account, const Columns& colu
 std::string accountTable(const host::MigrationReport& report, bool colours) {
   std::map<std::string_view, std::vector<const host::DataclassReport*>> byAccount;
   for (const host::DataclassReport& line : report.dataclasses)
-    byAccount[line.account].push_back(&line);
+    if (line.serviceBefore > 0) byAccount[line.account].push_back(&line);
   const Columns columns = columnsFor(report.accounts);
   std::string text;
   for (const host::AccountReport& account : report.accounts)
