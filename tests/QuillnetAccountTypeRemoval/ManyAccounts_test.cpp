@@ -1,0 +1,70 @@
+#include <gtest/gtest.h>
+
+#include "tests/QuillnetAccountTypeRemoval/AccountsDevice.h"
+
+namespace accountsettings {
+namespace {
+
+constexpr std::size_t kAccounts = 10000;
+
+Dictionary manyAccountsInfo(std::size_t i) {
+  const std::string number = std::to_string(i);
+  return accountInfo(
+      "p" + number, i % 2 == 0 ? "CalDAV" : "CardDAV",
+      {{"ChildAccounts", Array{accountInfo("c" + number), accountInfo("d" + number)}}});
+}
+
+// Ten thousand accounts with two children each: an operation that walked every account, or every
+// child, for every account would be felt here.
+class ManyAccounts : public ::testing::Test {
+ protected:
+  ManyAccounts() {
+    std::vector<Value> infos;
+    for (std::size_t i = 0; i < kAccounts; ++i) infos.emplace_back(manyAccountsInfo(i));
+    accounts = Array(std::move(infos));
+  }
+  AccountsDevice device;
+  Array accounts;
+};
+
+TEST_F(ManyAccounts, LoadChangeAndSave) {
+  device.writeAccounts(accounts);
+  const auto store = OpenStore::ofFile();
+  EXPECT_EQ(store->count(), kAccounts);
+  EXPECT_EQ(store->childAccountsByID().size(), 2 * kAccounts);
+  EXPECT_EQ(store->accountWithIdentifier("d9999")->identifier(), "p9999");
+  for (const AccountPtr& account : *store->allBasicAccounts())
+    account->setAccountPropertyForKey(true, "changed");
+  store->saveAllAccounts();
+  const Array saved = device.savedAccounts();
+  ASSERT_EQ(saved.size(), kAccounts);
+  EXPECT_EQ(saved[0], Value(with(manyAccountsInfo(0), "changed", true)));
+  EXPECT_EQ(saved[kAccounts - 1], Value(with(manyAccountsInfo(kAccounts - 1), "changed", true)));
+  EXPECT_EQ(device.countOfFileCalls("readPropertyListFile(" + device.settingsPath()), 2U);
+}
+
+TEST_F(ManyAccounts, ReplaceEveryAccountOfAType) {
+  const auto store = OpenStore::ofAccounts(accounts);
+  AccountArray replacements;
+  for (const AccountPtr& account : *store->allBasicAccounts())
+    replacements.push_back(ASSBasicAccount::initWithProperties(account->properties()));
+  store->replaceAccountsWithTypesWithAccounts({"CalDAV", "CardDAV"}, replacements);
+  EXPECT_EQ(*store->allBasicAccounts(), replacements);
+  store->replaceAccountsWithTypesWithAccounts({"CalDAV"}, {});
+  EXPECT_EQ(store->count(), kAccounts / 2);
+  EXPECT_EQ(store->childAccountsByID().size(), kAccounts);
+}
+
+TEST_F(ManyAccounts, ParentOfTenThousandChildrenLosesThemAll) {
+  std::vector<Value> children;
+  for (std::size_t i = 0; i < kAccounts; ++i)
+    children.emplace_back(accountInfo("same", "CalDAV", {{"n", i}}));
+  children.emplace_back(accountInfo("other"));
+  const auto store = OpenStore::ofAccounts(
+      {accountInfo("p", "CalDAV", {{"ChildAccounts", Array(std::move(children))}})});
+  store->removeChildWithIdentifierFromAccount("same", (*store->allBasicAccounts())[0]);
+  EXPECT_EQ(store->children(), (Lines{"other of p"}));
+}
+
+}  // namespace
+}  // namespace accountsettings
