@@ -152,6 +152,10 @@ class RecordStores {
   // Makes sure that the active store is there, also without records.
   platform::Status ensureStore(Dataclass dataclass, const std::optional<std::string>& account);
 
+  // Takes a store with all it holds out of service, as SyncDataSource::removeStore does; a retired
+  // one stays as it is.
+  platform::Status retireStore(Dataclass dataclass, Row store);
+
   // Copies the records of a retired store into the active store of `account` (without one: the
   // device-local store), by the rules of addRecords. The retired store stays.
   Added bringBackRetiredStore(Dataclass dataclass, Row retiredStore,

@@ -57,6 +57,13 @@ platform::Status RecordStores::ensureStore(Dataclass dataclass,
   return addRecords(dataclass, account, {}).status;
 }
 
+platform::Status RecordStores::retireStore(Dataclass dataclass, Row store) {
+  return statusOf([&] {
+    deviceimage::retireStore(requireDatabase(*_databases, dataclass), store);
+    return platform::Status::success();
+  });
+}
+
 RecordStores::Added RecordStores::bringBackRetiredStore(Dataclass dataclass, Row retiredStore,
                                                         const std::optional<std::string>& account) {
   const platform::Status isRetired = statusOf([&] {

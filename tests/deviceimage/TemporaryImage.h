@@ -1,5 +1,7 @@
 #pragma once
 
+#include <unistd.h>
+
 #include <cstdlib>
 #include <filesystem>
 #include <memory>
@@ -12,11 +14,13 @@
 
 namespace deviceimage {
 
-// A directory of its own for one test, which goes with the object.
+// A directory of its own for one test, which goes with the object. In memory where the machine has
+// such a file system, because an image waits for the disk with every change.
 class TemporaryDirectory {
  public:
   TemporaryDirectory() {
-    std::string name = "/tmp/deviceimage-test-XXXXXX";
+    std::string name = ::access("/dev/shm", W_OK) == 0 ? "/dev/shm" : "/tmp";
+    name += "/deviceimage-test-XXXXXX";
     if (::mkdtemp(name.data()) == nullptr) throw std::runtime_error("mkdtemp");
     path = name;
   }
@@ -37,6 +41,12 @@ class TemporaryImage {
     OpenedImage made = DeviceImage::create(root().string());
     if (made.image == nullptr) throw std::runtime_error(made.error);
     image = std::move(made.image);
+  }
+  // A copy of all that the other image holds.
+  explicit TemporaryImage(const TemporaryImage& other) {
+    std::filesystem::copy(other.root(), root(), std::filesystem::copy_options::recursive);
+    image = DeviceImage::open(root().string()).image;
+    if (image == nullptr) throw std::runtime_error("the copy cannot be opened");
   }
   std::filesystem::path root() const { return directory.path / "image"; }
   // The path of a name inside the image, for other programs and for doing damage.
