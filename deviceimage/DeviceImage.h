@@ -57,7 +57,7 @@ struct ImageProblem {
 // The object holds the image's directory open. Any thread may use it.
 class DeviceImage {
  public:
-  // Opens the image at `path`: a directory with etc/passwd and var/mobile in it. Changes nothing.
+  // Opens the image at `path`: a directory with var/mobile/Library in it. Changes nothing.
   static OpenedImage open(const std::string& path);
 
   // Makes an image without accounts and records. `path` must not exist, or be an empty directory.

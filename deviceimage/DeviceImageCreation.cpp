@@ -45,6 +45,7 @@ std::vector<std::string> expectedDirectories() {
 // Empty when there is none or it is no number.
 std::optional<unsigned> numberIn(const DeviceImage& image, std::string_view file,
                                  std::string_view name) {
+  if (name.empty() || name.find(':') != std::string_view::npos) return std::nullopt;
   const OpenedFile opened = image.openFile(file, O_RDONLY);
   if (!opened.status.isSuccess()) return std::nullopt;
   const Descriptor descriptor(opened.descriptor);

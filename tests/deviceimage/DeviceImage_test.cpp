@@ -59,7 +59,8 @@ TEST(DeviceImage, MapsMobileToItsMakerOrForRootToAnUnprivilegedNumber) {
   ASSERT_EQ(::stat(made.image->settingsFile().c_str(), &status), 0);
   EXPECT_EQ(status.st_uid, isRoot ? 501 : ::geteuid());
   EXPECT_EQ(made.image->userNumber("501"), std::nullopt);
-  EXPECT_EQ(made.image->userNumber("mob"), std::nullopt);
+  for (const char* name : {"mob", "mobile:", "mobile:*", ""})
+    EXPECT_EQ(made.image->userNumber(name), std::nullopt) << name;
 }
 
 TEST(DeviceImage, ReadsUsersFromItsOwnFileAndNoNumberFromADamagedLine) {
