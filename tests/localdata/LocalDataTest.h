@@ -64,16 +64,17 @@ class LocalDataTest : public ::testing::Test {
             {"Identifier", "DeviceLocalAccount"},
             {"Enabled Dataclasses", dataclasses(enabled)}};
   }
-  // Gives the code a catalogue of account types with these entries in place of the shipped one.
-  void useAccountTypes(const Dictionary& types) {
+  // Gives the code this resource; from then on it finds no other than those given so.
+  void writeResource(const std::string& name, const Dictionary& content) {
     const std::string directory = device.root() + "/resources";
     std::filesystem::create_directory(directory);
-    const propertylist::Bytes bytes = propertylist::writeBinaryPropertyList(types).value();
-    std::ofstream(directory + "/AccountTypesProperties.plist", std::ios::binary)
+    const propertylist::Bytes bytes = propertylist::writeBinaryPropertyList(content).value();
+    std::ofstream(directory + "/" + name + ".plist", std::ios::binary)
         .write(reinterpret_cast<const char*>(bytes.data()),
                static_cast<std::streamsize>(bytes.size()));
     device.setResourcesDirectory(directory);
   }
+  void useAccountTypes(const Dictionary& types) { writeResource("AccountTypesProperties", types); }
   static AccountPtr record(const Dictionary& info) {
     return accountsettings::ASSBasicAccount::initWithProperties(info);
   }
