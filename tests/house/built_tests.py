@@ -1,4 +1,4 @@
-"""Whether every test and every source of the floors is built.   usage: built_tests.py TREE BUILD
+"""Whether every source of the floors and of the tests is built.   usage: built_tests.py TREE BUILD
 
 A test file that no target builds passes for ever. BUILD is the build folder, whose
 compile_commands.json lists what is compiled.
@@ -19,7 +19,7 @@ def check(tree: Path, build: Path) -> tuple[list[str], int]:
     commands = json.loads((build / "compile_commands.json").read_text(encoding="utf-8"))
     built = {(Path(entry["directory"]) / entry["file"]).resolve() for entry in commands}
     files = [path for floor in FLOORS for path in (tree / floor).rglob("*.cpp")]
-    files += (tree / "tests").rglob("*_test.cpp")
+    files += (tree / "tests").rglob("*.cpp")
     missing = [path for path in sorted(files) if path.resolve() not in built]
     return [f"{path}: no target builds it" for path in missing], len(files)
 
