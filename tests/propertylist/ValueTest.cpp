@@ -129,9 +129,9 @@ TEST(Value, IsNotChangedByAChangeOfItsCopy) {
 }
 
 TEST(Value, TakesAPartOfItselfInItsOwnPlace) {
-  Value copied(Array{Array{Array{"inner"}}});
+  Value copied(Array{Value(Array{Value(Array{"inner"})})});
   copied = (*copied.asArray())[0];
-  EXPECT_EQ(copied, Value(Array{Array{"inner"}}));
+  EXPECT_EQ(copied, Value(Array{Value(Array{"inner"})}));
   Value other(Array{"text"});
   other = (*other.asArray())[0];
   EXPECT_EQ(other, Value("text"));
