@@ -23,6 +23,11 @@ class ImageLock {
   static Attempt tryAcquire(const DeviceImage& image);
 
   ~ImageLock();  // frees the lock; its file stays
+
+  // The open file that holds the lock, for a program that is started to share it: the lock is free
+  // when the last of its descriptors is closed.
+  int descriptor() const { return _descriptor; }
+
   ImageLock(const ImageLock&) = delete;
   ImageLock& operator=(const ImageLock&) = delete;
 

@@ -3,12 +3,15 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <filesystem>
 #include <system_error>
 
 namespace host {
 namespace {
+
+constexpr const char* kThisProgram = "/proc/self/exe";
 
 std::string errorText(int number) { return std::generic_category().message(number); }
 
@@ -19,7 +22,18 @@ bool othersMayWrite(const struct stat& status) {
 }
 
 bool ownerIsTrusted(const struct stat& status) {
-  return status.st_uid == 0 || status.st_uid == geteuid();
+  if (status.st_uid == 0 || status.st_uid == geteuid()) return true;
+  struct stat program = {};
+  return stat(kThisProgram, &program) == 0 && status.st_uid == program.st_uid;
+}
+
+bool holdsThisProgram(const std::filesystem::path& folder) {
+  std::error_code error;
+  std::filesystem::path program = std::filesystem::read_symlink(kThisProgram, error);
+  if (error) program = "/";  // then every folder below it is looked at
+  const auto [end, ignored] =
+      std::mismatch(folder.begin(), folder.end(), program.begin(), program.end());
+  return end == folder.end();
 }
 
 std::optional<std::string> whyFolderAboveIsNotTrusted(const std::string& path) {
@@ -52,11 +66,10 @@ std::optional<std::string> whyNotTrusted(const std::string& path) {
     return path +
            " belongs to another user; give it to the user who runs the host or to root with " +
            "chown.";
-  for (std::filesystem::path above = std::filesystem::path(path).parent_path();;
-       above = above.parent_path()) {
+  for (std::filesystem::path above = std::filesystem::path(path).parent_path();
+       !holdsThisProgram(above); above = above.parent_path())
     if (auto reason = whyFolderAboveIsNotTrusted(above.string())) return reason;
-    if (above == above.parent_path()) return std::nullopt;
-  }
+  return std::nullopt;
 }
 
 }  // namespace host

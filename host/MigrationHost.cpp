@@ -91,7 +91,7 @@ MigrationReport MigrationHost::run(const RunOptions& options) {
   const ImageLock::Attempt attempt = ImageLock::tryAcquire(*_image);
   switch (attempt.outcome) {
     case ImageLock::Outcome::held:
-      _runUnderLock(options);
+      _runUnderLock(options, attempt.lock->descriptor());
       break;
     case ImageLock::Outcome::heldByAnother:
       _report.outcome = RunOutcome::busy;
@@ -110,7 +110,7 @@ void MigrationHost::_refuse(std::string reason) {
   _report.reasons.push_back(std::move(reason));
 }
 
-void MigrationHost::_runUnderLock(const RunOptions& options) {
+void MigrationHost::_runUnderLock(const RunOptions& options, int lockDescriptor) {
   _listener.stageBegan("Checking the image");
   _readBundles(options);
   for (std::string& reason : reasonsNotToStart(*_image, readSettings(*_image), _bundles))
@@ -122,7 +122,7 @@ void MigrationHost::_runUnderLock(const RunOptions& options) {
   if (!before.error.empty()) return _refuse(before.error);
   const Selection selection = selectionOf(_image, _bundles);
   const deviceimage::SyncAgent agent(*_image);
-  if (!_interruption.requested()) _runMigrators(options);
+  if (!_interruption.requested()) _runMigrators(options, lockDescriptor);
 
   _listener.stageBegan("Looking at the image after");
   const Observation after = observe(_image);
@@ -171,12 +171,12 @@ bool MigrationHost::_checkDatabases(RunOutcome whenDamaged) {
   return isFit;
 }
 
-void MigrationHost::_runMigrators(const RunOptions& options) {
+void MigrationHost::_runMigrators(const RunOptions& options, int lockDescriptor) {
   adoptOrphans();
   for (const MigratorBundle& bundle : _bundles) {
     _listener.stageBegan("Running " + bundle.name);
-    const MigratorTask task = {_image->rootPath(), _image->temporaryDirectory(), bundle,
-                               options.limit};
+    const MigratorTask task = {_image->rootPath(), _image->temporaryDirectory(), lockDescriptor,
+                               bundle, options.limit};
     MigratorOutcome outcome =
         runMigrator(task, _interruption, [this](std::string_view line) { _keepLogLine(line); });
     std::string sentence = sentenceFor(outcome);

@@ -47,12 +47,12 @@ class MigrationHost {
   MigrationReport run(const RunOptions& options);
 
  private:
-  void _runUnderLock(const RunOptions& options);
+  void _runUnderLock(const RunOptions& options, int lockDescriptor);
   void _readBundles(const RunOptions& options);
   void _refuse(std::string reason);
   bool _prepare();
   bool _checkDatabases(RunOutcome whenDamaged);
-  void _runMigrators(const RunOptions& options);
+  void _runMigrators(const RunOptions& options, int lockDescriptor);
   void _keepLogLine(std::string_view line);
   void _compare(const Observation& before, const Observation& after, const Selection& selection,
                 const deviceimage::SyncAgent& agent);

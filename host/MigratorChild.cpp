@@ -1,6 +1,9 @@
 #include "host/MigratorChild.h"
 
 #include <cxxabi.h>
+#include <fcntl.h>
+#include <pthread.h>
+#include <unistd.h>
 
 #include <cstdlib>
 #include <exception>
@@ -23,6 +26,13 @@ constexpr int kExitRaised = 72;
 
 void tell(MessageKind kind, std::string_view text = {}) {
   sendMessage(kChannelDescriptor, kind, text);
+}
+
+// What the migrator starts must not keep the image locked when the migrator has gone.
+void keepDescriptorsFromChildren() {
+  fcntl(kChannelDescriptor, F_SETFD, FD_CLOEXEC);
+  fcntl(kLockDescriptor, F_SETFD, FD_CLOEXEC);
+  pthread_atfork(nullptr, nullptr, [] { close(kLockDescriptor); });
 }
 
 int tellNotLoaded(std::string_view why) {
@@ -70,6 +80,7 @@ bool isMigratorProcess(int argumentCount, char** arguments) {
 }
 
 int runMigratorInThisProcess(char** arguments) {
+  keepDescriptorsFromChildren();
   const deviceimage::OpenedImage opened = deviceimage::DeviceImage::open(arguments[2]);
   if (!opened.image) return tellNotLoaded(opened.error);
   deviceimage::ServiceOptions options;

@@ -4,8 +4,10 @@
 
 namespace host {
 
-// Where the process that runs a migrator finds its end of the channel.
+// Where the process that runs a migrator finds its end of the channel, and the image's lock, which
+// it shares: when the host is killed, the image is free no sooner than the migrator has ended.
 inline constexpr int kChannelDescriptor = 3;
+inline constexpr int kLockDescriptor = 4;
 
 // What the host starts that process with: this, the image, the bundle's folder, its executable and
 // its principal class. Not for people.

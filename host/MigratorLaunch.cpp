@@ -7,6 +7,7 @@
 #include <sys/syscall.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <array>
 #include <cerrno>
 #include <csignal>
@@ -74,23 +75,24 @@ void restoreSignals() {
   sigprocmask(SIG_SETMASK, &none, nullptr);
 }
 
-// The descriptors 0 to 3 become the null device, the output twice, and the channel. The sources lie
-// above 3, so that none is overwritten before its turn.
-bool arrangeDescriptors(int null, int output, int channel) {
-  const std::array<int, 4> sources = {null, output, output, channel};
-  for (int target = 0; target < 4; ++target)
+// What the new process finds as its descriptors 0 to 4: the null device, the output twice, the
+// channel and the lock. All of them lie above 4, so that none is overwritten before its turn.
+using Descriptors = std::array<int, kLockDescriptor + 1>;
+
+bool arrangeDescriptors(const Descriptors& sources) {
+  for (int target = 0; target <= kLockDescriptor; ++target)
     if (dup2(sources[static_cast<std::size_t>(target)], target) < 0) return false;
-  return close_range(4, ~0U, 0) == 0;
+  return close_range(kLockDescriptor + 1, ~0U, 0) == 0;
 }
 
-[[noreturn]] void becomeMigrator(pid_t host, int null, int output, int channel,
-                                 char* const* arguments, char* const* environment) {
+[[noreturn]] void becomeMigrator(pid_t host, const Descriptors& descriptors, char* const* arguments,
+                                 char* const* environment) {
   setsid();
   prctl(PR_SET_PDEATHSIG, SIGKILL);
   if (getppid() != host) _exit(EXIT_FAILURE);  // the host has ended already
   umask(077);
   lowerLimits();
-  if (arrangeDescriptors(null, output, channel)) {
+  if (arrangeDescriptors(descriptors)) {
     restoreSignals();
     execve(kThisProgram, arguments, environment);
   }
@@ -99,9 +101,8 @@ bool arrangeDescriptors(int null, int output, int channel) {
 }
 
 // The same descriptor above those that the new process needs for itself.
-deviceimage::Descriptor movedUp(deviceimage::Descriptor descriptor) {
-  return deviceimage::Descriptor(
-      fcntl(descriptor.number(), F_DUPFD_CLOEXEC, kChannelDescriptor + 1));
+deviceimage::Descriptor movedUp(int descriptor) {
+  return deviceimage::Descriptor(fcntl(descriptor, F_DUPFD_CLOEXEC, kLockDescriptor + 1));
 }
 
 }  // namespace
@@ -113,12 +114,17 @@ std::optional<LaunchedMigrator> launchMigrator(const MigratorTask& task) {
   LaunchedMigrator launched;
   launched.channel = std::move(channel->host);
   launched.output = deviceimage::Descriptor(pipeEnds[0]);
-  const deviceimage::Descriptor childOutput = movedUp(deviceimage::Descriptor(pipeEnds[1]));
-  const deviceimage::Descriptor childChannel = movedUp(std::move(channel->child));
-  const deviceimage::Descriptor null =
-      movedUp(deviceimage::Descriptor(open("/dev/null", O_RDWR | O_CLOEXEC)));
-  if (!childOutput.isOpen() || !childChannel.isOpen() || !null.isOpen()) return std::nullopt;
-  if (fcntl(launched.output.number(), F_SETFL, O_NONBLOCK) != 0) return std::nullopt;
+  const deviceimage::Descriptor pipeEnd(pipeEnds[1]);
+  const deviceimage::Descriptor nullDevice(open("/dev/null", O_RDWR | O_CLOEXEC));
+  const deviceimage::Descriptor null = movedUp(nullDevice.number());
+  const deviceimage::Descriptor output = movedUp(pipeEnd.number());
+  const deviceimage::Descriptor childChannel = movedUp(channel->child.number());
+  const deviceimage::Descriptor lock = movedUp(task.lockDescriptor);
+  const Descriptors descriptors = {null.number(), output.number(), output.number(),
+                                   childChannel.number(), lock.number()};
+  if (std::find(descriptors.begin(), descriptors.end(), -1) != descriptors.end() ||
+      fcntl(launched.output.number(), F_SETFL, O_NONBLOCK) != 0)
+    return std::nullopt;
 
   std::vector<std::string> arguments = {"migration-host",       kRunMigratorArgument,
                                         task.imagePath,         task.bundle.path,
@@ -130,8 +136,7 @@ std::optional<LaunchedMigrator> launchMigrator(const MigratorTask& task) {
   launched.identifier = fork();
   if (launched.identifier < 0) return std::nullopt;
   if (launched.identifier == 0)
-    becomeMigrator(host, null.number(), childOutput.number(), childChannel.number(),
-                   argumentPointers.data(), environmentPointers.data());
+    becomeMigrator(host, descriptors, argumentPointers.data(), environmentPointers.data());
   // By its number: the library's declaration of the function does not fit C++.
   launched.ended =
       deviceimage::Descriptor(static_cast<int>(syscall(SYS_pidfd_open, launched.identifier, 0)));

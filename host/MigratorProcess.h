@@ -38,6 +38,7 @@ inline constexpr std::size_t kMaximumOutput = 64 * 1024;
 struct MigratorTask {
   std::string imagePath;  // absolute
   std::string temporaryDirectory;
+  int lockDescriptor = -1;  // the image's lock, which the process is to share
   MigratorBundle bundle;
   std::chrono::seconds limit{0};
 };
@@ -47,10 +48,9 @@ using LineSink = std::function<void(std::string_view line)>;
 
 // Runs the migrator of a bundle in a process of its own and comes back in time, whatever it does:
 //
-// - The process is this program anew (/proc/self/exe with kRunMigratorArgument), so that it
-// inherits
-//   nothing but an environment with TMPDIR in it, umask 077, and its end of the channel. It is in a
-//   session of its own, its address space is limited, and it dies with the host.
+// - The process is this program anew (/proc/self/exe with kRunMigratorArgument), so that it inherits
+//   nothing but an environment with TMPDIR in it, umask 077, its end of the channel and the image's
+//   lock. It is in a session of its own, its address space is limited, and it dies with the host.
 // - Past the limit of the task, or when the user interrupts, it is killed.
 // - When it has ended, every process that it left behind is killed, and none remains a zombie. The
 //   caller has no other children meanwhile.

@@ -123,7 +123,8 @@ class FaultyBundles(hosttest.HostTestCase):
     def test_surroundings_are_those_of_a_new_process(self):
         run = self.check("ShowsItsSurroundings", 0, "done")
         self.assertEqual([f"TMPDIR={self.image}/tmp", "HOME=(null)", "umask=63",
-                          "leads its session: 1", "few descriptors: 1", "signals held back: 0"],
+                          "leads its session: 1", "few descriptors: 1", "signals held back: 0",
+                          "a child holds the lock: 0"],
                          run.report["log"])
 
     def test_the_next_migrator_runs_after_one_that_crashed(self):
@@ -169,6 +170,21 @@ class Stopping(hosttest.HostTestCase):
         while self.processes_of_runs() and time.monotonic() < deadline:
             time.sleep(0.01)
         self.assert_nothing_is_left()
+
+    def test_the_migrator_shares_the_lock_so_that_it_outlives_a_killed_host(self):
+        process = self.start_sleeping()
+        migrator, = self.processes_of_runs()
+        self.assertEqual(str(self.image / hosttest.LOCK),
+                         hosttest.os.readlink(f"/proc/{migrator}/fd/4"))
+        process.send_signal(signal.SIGINT)
+        self.assertEqual(130, self.finish(process).code)
+
+    def test_a_reader_that_goes_away_does_not_stop_the_migration(self):
+        process = self.start("--bundle", hosttest.BUNDLES / "LogsAndSucceeds.migrator")
+        process.stdout.close()
+        process.stderr.close()
+        self.assertEqual(1, process.wait(timeout=60))
+        self.assertIn("second line", (self.image / "var/log/system.log").read_text())
 
     def test_a_second_host_is_turned_away(self):
         process = self.start_sleeping()

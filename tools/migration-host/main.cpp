@@ -1,6 +1,7 @@
 // The command line of the migration host.
 #include <unistd.h>
 
+#include <csignal>
 #include <cstdio>
 #include <cstdlib>
 #include <exception>
@@ -33,6 +34,8 @@ bool print(const std::string& text) {
 }
 
 int run(const CommandLine& command) {
+  // A reader of the output that goes away does not stop a migration.
+  std::signal(SIGPIPE, SIG_IGN);
   Terminal terminal(command.quiet);
   if (command.logFile) {
     const std::string problem = terminal.openLogFile(*command.logFile);
