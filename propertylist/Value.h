@@ -42,6 +42,7 @@ using Bytes = std::vector<std::uint8_t>;
 class PROPERTYLIST_EXPORT Array {
  public:
   Array();
+  // An array of one array is Array{Value(inner)}: some compilers take Array{inner} for a copy.
   Array(std::initializer_list<Value> values);
   explicit Array(std::vector<Value> values);
   Array(const Array&);
@@ -131,7 +132,8 @@ class PROPERTYLIST_EXPORT Dictionary {
 // by kind: integer 1, real 1.0 and boolean true differ from one another; reals compare bit by bit.
 // A signed and an unsigned integer of equal value are equal.
 //
-// However deep a value is nested, copying, comparing and destroying it use a bounded stack.
+// A value that was moved from is an empty dictionary. However deep a value is nested, copying,
+// comparing and destroying it use a bounded stack.
 class PROPERTYLIST_EXPORT Value {
  public:
   Value(Dictionary dictionary);    // NOLINT(google-explicit-constructor): literals read as values
