@@ -99,16 +99,17 @@ void Output::_fail(int errorNumber) {
                                    _path.empty() ? "standard output" : _path, reason(errorNumber)));
 }
 
-Progress::Progress(std::string_view what, std::size_t total)
-    : _what(what), _total(total), _isShown(total > 1 && ::isatty(STDERR_FILENO) == 1) {}
+Progress::Progress() : _isTerminal(::isatty(STDERR_FILENO) == 1) {}
 
-void Progress::step() {
-  ++_done;
-  if (_isShown) fmt::print(stderr, "\r{} {} of {}", _what, _done, _total);
+Progress::~Progress() { wipe(); }
+
+void Progress::show(std::string_view text) {
+  wipe();
+  if (_isTerminal) std::fwrite(text.data(), 1, text.size(), stderr);
 }
 
-void Progress::clear() {
-  if (_isShown) fmt::print(stderr, "\r\x1B[K");
+void Progress::wipe() {
+  if (_isTerminal) std::fputs("\r\x1B[K", stderr);
 }
 
 }  // namespace deviceimagetool

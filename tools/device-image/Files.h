@@ -35,18 +35,20 @@ class Output {
   std::FILE* _file = nullptr;
 };
 
-// Counts steps on a terminal, in one line that it wipes; silent when standard error is none.
+// Tells on a terminal what a long run is at, in one line that it wipes in the end; silent when
+// standard error is no terminal.
 class Progress {
  public:
-  Progress(std::string_view what, std::size_t total);
-  void step();
-  void clear();
+  Progress();
+  ~Progress();
+  Progress(const Progress&) = delete;
+  Progress& operator=(const Progress&) = delete;
+  void show(std::string_view text);
+  // Before other lines are written to standard error.
+  void wipe();
 
  private:
-  std::string_view _what;
-  std::size_t _total;
-  std::size_t _done = 0;
-  bool _isShown;
+  bool _isTerminal;
 };
 
 }  // namespace deviceimagetool

@@ -72,8 +72,9 @@ void reportSkipped(const std::string& file, Dataclass dataclass, std::size_t ski
 }
 
 void gather(const Options& options, Dataclass dataclass, const std::string& file,
-            Gathered& gathered) {
+            Progress& progress, Gathered& gathered) {
   ReadText text = readText(dataclass, readWholeFile(file, kMaximumFileSize));
+  progress.wipe();
   reportProblems(file, text);
   gathered.badCount += text.problems.size();
   std::size_t skipped = 0;
@@ -95,20 +96,21 @@ ExitCode run(const Options& options) {
   const LockedImage locked = openImageForWriting(options.directory);
   const ChosenStore store = chooseStore(*locked.image, dataclass, options.account);
   Gathered gathered;
-  Progress progress("reading", options.files.size());
-  for (const std::string& file : options.files) {
-    progress.step();
-    gather(options, dataclass, file, gathered);
+  Progress progress;
+  for (std::size_t i = 0; i < options.files.size(); ++i) {
+    progress.show(fmt::format("reading file {} of {}", i + 1, options.files.size()));
+    gather(options, dataclass, options.files[i], progress, gathered);
   }
-  progress.clear();
   deviceimage::Placed placed;
   if (!gathered.records.empty()) {
+    progress.show(fmt::format("writing {} records", gathered.records.size()));
     RecordStores stores(locked.image, RecordStores::Access::readWrite);
     const RecordStores::Added added =
         stores.addRecords(dataclass, store.storeIdentifier, gathered.records);
     requireSuccess(added.status, "nothing was imported");
     placed = added.placed;
   }
+  progress.wipe();
   fmt::print("{}: {} added, {} already there, {} conflicting copies, {} bad; {}\n",
              deviceimage::dataclassName(dataclass), placed.added, placed.alreadyThere,
              placed.conflicts, gathered.badCount, store.description);

@@ -2,6 +2,7 @@
 
 import html.parser
 import os
+import pty
 import stat
 import subprocess
 import unittest
@@ -294,6 +295,23 @@ class BadInput(ImageTest):
     def test_control_characters_of_names_do_not_reach_the_terminal(self):
         said = self.import_bad(7, "contacts", self.directory / "a\x1b[31m\nb")
         self.assertIn("a\\x1b[31m\\x0ab", said)
+
+
+class Progress(ImageTest):
+    def test_is_shown_on_a_terminal_and_wiped(self):
+        outer, inner = pty.openpty()
+        command = [TOOL, "import", self.image, "--dataclass", "contacts", self.file("a.vcf", ADA)]
+        subprocess.run(command, stdout=subprocess.PIPE, stderr=inner, check=True)
+        os.close(inner)
+        shown = os.read(outer, 10000)
+        os.close(outer)
+        self.assertIn(b"reading file 1 of 1", shown)
+        self.assertIn(b"writing 1 records", shown)
+        self.assertTrue(shown.endswith(b"\r\x1b[K"))
+
+    def test_is_silent_in_a_pipe(self):
+        ended = run("import", self.image, "--dataclass", "contacts", self.file("a.vcf", ADA))
+        self.assertEqual(ended.stderr, b"")
 
 
 class ExportFiles(ImageTest):

@@ -131,7 +131,7 @@ class Reader {
     _advance();
     _passInline();
     const std::size_t next = _tag ? _tag->begin : _bytes.size();
-    const std::string_view text = trimmed(_bytes.substr(0, next));
+    const std::string_view text = trimmed(_bytes.substr(end, next - end));
     return static_cast<std::size_t>(text.data() + text.size() - _bytes.data());
   }
 
