@@ -92,7 +92,8 @@ def contact(owner: str, number: int, phone: str = "", changed: str = "") -> str:
         head = ["VERSION:3.0", f"UID:{owner}-contact-{number}", f"TEL;TYPE=CELL:{phone}"]
     body = [f"N:{family};{given};;;", f"FN:{given} {family}", f"EMAIL:person{number}@{owner}.example"]
     if number % 4 == 0:
-        body.append(f"NOTE:Met at the {number}. conference\\, and a text long enough to be folded: {NOTE_LINES[number % len(NOTE_LINES)]}")
+        note_line = NOTE_LINES[number % len(NOTE_LINES)]
+        body.append(f"NOTE:Met at the {number}. conference\\, and a text long enough to be folded: {note_line}")
     if number % 6 == 0:
         encoded = base64.b64encode(picture(number)).decode()
         body.append(
@@ -129,7 +130,8 @@ def event(owner: str, number: int, title: str = "", changed: str = "") -> str:
     if number % 9 == 8:
         when = [f"DTSTART;VALUE=DATE:202607{day:02}", f"DTEND;VALUE=DATE:202607{day + 1:02}"]
     else:
-        when = [f"DTSTART;TZID={zone}:202605{day:02}T{hour:02}0000", f"DTEND;TZID={zone}:202605{day:02}T{hour + 1:02}3000"]
+        date = f"TZID={zone}:202605{day:02}"
+        when = [f"DTSTART;{date}T{hour:02}0000", f"DTEND;{date}T{hour + 1:02}3000"]
     details = [f"SUMMARY:{title} {number}"]
     if number % 3 == 0:
         details += ["BEGIN:VALARM", "ACTION:DISPLAY", f"DESCRIPTION:{title}", "TRIGGER:-PT15M", "END:VALARM"]
@@ -138,9 +140,11 @@ def event(owner: str, number: int, title: str = "", changed: str = "") -> str:
     repeating = ["RRULE:FREQ=DAILY;INTERVAL=2;COUNT=12", f"EXDATE;TZID={zone}:202605{day + 2:02}T{hour:02}0000"]
     moved = [
         f"RECURRENCE-ID;TZID={zone}:202605{day + 4:02}T{hour:02}0000", *common,
-        f"DTSTART;TZID={zone}:202605{day + 4:02}T{hour + 2:02}0000", "DURATION:PT45M", f"SUMMARY:{title} {number} (moved)",
+        f"DTSTART;TZID={zone}:202605{day + 4:02}T{hour + 2:02}0000", "DURATION:PT45M",
+        f"SUMMARY:{title} {number} (moved)",
     ]
-    return lines("BEGIN:VEVENT", *common, *when, *repeating, *details, "END:VEVENT") + lines("BEGIN:VEVENT", *moved, "END:VEVENT")
+    first = lines("BEGIN:VEVENT", *common, *when, *repeating, *details, "END:VEVENT")
+    return first + lines("BEGIN:VEVENT", *moved, "END:VEVENT")
 
 
 def task(owner: str, number: int, title: str = "", changed: str = "") -> str:
