@@ -2,10 +2,13 @@
 
 #include <gtest/gtest.h>
 
+#include <atomic>
+#include <functional>
 #include <memory>
 #include <ostream>
 #include <string>
 #include <string_view>
+#include <thread>
 #include <vector>
 
 #include "QuillnetAccountTypeRemoval/ASSAccountsManager.h"
@@ -73,6 +76,19 @@ Dictionary without(Dictionary dictionary, std::string_view key);
 // The identifiers of accounts, in order; "(null)" for an account without one.
 Lines identifiersOf(const AccountArray& accounts);
 Lines identifiersOf(const Array& accountInfos);
+
+// Runs `task` on a second thread, from the moment in which the resource is first asked for. The
+// asking thread goes on when the second one has begun, and has had every chance to ask too.
+class SecondComer {
+ public:
+  SecondComer(AccountsDevice& device, const std::string& resource, std::function<void()> task);
+  void join() { _thread.join(); }
+
+ private:
+  std::atomic<int> _questions = 0;
+  std::atomic<bool> _begun = false;
+  std::thread _thread;
+};
 
 // Expects `operation` to end in an assertion failure of this text and source file.
 template <typename Operation>

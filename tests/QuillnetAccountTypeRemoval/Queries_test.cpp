@@ -160,6 +160,14 @@ TEST_F(Queries, PlainRecordOfTheTypeIsReplacedInPlaceOrRemoved) {
   EXPECT_EQ(device.logLines(), (Lines{"DeviceLocalAccount missing. Creating..."}));
 }
 
+TEST_F(Queries, AccountOfTheClassButAnotherTypeDoesNotCount) {
+  const auto other = OpenStore::ofAccounts({});
+  other->insertAccount(ASSDeviceLocalAccount::initWithProperties(accountInfo("1", "CalDAV")));
+  const auto created = other->fullDeviceLocalAccount();
+  EXPECT_EQ(other->count(), 2U);
+  EXPECT_EQ((*other->allBasicAccounts())[1], created);
+}
+
 TEST_F(Queries, CreatedAccountReachesTheFileWithTheNextSave) {
   device.writeAccounts({accountInfo("1")});
   const AccountsManagerPtr writing = ASSAccountsManager::init();

@@ -134,6 +134,16 @@ TEST_F(ReplaceAccountsWithTypes, ChildIsReplacedInItsParentRatherThanDoubled) {
   EXPECT_EQ(store->children(), (Lines{"a1 of a", "m1 of m"}));
 }
 
+TEST_F(ReplaceAccountsWithTypes, ChildThatStaysIsReplacedInTheReplacementOfItsParent) {
+  const AccountPtr oldParent = at(0);
+  const AccountPtr newParent = record(parentInfo("a", {accountInfo("a1"), accountInfo("a2")}));
+  replace({}, {newParent, childRecord(accountInfo("a1", "CalDAV", {{"n", 2}}), newParent)});
+  EXPECT_EQ(childrenOf(newParent),
+            (Array{accountInfo("a2"), accountInfo("a1", "CalDAV", {{"n", 2}})}));
+  EXPECT_EQ(childrenOf(oldParent), (Array{accountInfo("a1")}));
+  EXPECT_EQ(store->children(), (Lines{"a1 of a", "a2 of a", "m1 of m"}));
+}
+
 TEST_F(ReplaceAccountsWithTypes, NewChildIsAddedToItsParent) {
   replace({}, {childRecord(accountInfo("b1"), at(2))});
   EXPECT_EQ(order(), (Lines{"a", "m", "b"}));
