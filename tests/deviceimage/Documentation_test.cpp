@@ -4,7 +4,6 @@
 #include <array>
 #include <cstdio>
 #include <fstream>
-#include <regex>
 
 #include "deviceimage/Database.h"
 #include "deviceimage/DeviceImageServices.h"
@@ -55,17 +54,36 @@ void fill(const TemporaryImage& image) {
   ASSERT_TRUE(sources.removeStore(service, false).isSuccess());
 }
 
+// The text from `from` on up to the next "```", with `from` moved behind that.
+std::string block(const std::string& text, std::size_t& from) {
+  const std::size_t end = text.find("```", from);
+  std::string inside = text.substr(from, end - from);
+  from = end + 3;
+  return inside;
+}
+
+std::string replaced(std::string text, const std::string& from, const std::string& to) {
+  for (std::size_t at = text.find(from); at != std::string::npos;
+       at = text.find(from, at + to.size()))
+    text.replace(at, from.size(), to);
+  return text;
+}
+
 TEST(DeviceImageDocument, AnswersItsOwnQuestions) {
   const TemporaryImage image;
   fill(image);
   const std::string text = documentation();
-  const std::regex question("```sh\n([^`]*)```\n\n```text\n([^`]*)```");
+  const std::string question = "```sh\n";
+  const std::string answer = "\n\n```text\n";
   int questions = 0;
-  for (std::sregex_iterator it(text.begin(), text.end(), question), end; it != end; ++it) {
-    const std::string command = (*it)[1];
+  for (std::size_t at = text.find(question); at != std::string::npos;
+       at = text.find(question, at)) {
+    at += question.size();
+    const std::string command = block(text, at);
     SCOPED_TRACE(command);
-    EXPECT_EQ(outputOf(std::regex_replace(command, std::regex("IMAGE"), image.root().string())),
-              (*it)[2]);
+    ASSERT_EQ(text.substr(at, answer.size()), answer);
+    at += answer.size();
+    EXPECT_EQ(outputOf(replaced(command, "IMAGE", image.root().string())), block(text, at));
     ++questions;
   }
   EXPECT_EQ(questions, 6);

@@ -45,8 +45,10 @@ void countCalls(Fate wanted, int calls) {
   };
   // Which of the first two is there depends on how SQLite was built; 64-bit systems mean the same
   // by both.
-  const bool replaced = replace("pwrite", countedWrite) | replace("pwrite64", countedWrite);
-  if (!replaced || !replace("ftruncate", countedTruncate) || !replace("unlink", countedUnlink))
+  const bool countsWrites = replace("pwrite", countedWrite);
+  const bool countsWideWrites = replace("pwrite64", countedWrite);
+  if (!(countsWrites || countsWideWrites) || !replace("ftruncate", countedTruncate) ||
+      !replace("unlink", countedUnlink))
     ::_exit(3);
   fate = wanted;
   callsLeft = calls;
