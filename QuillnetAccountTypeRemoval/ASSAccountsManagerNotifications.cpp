@@ -202,8 +202,11 @@ void ASSAccountsManager::_sendNotificationsForChangedAccounts() const {
   }
   for (const auto& [name, changes] : table) {
     platform::RuntimeClass& found = notifierClass(name, kSendingLine);
+    auto* const notifier = dynamic_cast<AccountChangesNotifier*>(&found);
     // Every notifier must hear of changes: one that cannot is a broken installation.
-    dynamic_cast<AccountChangesNotifier&>(found).noteAccountChanges(changes);
+    if (notifier == nullptr)
+      raiseAssertionFailure(kSourceFile, kSendingLine, "%@ does not take account changes", name);
+    notifier->noteAccountChanges(changes);
   }
 }
 
