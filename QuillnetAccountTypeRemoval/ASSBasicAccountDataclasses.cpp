@@ -11,7 +11,6 @@
 namespace accountsettings {
 
 using platform::RestrictedFeature;
-using propertylist::Value;
 
 namespace {
 

@@ -12,7 +12,6 @@ namespace accountsettings {
 namespace {
 
 using platform::FileServices;
-using platform::Status;
 
 constexpr std::string_view kOwnerName = "mobile";
 // How many names are tried when somebody else already took the one that was proposed.

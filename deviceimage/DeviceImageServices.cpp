@@ -66,7 +66,7 @@ class DeviceImageServices::Implementation {
   platform::Services _services;
 };
 
-DeviceImageServices::DeviceImageServices(std::shared_ptr<const DeviceImage> image,
+DeviceImageServices::DeviceImageServices(const std::shared_ptr<const DeviceImage>& image,
                                          ServiceOptions options)
     : _implementation(std::make_unique<Implementation>(image, std::move(options))) {}
 

@@ -28,7 +28,7 @@ struct ServiceOptions {
 // is used by one process: a child made by fork makes its own.
 class DeviceImageServices {
  public:
-  explicit DeviceImageServices(std::shared_ptr<const DeviceImage> image,
+  explicit DeviceImageServices(const std::shared_ptr<const DeviceImage>& image,
                                ServiceOptions options = {});
   ~DeviceImageServices();
 

@@ -1,9 +1,11 @@
 #include "deviceimage/ImagePreferences.h"
 
+#include <utility>
+
 namespace deviceimage {
 
 ImagePreferences::ImagePreferences(std::shared_ptr<const DeviceImage> image)
-    : _image(image), _journal(image, DeviceImage::kPreferenceChangesFile) {}
+    : _image(image), _journal(std::move(image), DeviceImage::kPreferenceChangesFile) {}
 
 std::optional<propertylist::Value> ImagePreferences::readDefault(std::string_view key) {
   return _image->readProperty(DeviceImage::kProcessDefaultsFile, key);
