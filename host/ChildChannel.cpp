@@ -10,9 +10,9 @@ namespace host {
 namespace {
 
 // Well below what the kernel takes as one message.
-constexpr std::size_t kMaximumText = 32 * 1024;
+constexpr std::size_t kMaximumText = std::size_t{32} * 1024;
 // A line that never ends is cut here.
-constexpr std::size_t kMaximumLine = 1024 * 1024;
+constexpr std::size_t kMaximumLine = std::size_t{1024} * 1024;
 
 void sendOne(int descriptor, MessageKind kind, std::string_view text) {
   std::string message(1, static_cast<char>(kind));

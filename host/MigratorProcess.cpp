@@ -104,7 +104,7 @@ class Watch {
 
   // False when nobody holds the other end any more.
   bool _readOutput() {
-    std::array<char, 16 * 1024> buffer = {};
+    std::array<char, 16384> buffer = {};
     for (int count = 0; count < kReadsATurn; ++count) {
       const ssize_t size = read(_process.output.number(), buffer.data(), buffer.size());
       if (size < 0 && errno == EINTR) continue;

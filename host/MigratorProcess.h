@@ -33,7 +33,7 @@ struct MigratorOutcome {
   bool outputWasCut = false;
 };
 
-inline constexpr std::size_t kMaximumOutput = 64 * 1024;
+inline constexpr std::size_t kMaximumOutput = std::size_t{64} * 1024;
 
 struct MigratorTask {
   std::string imagePath;  // absolute
@@ -48,7 +48,8 @@ using LineSink = std::function<void(std::string_view line)>;
 
 // Runs the migrator of a bundle in a process of its own and comes back in time, whatever it does:
 //
-// - The process is this program anew (/proc/self/exe with kRunMigratorArgument), so that it inherits
+// - The process is this program anew (/proc/self/exe with kRunMigratorArgument), so that it
+// inherits
 //   nothing but an environment with TMPDIR in it, umask 077, its end of the channel and the image's
 //   lock. It is in a session of its own, its address space is limited, and it dies with the host.
 // - Past the limit of the task, or when the user interrupts, it is killed.

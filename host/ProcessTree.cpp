@@ -37,7 +37,8 @@ std::vector<pid_t> childrenOf(pid_t parent) {
   while (const dirent* entry = readdir(directory)) {
     const std::string name = entry->d_name;
     if (name.find_first_not_of("0123456789") != std::string::npos) continue;
-    if (parentOf(name) == parent) children.push_back(static_cast<pid_t>(std::atol(name.c_str())));
+    if (parentOf(name) == parent)
+      children.push_back(static_cast<pid_t>(std::strtol(name.c_str(), nullptr, 10)));
   }
   closedir(directory);
   return children;

@@ -1,7 +1,6 @@
 #include "host/RecordAccounting.h"
 
 #include <map>
-#include <optional>
 #include <unordered_map>
 #include <unordered_set>
 #include <utility>
@@ -21,16 +20,26 @@ class ActiveStores {
  public:
   explicit ActiveStores(const Observation& observation) {
     for (const ObservedStore& store : observation.stores)
-      if (!store.retired) _stores.emplace(std::pair(store.dataclass, store.account), &store);
+      if (!store.retired) _stores.emplace(Name(store.dataclass, nameOf(store)), &store);
   }
-  // The account's store, without one the local store; null when there is none.
-  const ObservedStore* find(Dataclass dataclass, const std::optional<std::string>& account) const {
-    const auto found = _stores.find({dataclass, account});
-    return found != _stores.end() ? found->second : nullptr;
+  const ObservedStore* findLocal(Dataclass dataclass) const { return _find({dataclass, {}}); }
+  // The one that `store` is, maybe at another time; null when there is none.
+  const ObservedStore* find(const ObservedStore& store) const {
+    return _find({store.dataclass, nameOf(store)});
   }
 
  private:
-  std::map<std::pair<Dataclass, std::optional<std::string>>, const ObservedStore*> _stores;
+  using Name = std::pair<Dataclass, std::string>;  // no account is named with an empty text
+
+  static std::string nameOf(const ObservedStore& store) {
+    return store.account ? *store.account : std::string();
+  }
+  const ObservedStore* _find(const Name& name) const {
+    const auto found = _stores.find(name);
+    return found != _stores.end() ? found->second : nullptr;
+  }
+
+  std::map<Name, const ObservedStore*> _stores;
 };
 
 std::int64_t countOf(const ObservedStore* store) {
@@ -66,9 +75,7 @@ class DataclassAccounting {
     std::int64_t lost = 0;
     for (const ObservedRecord& record : before.records) {
       ++line.serviceBefore;
-      if (_wasThere(record))
-        ++line.alreadyThere;
-      else if (_takeFresh(record.contentHash))
+      if (!_wasThere(record) && _takeFresh(record.contentHash))
         ++(_localContent.emplace(record.uid, record.contentHash).second ? line.moved
                                                                         : line.conflictCopies);
       else if (_localAfter.contains(record.contentHash))
@@ -190,12 +197,12 @@ RecordAccounting accountForRecords(const Observation& before, const Observation&
   const ActiveStores activeBefore(before);
   const ActiveStores activeAfter(after);
   for (const Dataclass dataclass : deviceimage::kDataclasses) {
-    DataclassAccounting accounting(dataclass, activeBefore.find(dataclass, std::nullopt),
-                                   activeAfter.find(dataclass, std::nullopt), result);
+    DataclassAccounting accounting(dataclass, activeBefore.findLocal(dataclass),
+                                   activeAfter.findLocal(dataclass), result);
     accounting.takeRetiredStores(before, after);
     for (const ObservedStore& store : before.stores) {
       if (store.dataclass != dataclass || !store.account || store.retired) continue;
-      const ObservedStore* now = activeAfter.find(dataclass, store.account);
+      const ObservedStore* now = activeAfter.find(store);
       if (DataclassReport* line = owners.lineOf(store))
         accounting.follow(store, now, *line);
       else
