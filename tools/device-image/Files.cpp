@@ -81,6 +81,7 @@ Output::~Output() {
 }
 
 void Output::write(std::string_view bytes) {
+  if (bytes.empty()) return;  // fwrite takes no null pointer
   if (std::fwrite(bytes.data(), 1, bytes.size(), _file) != bytes.size()) _fail(errno);
 }
 
