@@ -4,6 +4,7 @@
 #include <sys/stat.h>
 
 #include <cerrno>
+#include <cstdlib>
 #include <map>
 #include <span>
 #include <utility>
@@ -65,7 +66,7 @@ std::int64_t pragmaOf(sqlite3* connection, const char* pragma) {
   const int code = sqlite3_exec(
       connection, pragma,
       [](void* into, int, char** values, char**) {
-        *static_cast<std::int64_t*>(into) = std::atoll(values[0]);
+        *static_cast<std::int64_t*>(into) = std::strtoll(values[0], nullptr, 10);
         return 0;
       },
       &value, nullptr);

@@ -39,6 +39,7 @@ class BinaryWriter {
     Kind kind;
     std::uint64_t bits;
     bool isNegative;  // tells a negative integer from a large one
+    // NOLINTNEXTLINE(modernize-use-nullptr): no pointer is here
     friend auto operator<=>(const Scalar&, const Scalar&) = default;
   };
 

@@ -59,7 +59,8 @@ std::optional<Date> parseDateText(std::string_view text) {
   const int second = number(17, 2);
   const bool exists = day.ok() && number(0, 4) >= 1 && hour < 24 && minute < 60 && second < 60;
   if (!exists) return std::nullopt;
-  const std::int64_t seconds = secondsAt(day) + hour * 3600 + minute * 60 + second;
+  const std::int64_t seconds =
+      secondsAt(day) + std::int64_t{hour} * 3600 + std::int64_t{minute} * 60 + second;
   return Date{static_cast<double>(seconds)};
 }
 

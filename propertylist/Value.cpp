@@ -42,6 +42,7 @@ bool isSole(const std::shared_ptr<Storage>& storage) {
   if (storage.use_count() != 1) return false;
   // The count is read without ordering. Taking another reference orders what the last other owner
   // did on its thread before what is done here.
+  // NOLINTNEXTLINE(performance-unnecessary-copy-initialization): the copy is made for that order
   const std::shared_ptr<Storage> ordering = storage;
   return true;
 }

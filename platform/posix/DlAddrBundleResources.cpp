@@ -25,7 +25,7 @@ std::vector<std::string> languagesInOrder(const std::vector<std::string>& prefer
 
 }  // namespace
 
-DlAddrBundleResources::DlAddrBundleResources(std::vector<std::string> preferredLanguages,
+DlAddrBundleResources::DlAddrBundleResources(const std::vector<std::string>& preferredLanguages,
                                              std::optional<std::string> directory)
     : _languages(languagesInOrder(preferredLanguages)), _directory(std::move(directory)) {}
 

@@ -17,7 +17,7 @@ class PLATFORM_EXPORT DlAddrBundleResources : public BundleResources {
   // `preferredLanguages` are the user's, the first one first ("de", "pt-BR"). A language with a
   // region also accepts a table without one; English comes last. `directory` takes the place of
   // every bundle's folder, for code that is linked into a program.
-  explicit DlAddrBundleResources(std::vector<std::string> preferredLanguages,
+  explicit DlAddrBundleResources(const std::vector<std::string>& preferredLanguages,
                                  std::optional<std::string> directory = std::nullopt);
   ~DlAddrBundleResources() override;
 

@@ -19,8 +19,9 @@ class InMemoryBundleResources : public BundleResources, public FakeService {
       texts;  // by table and key; these come first
 
   // Takes what is not in `texts` from `directory`, in the first of `languages` that it has.
-  void useDirectory(const std::string& directory, std::vector<std::string> languages = {"en"}) {
-    _files = std::make_unique<DlAddrBundleResources>(std::move(languages), directory);
+  void useDirectory(const std::string& directory,
+                    const std::vector<std::string>& languages = {"en"}) {
+    _files = std::make_unique<DlAddrBundleResources>(languages, directory);
   }
 
   std::optional<std::string> pathForResource(const void* code, std::string_view name,

@@ -73,7 +73,7 @@ class ResourcesInAFolder : public BundleResourcesUnderTest {
 class ResourcesOfAProgram : public ResourcesInAFolder {
  public:
   platform::BundleResources& serviceForLanguages(std::vector<std::string> languages) override {
-    _service = std::make_unique<platform::DlAddrBundleResources>(std::move(languages), folder());
+    _service = std::make_unique<platform::DlAddrBundleResources>(languages, folder());
     return *_service;
   }
   const void* code() override { return nullptr; }
@@ -88,7 +88,7 @@ class ResourcesOfAProgram : public ResourcesInAFolder {
 class ResourcesOfALoadedBundle : public ResourcesInAFolder {
  public:
   platform::BundleResources& serviceForLanguages(std::vector<std::string> languages) override {
-    _service = std::make_unique<platform::DlAddrBundleResources>(std::move(languages));
+    _service = std::make_unique<platform::DlAddrBundleResources>(languages);
     return *_service;
   }
   const void* code() override { return _bundle.load(); }

@@ -16,7 +16,6 @@
 namespace deviceimagetool {
 namespace {
 
-using deviceimage::Dataclass;
 using deviceimage::RecordStores;
 using deviceimage::Store;
 using nlohmann::ordered_json;

@@ -143,6 +143,7 @@ class Divider {
         if (const auto found = _zones.find(name); found != _zones.end())
           byPlace.emplace(found->second->span.begin, found->second);
     std::vector<const CalendarComponent*> zones;
+    zones.reserve(byPlace.size());
     for (const auto& [place, zone] : byPlace) zones.push_back(zone);
     return zones;
   }

@@ -12,6 +12,9 @@ bool isNameLetter(char c) {
          c == '_';
 }
 
+// A line that begins with a blank goes on with the line before it.
+bool continuesALine(std::optional<char> c) { return c && (*c == ' ' || *c == '\t'); }
+
 // The offset of the first of `wanted` outside quotation marks, at or after `position`.
 std::size_t findOutsideQuotes(std::string_view text, std::string_view wanted,
                               std::size_t position) {
@@ -73,7 +76,7 @@ std::optional<ContentLine> ContentLines::next() {
     line.begin += kByteOrderMark.size();
   }
   std::string unfolded;
-  for (std::optional<char> c = _lines.peek(); c == ' ' || c == '\t'; c = _lines.peek()) {
+  while (continuesALine(_lines.peek())) {
     if (unfolded.empty()) unfolded = text;
     const std::optional<TextLine> more = _lines.next();
     unfolded += more->text.substr(1);
