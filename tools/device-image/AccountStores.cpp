@@ -6,10 +6,10 @@
 #include <utility>
 
 #include "deviceimage/SyncAgent.h"
-#include "tools/device-image/ExitCode.h"
+#include "tools/common/ExitCode.h"
 #include "tools/device-image/Settings.h"
 
-namespace deviceimagetool {
+namespace tools {
 
 using deviceimage::Dataclass;
 using deviceimage::DeviceImage;
@@ -69,4 +69,4 @@ std::string StoreNames::nameOf(const deviceimage::Store& store) const {
   return store.retired ? *store.account : _accounts->nameOf(store.dataclass, *store.account);
 }
 
-}  // namespace deviceimagetool
+}  // namespace tools

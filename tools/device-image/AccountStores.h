@@ -7,7 +7,7 @@
 #include "deviceimage/DeviceImage.h"
 #include "deviceimage/RecordStores.h"
 
-namespace deviceimagetool {
+namespace tools {
 
 // A store that the user chose: the device-local one, or an account's.
 struct ChosenStore {
@@ -34,4 +34,4 @@ class StoreNames {
   std::unique_ptr<Accounts> _accounts;
 };
 
-}  // namespace deviceimagetool
+}  // namespace tools

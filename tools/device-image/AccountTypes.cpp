@@ -7,7 +7,7 @@
 
 #include "tools/device-image/Settings.h"
 
-namespace deviceimagetool {
+namespace tools {
 namespace {
 
 struct AccountType {
@@ -78,4 +78,4 @@ std::optional<std::string> mailClassProblem(const propertylist::Dictionary& acco
       accountClass, fmt::join(kMailClasses, ", "));
 }
 
-}  // namespace deviceimagetool
+}  // namespace tools

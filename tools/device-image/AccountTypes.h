@@ -6,7 +6,7 @@
 
 #include "propertylist/Value.h"
 
-namespace deviceimagetool {
+namespace tools {
 
 // The class that accounts of the type have unless something else is said; empty for a type that the
 // device does not know, whose accounts it would drop.
@@ -19,4 +19,4 @@ std::string knownTypes();
 // neither its class nor its storage path says which mail engine serves it. Empty when all is well.
 std::optional<std::string> mailClassProblem(const propertylist::Dictionary& account);
 
-}  // namespace deviceimagetool
+}  // namespace tools

@@ -5,15 +5,16 @@
 #include <optional>
 #include <vector>
 
+#include "deviceimage/Dataclass.h"
 #include "deviceimage/DeviceImageServices.h"
+#include "tools/common/Images.h"
+#include "tools/common/TypedProperty.h"
 #include "tools/device-image/AccountTypes.h"
 #include "tools/device-image/Commands.h"
-#include "tools/device-image/Images.h"
 #include "tools/device-image/Settings.h"
-#include "tools/device-image/TypedProperty.h"
 #include "tools/device-image/import/TextLines.h"
 
-namespace deviceimagetool {
+namespace tools {
 namespace {
 
 using propertylist::Dictionary;
@@ -202,4 +203,4 @@ void addAddAccountCommand(CLI::App& app, ExitCode& outcome) {
   command->callback([options, &outcome] { outcome = run(*options); });
 }
 
-}  // namespace deviceimagetool
+}  // namespace tools

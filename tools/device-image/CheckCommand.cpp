@@ -5,12 +5,13 @@
 #include <vector>
 
 #include "deviceimage/RecordStores.h"
+#include "tools/common/Images.h"
+#include "tools/common/Program.h"
 #include "tools/device-image/AccountTypes.h"
 #include "tools/device-image/Commands.h"
-#include "tools/device-image/Images.h"
 #include "tools/device-image/Settings.h"
 
-namespace deviceimagetool {
+namespace tools {
 namespace {
 
 using deviceimage::DeviceImage;
@@ -108,4 +109,4 @@ void addCheckCommand(CLI::App& app, ExitCode& outcome) {
   command->callback([options, &outcome] { outcome = run(*options); });
 }
 
-}  // namespace deviceimagetool
+}  // namespace tools

@@ -2,9 +2,9 @@
 
 #include <CLI/CLI.hpp>
 
-#include "tools/device-image/ExitCode.h"
+#include "tools/common/ExitCode.h"
 
-namespace deviceimagetool {
+namespace tools {
 
 // Each function adds one command to `app`: its options, its help and, as the callback that the
 // parser calls when the command line names it, its work. The callback sets `outcome` or throws a
@@ -18,4 +18,4 @@ void addCheckCommand(CLI::App& app, ExitCode& outcome);
 void addRestoreCommand(CLI::App& app, ExitCode& outcome);
 void addPurgeCommand(CLI::App& app, ExitCode& outcome);
 
-}  // namespace deviceimagetool
+}  // namespace tools

@@ -4,10 +4,9 @@
 
 #include "deviceimage/SyncAgent.h"
 #include "tools/device-image/Commands.h"
-#include "tools/device-image/Images.h"
 #include "tools/device-image/import/TextLines.h"
 
-namespace deviceimagetool {
+namespace tools {
 namespace {
 
 struct Options {
@@ -48,4 +47,4 @@ void addCreateCommand(CLI::App& app, ExitCode& outcome) {
   command->callback([options, &outcome] { outcome = run(*options); });
 }
 
-}  // namespace deviceimagetool
+}  // namespace tools

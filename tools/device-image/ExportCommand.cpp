@@ -5,14 +5,15 @@
 #include <vector>
 
 #include "deviceimage/RecordStores.h"
+#include "tools/common/Files.h"
+#include "tools/common/Images.h"
 #include "tools/device-image/AccountStores.h"
 #include "tools/device-image/Commands.h"
-#include "tools/device-image/Files.h"
-#include "tools/device-image/Images.h"
+#include "tools/device-image/Records.h"
 #include "tools/device-image/RetiredStores.h"
 #include "tools/device-image/export/RecordWriter.h"
 
-namespace deviceimagetool {
+namespace tools {
 namespace {
 
 using deviceimage::Dataclass;
@@ -73,4 +74,4 @@ void addExportCommand(CLI::App& app, ExitCode& outcome) {
   command->callback([options, &outcome] { outcome = run(*options); });
 }
 
-}  // namespace deviceimagetool
+}  // namespace tools

@@ -5,17 +5,19 @@
 #include <vector>
 
 #include "deviceimage/RecordStores.h"
+#include "tools/common/Files.h"
+#include "tools/common/Images.h"
+#include "tools/common/Program.h"
 #include "tools/device-image/AccountStores.h"
 #include "tools/device-image/Commands.h"
-#include "tools/device-image/Files.h"
-#include "tools/device-image/Images.h"
+#include "tools/device-image/Records.h"
 #include "tools/device-image/import/BookmarksReader.h"
 #include "tools/device-image/import/CalendarReader.h"
 #include "tools/device-image/import/CardReader.h"
 #include "tools/device-image/import/NotesReader.h"
 #include "tools/device-image/import/TextLines.h"
 
-namespace deviceimagetool {
+namespace tools {
 namespace {
 
 using deviceimage::Dataclass;
@@ -145,4 +147,4 @@ void addImportCommand(CLI::App& app, ExitCode& outcome) {
   command->callback([options, &outcome] { outcome = run(*options); });
 }
 
-}  // namespace deviceimagetool
+}  // namespace tools

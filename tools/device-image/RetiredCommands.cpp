@@ -5,12 +5,13 @@
 #include <optional>
 
 #include "deviceimage/RecordStores.h"
+#include "tools/common/Images.h"
 #include "tools/device-image/AccountStores.h"
 #include "tools/device-image/Commands.h"
-#include "tools/device-image/Images.h"
+#include "tools/device-image/Records.h"
 #include "tools/device-image/RetiredStores.h"
 
-namespace deviceimagetool {
+namespace tools {
 namespace {
 
 using deviceimage::Dataclass;
@@ -94,4 +95,4 @@ void addPurgeCommand(CLI::App& app, ExitCode& outcome) {
   command->callback([options, &outcome] { outcome = runPurge(*options); });
 }
 
-}  // namespace deviceimagetool
+}  // namespace tools

@@ -4,10 +4,10 @@
 
 #include <algorithm>
 
-#include "tools/device-image/ExitCode.h"
-#include "tools/device-image/Images.h"
+#include "tools/common/ExitCode.h"
+#include "tools/device-image/Records.h"
 
-namespace deviceimagetool {
+namespace tools {
 
 using deviceimage::Store;
 
@@ -31,4 +31,4 @@ std::vector<Store> retiredStores(deviceimage::RecordStores& records,
   return std::move(listed.stores);
 }
 
-}  // namespace deviceimagetool
+}  // namespace tools

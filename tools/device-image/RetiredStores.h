@@ -5,7 +5,7 @@
 
 #include "deviceimage/RecordStores.h"
 
-namespace deviceimagetool {
+namespace tools {
 
 // The retired stores of the dataclass, the oldest first, or the one with that number. Ends the
 // command when there is no store of that number.
@@ -13,4 +13,4 @@ std::vector<deviceimage::Store> retiredStores(deviceimage::RecordStores& records
                                               deviceimage::Dataclass dataclass,
                                               std::optional<deviceimage::Row> number);
 
-}  // namespace deviceimagetool
+}  // namespace tools

@@ -4,10 +4,9 @@
 
 #include <algorithm>
 
-#include "tools/device-image/ExitCode.h"
-#include "tools/device-image/Images.h"
+#include "tools/common/ExitCode.h"
 
-namespace deviceimagetool {
+namespace tools {
 
 using deviceimage::DeviceImage;
 using propertylist::Dictionary;
@@ -80,4 +79,4 @@ void Settings::addAccount(const DeviceImage& image, const Dictionary& account) {
                     written.error ? written.error->description : "unknown reason"));
 }
 
-}  // namespace deviceimagetool
+}  // namespace tools

@@ -9,7 +9,7 @@
 #include "deviceimage/DeviceImage.h"
 #include "propertylist/Value.h"
 
-namespace deviceimagetool {
+namespace tools {
 
 // The keys of the settings file and of its accounts that the tool reads or writes.
 inline constexpr std::string_view kAccountsKey = "Accounts";
@@ -50,4 +50,4 @@ std::vector<propertylist::Dictionary> dictionariesIn(const propertylist::Diction
 // The string under `key`, or an empty one.
 std::string stringOrEmpty(const propertylist::Dictionary& dictionary, std::string_view key);
 
-}  // namespace deviceimagetool
+}  // namespace tools

@@ -7,13 +7,14 @@
 
 #include "deviceimage/RecordStores.h"
 #include "deviceimage/SyncAgent.h"
+#include "tools/common/Images.h"
+#include "tools/common/Table.h"
 #include "tools/device-image/AccountStores.h"
 #include "tools/device-image/Commands.h"
-#include "tools/device-image/Images.h"
+#include "tools/device-image/Records.h"
 #include "tools/device-image/Settings.h"
-#include "tools/device-image/Table.h"
 
-namespace deviceimagetool {
+namespace tools {
 namespace {
 
 using deviceimage::RecordStores;
@@ -135,4 +136,4 @@ void addShowCommand(CLI::App& app, ExitCode& outcome) {
   command->callback([options, &outcome] { outcome = run(*options); });
 }
 
-}  // namespace deviceimagetool
+}  // namespace tools

@@ -6,7 +6,7 @@
 
 #include "tools/device-image/import/TextRecord.h"
 
-namespace deviceimagetool {
+namespace tools {
 
 inline std::ostream& operator<<(std::ostream& stream, const Problem& problem) {
   return stream << "line " << problem.line << ": " << problem.what << "; " << problem.remedy;
@@ -15,4 +15,4 @@ inline std::ostream& operator<<(std::ostream& stream, const Problem& problem) {
 // A problem on that line whose description is `what`.
 MATCHER_P2(ProblemAt, line, what, "") { return arg.line == std::size_t(line) && arg.what == what; }
 
-}  // namespace deviceimagetool
+}  // namespace tools

@@ -6,7 +6,7 @@
 
 #include "tests/tools/device-image/ReaderMatchers.h"
 
-namespace deviceimagetool {
+namespace tools {
 namespace {
 
 using testing::ElementsAre;
@@ -131,4 +131,4 @@ TEST(Bookmarks, AFileWithoutAnyIsAProblem) {
 }
 
 }  // namespace
-}  // namespace deviceimagetool
+}  // namespace tools

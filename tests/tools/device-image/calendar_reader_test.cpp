@@ -7,7 +7,7 @@
 #include "deviceimage/ContentHash.h"
 #include "tests/tools/device-image/ReaderMatchers.h"
 
-namespace deviceimagetool {
+namespace tools {
 namespace {
 
 using deviceimage::Dataclass;
@@ -196,4 +196,4 @@ TEST(Calendars, AFileWithoutCalendarIsAProblem) {
 }
 
 }  // namespace
-}  // namespace deviceimagetool
+}  // namespace tools

@@ -7,7 +7,7 @@
 
 #include "tests/tools/device-image/ReaderMatchers.h"
 
-namespace deviceimagetool {
+namespace tools {
 namespace {
 
 using testing::ElementsAre;
@@ -113,4 +113,4 @@ TEST(Cards, AFileWithoutCardsIsAProblem) {
 }
 
 }  // namespace
-}  // namespace deviceimagetool
+}  // namespace tools

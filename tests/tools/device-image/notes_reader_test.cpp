@@ -7,7 +7,7 @@
 #include "deviceimage/ContentHash.h"
 #include "tests/tools/device-image/ReaderMatchers.h"
 
-namespace deviceimagetool {
+namespace tools {
 namespace {
 
 using testing::ElementsAre;
@@ -84,4 +84,4 @@ TEST(Notes, WhatIsNoTextIsAProblem) {
 }
 
 }  // namespace
-}  // namespace deviceimagetool
+}  // namespace tools

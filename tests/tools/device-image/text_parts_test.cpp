@@ -4,12 +4,12 @@
 #include <optional>
 #include <string>
 
+#include "tools/common/Timestamps.h"
 #include "tools/device-image/import/ContentLines.h"
 #include "tools/device-image/import/HtmlTags.h"
 #include "tools/device-image/import/TextLines.h"
-#include "tools/device-image/import/Timestamps.h"
 
-namespace deviceimagetool {
+namespace tools {
 namespace {
 
 TEST(TextLines, KnowWhereEachLineBeginsAndEnds) {
@@ -142,4 +142,4 @@ TEST(HtmlTags, ABrokenTagEndsWhereTheNextBeginsOrItsLineEnds) {
 }
 
 }  // namespace
-}  // namespace deviceimagetool
+}  // namespace tools

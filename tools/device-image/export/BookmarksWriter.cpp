@@ -6,10 +6,10 @@
 #include <string>
 #include <vector>
 
-#include "tools/device-image/Images.h"
+#include "tools/device-image/Records.h"
 #include "tools/device-image/import/HtmlTags.h"
 
-namespace deviceimagetool {
+namespace tools {
 namespace {
 
 using deviceimage::Collection;
@@ -129,4 +129,4 @@ void writeBookmarks(RecordStores& records, const std::vector<Store>& stores, Out
   output.write(kEnd);
 }
 
-}  // namespace deviceimagetool
+}  // namespace tools

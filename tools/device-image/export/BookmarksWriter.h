@@ -1,13 +1,13 @@
 #pragma once
 
 #include "deviceimage/RecordStores.h"
-#include "tools/device-image/Files.h"
+#include "tools/common/Files.h"
 
-namespace deviceimagetool {
+namespace tools {
 
 // Writes the bookmarks of stores as the HTML that browsers import: one list for each folder, each
 // bookmark as it lies in its store.
 void writeBookmarks(deviceimage::RecordStores& records,
                     const std::vector<deviceimage::Store>& stores, Output& output);
 
-}  // namespace deviceimagetool
+}  // namespace tools

@@ -5,10 +5,10 @@
 #include <string>
 
 #include "deviceimage/ContentHash.h"
-#include "tools/device-image/Images.h"
+#include "tools/device-image/Records.h"
 #include "tools/device-image/export/BookmarksWriter.h"
 
-namespace deviceimagetool {
+namespace tools {
 namespace {
 
 using deviceimage::Dataclass;
@@ -70,4 +70,4 @@ void writeRecords(RecordStores& records, Dataclass dataclass, const std::vector<
     writeTexts(records, dataclass, stores, output);
 }
 
-}  // namespace deviceimagetool
+}  // namespace tools

@@ -3,9 +3,9 @@
 #include <vector>
 
 #include "deviceimage/RecordStores.h"
-#include "tools/device-image/Files.h"
+#include "tools/common/Files.h"
 
-namespace deviceimagetool {
+namespace tools {
 
 // Writes the records of stores of one dataclass, which import reads back to the same records, each
 // of them byte for byte as it lies in its store:
@@ -17,4 +17,4 @@ namespace deviceimagetool {
 void writeRecords(deviceimage::RecordStores& records, deviceimage::Dataclass dataclass,
                   const std::vector<deviceimage::Store>& stores, Output& output);
 
-}  // namespace deviceimagetool
+}  // namespace tools

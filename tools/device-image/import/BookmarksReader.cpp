@@ -9,7 +9,7 @@
 #include "tools/device-image/import/HtmlTags.h"
 #include "tools/device-image/import/TextLines.h"
 
-namespace deviceimagetool {
+namespace tools {
 namespace {
 
 constexpr std::size_t kMaximumFolderName = 1000;  // bytes
@@ -198,4 +198,4 @@ class Reader {
 
 ReadText readBookmarks(std::string_view bytes) { return Reader(bytes).read(); }
 
-}  // namespace deviceimagetool
+}  // namespace tools

@@ -4,7 +4,7 @@
 
 #include "tools/device-image/import/TextRecord.h"
 
-namespace deviceimagetool {
+namespace tools {
 
 // The bookmarks of an HTML file in the form in which browsers export them: nested <DL> lists of
 // <DT><A HREF="...">title</A> and of folders, each an <H3>name</H3> with the list that follows.
@@ -14,4 +14,4 @@ namespace deviceimagetool {
 // The folders' names are kept; their other attributes are not, nor are folders without bookmarks.
 ReadText readBookmarks(std::string_view bytes);
 
-}  // namespace deviceimagetool
+}  // namespace tools

@@ -2,10 +2,10 @@
 
 #include <utility>
 
+#include "tools/common/Timestamps.h"
 #include "tools/device-image/import/ContentLines.h"
-#include "tools/device-image/import/Timestamps.h"
 
-namespace deviceimagetool {
+namespace tools {
 namespace {
 
 constexpr std::size_t kMaximumNesting = 8;
@@ -184,4 +184,4 @@ CalendarFile cutCalendars(std::string_view bytes) {
   return cutter.finish();
 }
 
-}  // namespace deviceimagetool
+}  // namespace tools

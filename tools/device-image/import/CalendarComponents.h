@@ -10,7 +10,7 @@
 
 #include "tools/device-image/import/TextRecord.h"
 
-namespace deviceimagetool {
+namespace tools {
 
 // Where something stands in a text.
 struct Span {
@@ -54,4 +54,4 @@ struct CalendarFile {
 };
 CalendarFile cutCalendars(std::string_view bytes);
 
-}  // namespace deviceimagetool
+}  // namespace tools

@@ -8,7 +8,7 @@
 #include "deviceimage/ContentHash.h"
 #include "tools/device-image/import/CalendarComponents.h"
 
-namespace deviceimagetool {
+namespace tools {
 namespace {
 
 using deviceimage::Dataclass;
@@ -202,4 +202,4 @@ ReadText readCalendars(std::string_view bytes) {
   return result;
 }
 
-}  // namespace deviceimagetool
+}  // namespace tools

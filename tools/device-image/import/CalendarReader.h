@@ -4,7 +4,7 @@
 
 #include "tools/device-image/import/TextRecord.h"
 
-namespace deviceimagetool {
+namespace tools {
 
 // The events and to-dos of an iCalendar 2.0 file: each record's dataclass is calendars or
 // reminders.
@@ -22,4 +22,4 @@ namespace deviceimagetool {
 // is left out whole, since an event without its exceptions would say something else.
 ReadText readCalendars(std::string_view bytes);
 
-}  // namespace deviceimagetool
+}  // namespace tools

@@ -4,10 +4,10 @@
 #include <utility>
 
 #include "deviceimage/ContentHash.h"
+#include "tools/common/Timestamps.h"
 #include "tools/device-image/import/ContentLines.h"
-#include "tools/device-image/import/Timestamps.h"
 
-namespace deviceimagetool {
+namespace tools {
 namespace {
 
 // One card on its way through the reader. The first thing wrong with it is kept.
@@ -108,4 +108,4 @@ ReadText readCards(std::string_view bytes) {
   return result;
 }
 
-}  // namespace deviceimagetool
+}  // namespace tools

@@ -2,7 +2,7 @@
 
 #include <algorithm>
 
-namespace deviceimagetool {
+namespace tools {
 namespace {
 
 constexpr std::size_t kNone = std::string_view::npos;
@@ -84,9 +84,9 @@ std::optional<ContentLine> ContentLines::next() {
     text = unfolded;
   }
   line.isBlank = trimmed(text).empty();
-  line.isText = deviceimagetool::isText(text);
+  line.isText = tools::isText(text);
   splitProperty(text, line);
   return line;
 }
 
-}  // namespace deviceimagetool
+}  // namespace tools

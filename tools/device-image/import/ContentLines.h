@@ -7,7 +7,7 @@
 
 #include "tools/device-image/import/TextLines.h"
 
-namespace deviceimagetool {
+namespace tools {
 
 // One property line of a vCard or iCalendar text, its folds undone: "group.NAME;parameters:value".
 struct ContentLine {
@@ -37,4 +37,4 @@ class ContentLines {
   TextLines _lines;
 };
 
-}  // namespace deviceimagetool
+}  // namespace tools

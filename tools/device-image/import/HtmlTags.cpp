@@ -4,7 +4,7 @@
 
 #include "tools/device-image/import/TextLines.h"
 
-namespace deviceimagetool {
+namespace tools {
 namespace {
 
 constexpr std::size_t kNone = std::string_view::npos;
@@ -190,4 +190,4 @@ std::string escapedForHtml(std::string_view text) {
   return result;
 }
 
-}  // namespace deviceimagetool
+}  // namespace tools

@@ -6,7 +6,7 @@
 #include <string>
 #include <string_view>
 
-namespace deviceimagetool {
+namespace tools {
 
 // One tag of an HTML text. `begin` and `end` are its offsets, the angle brackets included.
 struct HtmlTag {
@@ -41,4 +41,4 @@ std::string resolvedEntities(std::string_view text);
 // The text as HTML: "&", "<", ">" and quotation marks are written as references.
 std::string escapedForHtml(std::string_view text);
 
-}  // namespace deviceimagetool
+}  // namespace tools

@@ -6,10 +6,10 @@
 #include <utility>
 
 #include "deviceimage/ContentHash.h"
+#include "tools/common/Timestamps.h"
 #include "tools/device-image/import/ContentLines.h"
-#include "tools/device-image/import/Timestamps.h"
 
-namespace deviceimagetool {
+namespace tools {
 namespace {
 
 constexpr std::size_t kMaximumHeaderSize = std::size_t{64} << 10U;
@@ -122,4 +122,4 @@ ReadText readNotes(std::string_view bytes) {
   return result;
 }
 
-}  // namespace deviceimagetool
+}  // namespace tools

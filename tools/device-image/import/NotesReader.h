@@ -4,7 +4,7 @@
 
 #include "tools/device-image/import/TextRecord.h"
 
-namespace deviceimagetool {
+namespace tools {
 
 // The notes of a text file in UTF-8. A file is one note, kept byte for byte: header lines
 // ("Subject: ...", "Date: ...", "UID: ..."), an empty line and the text, or the text alone. The UID
@@ -14,4 +14,4 @@ namespace deviceimagetool {
 // writeNotes makes it.
 ReadText readNotes(std::string_view bytes);
 
-}  // namespace deviceimagetool
+}  // namespace tools

@@ -2,10 +2,11 @@
 
 #include <cstddef>
 #include <optional>
-#include <string>
 #include <string_view>
 
-namespace deviceimagetool {
+#include "tools/common/Text.h"
+
+namespace tools {
 
 // One line of a text. `text` leaves out the line end (LF or CR LF); `begin` and `end` are the
 // offsets of the whole line, its line end included.
@@ -34,15 +35,4 @@ class TextLines {
 // The byte order mark that some programs put before UTF-8.
 inline constexpr std::string_view kByteOrderMark = "\xEF\xBB\xBF";
 
-// Whether the bytes are UTF-8: no overlong form, no surrogate, nothing above U+10FFFF, and no NUL,
-// which no text holds.
-bool isText(std::string_view bytes);
-
-// Without blanks, tabs and line ends on both sides.
-std::string_view trimmed(std::string_view text);
-
-// ASCII letters only; other bytes stay.
-std::string upperCased(std::string_view text);
-bool equalsIgnoringCase(std::string_view a, std::string_view b);
-
-}  // namespace deviceimagetool
+}  // namespace tools

@@ -9,7 +9,7 @@
 
 #include "deviceimage/Dataclass.h"
 
-namespace deviceimagetool {
+namespace tools {
 
 // What the readers of text refuse, so that no input costs more than its size allows.
 inline constexpr std::size_t kMaximumFileSize = std::size_t{256} << 20U;   // bytes
@@ -45,4 +45,4 @@ struct ReadText {
   std::vector<Problem> problems;
 };
 
-}  // namespace deviceimagetool
+}  // namespace tools

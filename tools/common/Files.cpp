@@ -1,4 +1,4 @@
-#include "tools/device-image/Files.h"
+#include "tools/common/Files.h"
 
 #include <fcntl.h>
 #include <fmt/format.h>
@@ -9,9 +9,9 @@
 #include <system_error>
 #include <utility>
 
-#include "tools/device-image/ExitCode.h"
+#include "tools/common/ExitCode.h"
 
-namespace deviceimagetool {
+namespace tools {
 namespace {
 
 std::string reason(int errorNumber) { return std::generic_category().message(errorNumber); }
@@ -113,4 +113,4 @@ void Progress::wipe() {
   if (_isTerminal) std::fputs("\r\x1B[K", stderr);
 }
 
-}  // namespace deviceimagetool
+}  // namespace tools

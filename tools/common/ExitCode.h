@@ -3,7 +3,7 @@
 #include <stdexcept>
 #include <string>
 
-namespace deviceimagetool {
+namespace tools {
 
 // How a run ended, as the man page promises it. The numbers never change.
 enum class ExitCode {
@@ -26,4 +26,4 @@ class CommandFailure : public std::runtime_error {
   ExitCode _code;
 };
 
-}  // namespace deviceimagetool
+}  // namespace tools

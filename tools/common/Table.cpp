@@ -1,9 +1,9 @@
-#include "tools/device-image/Table.h"
+#include "tools/common/Table.h"
 
 #include <algorithm>
 #include <utility>
 
-namespace deviceimagetool {
+namespace tools {
 namespace {
 
 // The characters of UTF-8 text, each counted as one column.
@@ -40,4 +40,4 @@ std::string Table::text() const {
   return text;
 }
 
-}  // namespace deviceimagetool
+}  // namespace tools

@@ -1,4 +1,4 @@
-#include "tools/device-image/TypedProperty.h"
+#include "tools/common/TypedProperty.h"
 
 #include <fmt/format.h>
 
@@ -6,11 +6,11 @@
 #include <cmath>
 #include <optional>
 
-#include "tools/device-image/ExitCode.h"
-#include "tools/device-image/import/TextLines.h"
-#include "tools/device-image/import/Timestamps.h"
+#include "tools/common/ExitCode.h"
+#include "tools/common/Text.h"
+#include "tools/common/Timestamps.h"
 
-namespace deviceimagetool {
+namespace tools {
 
 using propertylist::Value;
 
@@ -89,4 +89,4 @@ std::pair<std::string, Value> typedProperty(const std::string& text) {
   return {std::move(key), *std::move(value)};
 }
 
-}  // namespace deviceimagetool
+}  // namespace tools

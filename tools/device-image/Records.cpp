@@ -1,17 +1,15 @@
-#include "tools/device-image/Images.h"
+#include "tools/device-image/Records.h"
 
 #include <fmt/format.h>
 #include <sqlite3.h>
 
-#include <cstdio>
-#include <utility>
+#include <optional>
 
-#include "tools/device-image/ExitCode.h"
+#include "tools/common/ExitCode.h"
 
-namespace deviceimagetool {
+namespace tools {
 
 using deviceimage::Dataclass;
-using deviceimage::ImageLock;
 
 namespace {
 
@@ -35,23 +33,6 @@ ExitCode exitCodeOf(int databaseCode) {
 
 }  // namespace
 
-ImagePtr openImage(const std::string& path) {
-  deviceimage::OpenedImage opened = deviceimage::DeviceImage::open(path);
-  if (!opened.image) throw CommandFailure(ExitCode::refused, opened.error);
-  return std::move(opened.image);
-}
-
-LockedImage lockImage(ImagePtr image) {
-  ImageLock::Attempt attempt = ImageLock::tryAcquire(*image);
-  if (attempt.outcome == ImageLock::Outcome::heldByAnother)
-    throw CommandFailure(ExitCode::heldByAnotherRun, attempt.error);
-  if (attempt.outcome != ImageLock::Outcome::held)
-    throw CommandFailure(ExitCode::refused, attempt.error);
-  return {std::move(image), std::move(attempt.lock)};
-}
-
-LockedImage openImageForWriting(const std::string& path) { return lockImage(openImage(path)); }
-
 Dataclass recordDataclassNamed(const std::string& name) {
   const std::optional<Dataclass> dataclass = deviceimage::dataclassNamed(name);
   if (!dataclass || *dataclass == Dataclass::mail)
@@ -70,17 +51,4 @@ void requireSuccess(const platform::Status& status, std::string_view whatFailed)
                                                 : fmt::format("status {}", status.code)));
 }
 
-void printMessage(std::string_view text) {
-  std::string line = "device-image: ";
-  for (const char c : text) {
-    const auto byte = static_cast<unsigned char>(c);
-    if (byte < 0x20 || byte == 0x7F)
-      line += fmt::format("\\x{:02x}", byte);
-    else
-      line += c;
-  }
-  line += '\n';
-  std::fwrite(line.data(), 1, line.size(), stderr);
-}
-
-}  // namespace deviceimagetool
+}  // namespace tools

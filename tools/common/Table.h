@@ -3,7 +3,7 @@
 #include <string>
 #include <vector>
 
-namespace deviceimagetool {
+namespace tools {
 
 // Rows of texts, printed in aligned columns two blanks apart.
 class Table {
@@ -17,4 +17,4 @@ class Table {
   std::vector<std::vector<std::string>> _rows;
 };
 
-}  // namespace deviceimagetool
+}  // namespace tools

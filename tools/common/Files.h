@@ -5,10 +5,7 @@
 #include <string>
 #include <string_view>
 
-namespace deviceimagetool {
-
-// The folder that holds the bookmarks which lie in no folder.
-inline constexpr std::string_view kTopBookmarksFolder = "Bookmarks";
+namespace tools {
 
 // The content of a regular file. A file that cannot be read, or is larger than `limit`, ends the
 // command before anything is written.
@@ -51,4 +48,4 @@ class Progress {
   bool _isTerminal;
 };
 
-}  // namespace deviceimagetool
+}  // namespace tools

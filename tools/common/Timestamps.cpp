@@ -1,11 +1,11 @@
-#include "tools/device-image/import/Timestamps.h"
+#include "tools/common/Timestamps.h"
 
 #include <array>
 #include <chrono>
 
 #include "tools/device-image/import/TextLines.h"
 
-namespace deviceimagetool {
+namespace tools {
 namespace {
 
 // Takes the parts of a date from the front of a text.
@@ -138,4 +138,4 @@ std::optional<std::int64_t> secondsOfMessageDate(std::string_view text) {
   return takeTimeAndZone(taker, *seconds);  // a comment may follow the zone
 }
 
-}  // namespace deviceimagetool
+}  // namespace tools

@@ -1,0 +1,19 @@
+#pragma once
+
+#include <CLI/CLI.hpp>
+#include <string_view>
+
+#include "tools/common/ExitCode.h"
+
+namespace tools {
+
+// What every tool does around its commands: parses the command line into `app`, whose callbacks do
+// the work and set `outcome`, and makes one message and an exit code of every failure. Returns the
+// program's exit code.
+int runProgram(CLI::App& app, const ExitCode& outcome, int argumentCount, char** arguments);
+
+// One line on standard error: the program's name and the text, whose control characters are
+// escaped.
+void printMessage(std::string_view text);
+
+}  // namespace tools

@@ -1,0 +1,19 @@
+#pragma once
+
+#include <string>
+#include <string_view>
+
+namespace tools {
+
+// Whether the bytes are UTF-8: no overlong form, no surrogate, nothing above U+10FFFF, and no NUL,
+// which no text holds.
+bool isText(std::string_view bytes);
+
+// Without blanks, tabs and line ends on both sides.
+std::string_view trimmed(std::string_view text);
+
+// ASCII letters only; other bytes stay.
+std::string upperCased(std::string_view text);
+bool equalsIgnoringCase(std::string_view a, std::string_view b);
+
+}  // namespace tools

@@ -1,0 +1,21 @@
+#pragma once
+
+#include <string>
+#include <string_view>
+
+#include "deviceimage/Dataclass.h"
+#include "platform/Status.h"
+
+namespace tools {
+
+// The folder that holds the bookmarks which lie in no folder.
+inline constexpr std::string_view kTopBookmarksFolder = "Bookmarks";
+
+// The dataclass of that name: one that records are imported to and exported from.
+deviceimage::Dataclass recordDataclassNamed(const std::string& name);
+
+// Passes on a success; a failure of the image's databases ends the command. A change that failed
+// has changed nothing.
+void requireSuccess(const platform::Status& status, std::string_view whatFailed);
+
+}  // namespace tools
