@@ -24,7 +24,7 @@ class DeviceImageServices::Implementation {
   Implementation(const std::shared_ptr<const DeviceImage>& image, ServiceOptions options)
       : _databases(image, DatabaseAccess::readWrite),
         _accountFramework(image),
-        _bundleResources(std::move(options.preferredLanguages)),
+        _bundleResources(options.preferredLanguages, std::move(options.resourceDirectory)),
         _calendarStore(_databases),
         _contactsStore(_databases),
         _deviceInfo(image),

@@ -2,6 +2,7 @@
 
 #include <functional>
 #include <memory>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -19,6 +20,9 @@ struct ServiceOptions {
   std::function<void(std::string_view line)> logSink;
   // The user's languages, the preferred one first ("de", "en").
   std::vector<std::string> preferredLanguages = {"en"};
+  // Where the resources of the account settings library lie; empty for the folder of the object
+  // file that asks. A program that is no bundle has none beside it and names the plug-in's folder.
+  std::optional<std::string> resourceDirectory;
 };
 
 // Every platform service over one device image. What a service cannot read in the image counts as

@@ -5,12 +5,11 @@
 #include <cstdio>
 #include <cstdlib>
 #include <exception>
-#include <filesystem>
 #include <string>
-#include <system_error>
 
 #include "host/MigrationHost.h"
 #include "host/MigratorChild.h"
+#include "tools/common/Installation.h"
 #include "tools/migration-host/CommandLine.h"
 #include "tools/migration-host/JsonReport.h"
 #include "tools/migration-host/Terminal.h"
@@ -19,14 +18,6 @@
 namespace {
 
 using namespace migration_host;
-
-// Where the installed migrator lies, seen from this program: the same in the build tree and
-// installed.
-std::string installedMigrators() {
-  std::error_code error;
-  const std::filesystem::path program = std::filesystem::read_symlink("/proc/self/exe", error);
-  return (program.parent_path() / MIGRATORS_FROM_PROGRAM).lexically_normal().string();
-}
 
 bool print(const std::string& text) {
   return std::fwrite(text.data(), 1, text.size(), stdout) == text.size() &&
@@ -48,7 +39,7 @@ int run(const CommandLine& command) {
   {
     host::Interruption interruption;
     report = host::MigrationHost(terminal, interruption)
-                 .run({command.image, command.bundle, installedMigrators(), command.limit});
+                 .run({command.image, command.bundle, tools::installedMigrators(), command.limit});
   }
   terminal.stageEnded();
   const std::string logProblem = terminal.closeLogFile();
