@@ -55,6 +55,7 @@ struct ImageSyncDataSource::Source : platform::DataSource {
   std::optional<std::string> account;  // empty: the device-local store
   std::vector<Dataclass> dataclasses;  // what the source holds
   bool isClosed = false;
+  bool wasOrigin = false;  // since the last commit, its records were to go somewhere else
   // What waits for the commit: first the clearing, then the copying.
   bool clears = false;
   std::vector<Row> copies;
@@ -157,6 +158,7 @@ Status ImageSyncDataSource::migrateRecords(const platform::DataSourcePtr& from,
   if (origin == nullptr || target == nullptr) return noOpenSource();
   if (origin->type != target->type)
     return Status::failure(SQLITE_MISUSE, "the two data sources hold different kinds of data");
+  origin->wasOrigin = true;
   return statusOf([&] {
     Database* const database = _databases.find(origin->type);
     if (database == nullptr) return Status::success();
@@ -175,6 +177,7 @@ Status ImageSyncDataSource::commit(const platform::DataSourcePtr& handle) {
   return _withOpen(handle, [&](Source& source) {
     _apply(source);
     source.clears = false;
+    source.wasOrigin = false;
     source.copies.clear();
   });
 }
@@ -207,6 +210,8 @@ void ImageSyncDataSource::_apply(Source& source) {
 // The account whose store the device-local one takes over with this commit; empty when none.
 std::optional<std::string> ImageSyncDataSource::_storeToTakeOver(const Source& source) {
   if (source.account || !isSingleStoreType(source.type)) return std::nullopt;
+  // Who empties the store, or gives its records to somebody, does not want others in it.
+  if (source.clears || source.wasOrigin) return std::nullopt;
   if (_isTetheredSyncingDisabled(source.type)) return std::nullopt;
   return SyncAgent(_databases.image()).quillnetStoreIdentifier();
 }

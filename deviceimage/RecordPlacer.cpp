@@ -1,5 +1,7 @@
 #include "deviceimage/RecordPlacer.h"
 
+#include <sqlite3.h>
+
 #include <utility>
 
 #include "deviceimage/ContentHash.h"
@@ -46,8 +48,7 @@ RecordPlacer::RecordPlacer(Database& database, Row targetStore)
 
 void RecordPlacer::copyRecords(std::span<const Row> records) {
   for (const Row record : records) {
-    Candidate candidate;
-    if (!_readCandidate(record, candidate)) continue;
+    Candidate candidate = _readCandidate(record);
     _place(candidate, [&] { return _collections.targetOf(candidate.sourceCollection); });
   }
 }
@@ -64,8 +65,11 @@ void RecordPlacer::addRecord(Dataclass dataclass, const NewRecord& record) {
          [&] { return makeCollection(_database, _store, dataclass, record.collectionPath); });
 }
 
-bool RecordPlacer::_readCandidate(Row record, Candidate& candidate) {
-  if (!_readRecord.bind(record).step()) return false;
+RecordPlacer::Candidate RecordPlacer::_readCandidate(Row record) {
+  // What somebody has destroyed meanwhile must not look as if it had been copied.
+  if (!_readRecord.bind(record).step())
+    throw DatabaseFailure(SQLITE_NOTFOUND, "a record that was to be copied is gone");
+  Candidate candidate;
   candidate.kind = _readRecord.text(0);
   candidate.uid = _readRecord.text(1);
   candidate.baseUID = _readRecord.text(2);
@@ -74,7 +78,7 @@ bool RecordPlacer::_readCandidate(Row record, Candidate& candidate) {
   candidate.sourceCollection = _readRecord.integer(5);
   candidate.sourceAccount = _readRecord.text(6);
   candidate.sourceRecord = record;
-  return true;
+  return candidate;
 }
 
 bool RecordPlacer::_isThere(const Candidate& candidate) {

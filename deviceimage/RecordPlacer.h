@@ -39,7 +39,7 @@ class RecordPlacer {
     Row sourceCollection = 0;  // of sourceRecord
     Row collection = 0;        // where it goes; known once it is inserted
   };
-  bool _readCandidate(Row record, Candidate& candidate);
+  Candidate _readCandidate(Row record);
   bool _isThere(const Candidate& candidate);
   template <typename FindCollection>
   void _place(Candidate& candidate, const FindCollection& findCollection);

@@ -43,9 +43,11 @@ std::optional<std::string> SyncAgent::storeIdentifier(const propertylist::Dictio
       if (std::optional<std::string> child = calendarChild(account)) return child;
     return quillnetStoreIdentifier();
   }
-  if (std::optional<std::string> identifier = stringIn(account, "Sync Identifier"))
-    return identifier;
-  return stringIn(account, "Identifier");
+  for (const std::string_view key : {"Sync Identifier", "Identifier"}) {
+    std::optional<std::string> identifier = stringIn(account, key);
+    if (identifier && !identifier->empty()) return identifier;
+  }
+  return std::nullopt;
 }
 
 bool SyncAgent::isQuillnetType(std::string_view accountType) {

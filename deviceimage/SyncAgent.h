@@ -17,7 +17,7 @@ namespace deviceimage {
 // preferences; its stores are "Quillnet:" and that name, whichever Quillnet account asks. Its
 // calendars (events, not reminders) lie under the identifier of the account's child with the class
 // "MobileCalDAVAccount", when it has one. Every other account's stores go by its "Sync Identifier",
-// else by its "Identifier".
+// else by its "Identifier"; an empty text counts as none.
 class SyncAgent {
  public:
   static constexpr std::string_view kApplication = "com.vantor.OTASyncAgent";

@@ -46,6 +46,16 @@ TEST(SyncAgent, NamesOtherStoresByTheAccountsSyncIdentifierElseItsIdentifier) {
   EXPECT_EQ(agent.storeIdentifier({{"Type", "CardDAV"}}, Dataclass::contacts), std::nullopt);
 }
 
+TEST(SyncAgent, PassesOverEmptyIdentifiers) {
+  const SyncAgent agent(std::nullopt);
+  EXPECT_EQ(
+      agent.storeIdentifier({{"Type", "CardDAV"}, {"Identifier", "i"}, {"Sync Identifier", ""}},
+                            Dataclass::contacts),
+      "i");
+  EXPECT_EQ(agent.storeIdentifier({{"Type", "CardDAV"}, {"Identifier", ""}}, Dataclass::contacts),
+            std::nullopt);
+}
+
 TEST(SyncAgent, ReadsItsAccountNameFromItsPreferencesWhenThatIsAString) {
   const TemporaryImage image;
   EXPECT_EQ(SyncAgent(*image.image).accountName(), std::nullopt);

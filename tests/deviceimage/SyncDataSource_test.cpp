@@ -146,6 +146,21 @@ TEST_F(ImageSources, PutACopyIntoTheFoldersOfTheSameNames) {
               ElementsAre(std::pair(Lines{"Work"}, 2), std::pair(Lines{"Work", "Projects"}, 1)));
 }
 
+TEST_F(ImageSources, FailToCommitWhenARecordThatWasToBeCopiedIsGone) {
+  add(Dataclass::contacts, kAccount, {record("a", "Ada"), record("b", "Bo")});
+  const DataSourcePtr local = open("Contacts");
+  EXPECT_EQ(sources().migrateRecords(open("Contacts", kAccount), local).code, 0);
+  RecordStores stores = image.stores();
+  const Row service = stores.findStore(Dataclass::contacts, kAccount).store->row;
+  ASSERT_TRUE(stores.retireStore(Dataclass::contacts, service).isSuccess());
+  ASSERT_TRUE(stores.purgeRetiredStore(Dataclass::contacts, service).status.isSuccess());
+  const platform::Status committed = sources().commit(local);
+  EXPECT_NE(committed.code, 0);
+  ASSERT_TRUE(committed.error);
+  EXPECT_EQ(committed.error->description, "a record that was to be copied is gone");
+  EXPECT_THAT(linesOf(image, Dataclass::contacts), IsEmpty());
+}
+
 TEST_F(ImageSources, ChangeNothingBeforeTheCommitNorWithoutOne) {
   add(Dataclass::contacts, kAccount, {record("a", "Ada")});
   const DataSourcePtr local = open("Contacts");

@@ -71,6 +71,28 @@ TEST_F(TakeOver, DoesNotHappenWhileTetheredSyncingIsOff) {
   EXPECT_EQ(linesOf(image, Dataclass::bookmarks), Lines{"1: own one"});
 }
 
+TEST_F(TakeOver, DoesNotHappenWhenTheLocalStoreIsCleared) {
+  const platform::DataSourcePtr local =
+      sources().createDataSource("Bookmarks", std::nullopt, std::nullopt).source;
+  EXPECT_EQ(sources().clearAllRecords(local).code, 0);
+  EXPECT_EQ(sources().commit(local).code, 0);
+  EXPECT_THAT(linesOf(image, Dataclass::bookmarks), IsEmpty());
+  EXPECT_EQ(linesOf(image, Dataclass::bookmarks, "Quillnet:ada"), (Lines{"1: one", "2: two"}));
+}
+
+TEST_F(TakeOver, DoesNotHappenWhenTheLocalStoreWasTheOriginOfAMigration) {
+  const platform::DataSourcePtr local =
+      sources().createDataSource("Bookmarks", std::nullopt, std::nullopt).source;
+  const platform::DataSourcePtr other =
+      sources().createDataSource("Bookmarks", "other", std::nullopt).source;
+  EXPECT_EQ(sources().migrateRecords(local, other).code, 0);
+  EXPECT_EQ(sources().commit(other).code, 0);
+  EXPECT_EQ(sources().commit(local).code, 0);
+  EXPECT_EQ(linesOf(image, Dataclass::bookmarks), Lines{"1: own one"});
+  EXPECT_EQ(linesOf(image, Dataclass::bookmarks, "other"), (Lines{"1: own one", "3: three"}));
+  EXPECT_EQ(linesOf(image, Dataclass::bookmarks, "Quillnet:ada"), (Lines{"1: one", "2: two"}));
+}
+
 TEST_F(TakeOver, DoesNotHappenWithoutAnAccountNameOfTheAgent) {
   ASSERT_TRUE(image.image->removeFile(*DeviceImage::preferencesFile("com.vantor.OTASyncAgent"))
                   .isSuccess());
