@@ -1,6 +1,8 @@
 #include "host/AccountComparison.h"
 
+#include <algorithm>
 #include <deque>
+#include <map>
 #include <optional>
 #include <unordered_map>
 
@@ -41,6 +43,8 @@ class Finder {
     return std::nullopt;
   }
 
+  bool isTaken(std::size_t index) const { return _taken[index]; }
+
  private:
   // The same bytes for the same account, apart from what may be corrected. What the file form
   // cannot hold has not come from a file.
@@ -65,13 +69,43 @@ AccountReport reportOf(const Dictionary& account) {
           AccountOutcome::notSelected};
 }
 
+// Accounts of `after` that `finder` has not found to be one of before.
+void checkAddedAccounts(const std::vector<Dictionary>& after, const Finder& finder,
+                        const AccountRights& rights, AccountComparison& comparison) {
+  std::map<std::string, std::size_t> counts;  // by type
+  for (const Dictionary& account : after) ++counts[typeOf(account)];
+  for (std::size_t index = 0; index < after.size(); ++index) {
+    if (finder.isTaken(index)) continue;
+    const AccountReport report = reportOf(after[index]);
+    const bool mayCome =
+        counts[report.type] == 1 && std::find(rights.mayBeAdded.begin(), rights.mayBeAdded.end(),
+                                              report.type) != rights.mayBeAdded.end();
+    if (!mayCome)
+      comparison.contradictions.push_back("The " + nameOf(report) + " was not there before.");
+  }
+}
+
+void noteGoneAccount(const Dictionary& account, const AccountReport& report,
+                     const AccountRights& rights, AccountComparison& comparison) {
+  const bool mayGo =
+      std::any_of(rights.mayBeDropped.begin(), rights.mayBeDropped.end(),
+                  [&](const UnkeepableAccounts& unkeepable) { return unkeepable.covers(account); });
+  if (mayGo)
+    comparison.leftBehind.push_back("The " + nameOf(report) +
+                                    " is gone from the settings file: its class \"" +
+                                    textUnder(account, "Class") + "\" is unknown.");
+  else
+    comparison.contradictions.push_back(
+        "The " + nameOf(report) + " was not to be retired and is gone from the settings file.");
+}
+
 }  // namespace
 
 AccountComparison compareAccounts(const std::vector<Dictionary>& before,
                                   const std::vector<Dictionary>& after, const Selection& selection,
-                                  const std::vector<std::string>& correctedKeys) {
+                                  const AccountRights& rights) {
   AccountComparison comparison;
-  Finder finder(after, correctedKeys);
+  Finder finder(after, rights.correctedKeys);
   std::optional<std::size_t> last;
   for (const Dictionary& account : before) {
     AccountReport report = reportOf(account);
@@ -81,10 +115,9 @@ AccountComparison compareAccounts(const std::vector<Dictionary>& before,
       if (found) comparison.leftBehind.push_back("The " + nameOf(report) + " is still there.");
     } else if (!found) {
       report.outcome = AccountOutcome::dropped;
-      comparison.leftBehind.push_back("The " + nameOf(report) +
-                                      " was not to be retired and is gone from the settings file.");
+      noteGoneAccount(account, report, rights, comparison);
     } else {
-      if (without(account, correctedKeys) != without(after[*found], correctedKeys))
+      if (without(account, rights.correctedKeys) != without(after[*found], rights.correctedKeys))
         comparison.contradictions.push_back("The " + nameOf(report) +
                                             " was not to be retired and has changed.");
       if (last && *found < *last)
@@ -93,6 +126,7 @@ AccountComparison compareAccounts(const std::vector<Dictionary>& before,
     }
     comparison.accounts.push_back(std::move(report));
   }
+  checkAddedAccounts(after, finder, rights, comparison);
   return comparison;
 }
 

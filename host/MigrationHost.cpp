@@ -63,15 +63,18 @@ Selection selectionOf(const std::shared_ptr<const DeviceImage>& image,
   return selection;
 }
 
-std::vector<std::string> correctedKeysOf(const std::vector<MigratorBundle>& bundles) {
-  std::vector<std::string> keys;
-  for (const MigratorBundle& bundle : bundles)
-    keys.insert(keys.end(), bundle.correctedAccountKeys.begin(), bundle.correctedAccountKeys.end());
-  return keys;
-}
-
 void append(std::vector<std::string>& target, const std::vector<std::string>& added) {
   target.insert(target.end(), added.begin(), added.end());
+}
+
+AccountRights rightsOf(const std::vector<MigratorBundle>& bundles) {
+  AccountRights rights;
+  for (const MigratorBundle& bundle : bundles) {
+    append(rights.correctedKeys, bundle.correctedAccountKeys);
+    append(rights.mayBeAdded, bundle.addedAccountTypes);
+    rights.mayBeDropped.push_back(bundle.unkeepableAccounts);
+  }
+  return rights;
 }
 
 }  // namespace
@@ -122,6 +125,8 @@ void MigrationHost::_runUnderLock(const RunOptions& options, int lockDescriptor)
   if (!before.error.empty()) return _refuse(before.error);
   const Selection selection = selectionOf(_image, _bundles);
   const deviceimage::SyncAgent agent(*_image);
+  removeStaleTemporaryFiles(*_image);
+  _image->removeLeftovers();
   if (!_interruption.requested()) _runMigrators(options, lockDescriptor);
 
   _listener.stageBegan("Looking at the image after");
@@ -144,7 +149,7 @@ void MigrationHost::_readBundles(const RunOptions& options) {
   }
 }
 
-// Puts right what a killed run may have left. False when the databases are not fit to be migrated.
+// Rolls back what a killed run may have left. False when the databases are not fit to be migrated.
 bool MigrationHost::_prepare() {
   RecordStores stores(_image, RecordStores::Access::readWrite);
   const platform::Status recovered = stores.recoverDatabases();
@@ -152,8 +157,6 @@ bool MigrationHost::_prepare() {
     _refuse(textOf(recovered));
     return false;
   }
-  removeStaleTemporaryFiles(*_image);
-  _image->removeLeftovers();
   return _checkDatabases(RunOutcome::refused);
 }
 
@@ -202,7 +205,7 @@ void MigrationHost::_compare(const Observation& before, const Observation& after
     contradictions.push_back(_image->settingsFile() +
                              " cannot be read any more: " + after.settings.error + ".");
   AccountComparison accounts = compareAccounts(before.settings.accounts, after.settings.accounts,
-                                               selection, correctedKeysOf(_bundles));
+                                               selection, rightsOf(_bundles));
   _report.accounts = std::move(accounts.accounts);
   append(contradictions, accounts.contradictions);
   std::vector<std::string> leftBehind = std::move(accounts.leftBehind);

@@ -115,6 +115,12 @@ class Reader {
   void _readSelection(const Dictionary& information, MigratorBundle& bundle) {
     bundle.retiredAccountTypes = stringsUnder(information, "RetiredAccountTypes");
     bundle.correctedAccountKeys = stringsUnder(information, "CorrectedAccountKeys");
+    bundle.addedAccountTypes = stringsUnder(information, "AddedAccountTypes");
+    if (const Dictionary* accounts =
+            propertylist::findDictionary(information, "UnkeepableAccounts"))
+      bundle.unkeepableAccounts = {stringsUnder(*accounts, "AccountTypes"),
+                                   stringsUnder(*accounts, "KnownClasses"),
+                                   stringsUnder(*accounts, "KnownPathParts")};
     const propertylist::Value* status = information.find("RetiredServiceStatus");
     if (status != nullptr && status->asInteger())
       bundle.retiredServiceStatus = *status->asInteger();

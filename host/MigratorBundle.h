@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "deviceimage/DeviceImage.h"
+#include "host/Settings.h"
 
 namespace host {
 
@@ -19,9 +20,12 @@ namespace host {
 //   RetiredAccountTypes        array of the account types that it retires; may be absent
 //   RetiredServiceStatus       integer value of the service status that selects an account
 //   CorrectedAccountKeys       array of the keys that it may put right in accounts that it keeps
+//   AddedAccountTypes          array of the types of which it may add an account when there is none
+//   UnkeepableAccounts         dictionary of what it cannot keep, as host::UnkeepableAccounts: the
+//                              arrays AccountTypes, KnownClasses and KnownPathParts
 //   RequiredResources          array of files that must lie in the bundle
-//   ("en.lproj/Names.strings") AccountTypesResource       the property list, named without
-//   ".plist", whose keys are all known
+//                              ("en.lproj/Names.strings")
+//   AccountTypesResource       the property list, named without ".plist", whose keys are all known
 //                              account types
 struct MigratorBundle {
   std::string path;  // the folder; absolute, without links
@@ -31,6 +35,8 @@ struct MigratorBundle {
   std::vector<std::string> retiredAccountTypes;
   std::int64_t retiredServiceStatus = 0;
   std::vector<std::string> correctedAccountKeys;
+  std::vector<std::string> addedAccountTypes;
+  UnkeepableAccounts unkeepableAccounts;
   // The known account types; empty when the bundle does not say.
   std::optional<std::vector<std::string>> accountTypes;
 };

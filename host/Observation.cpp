@@ -42,7 +42,8 @@ Observation observe(const std::shared_ptr<const deviceimage::DeviceImage>& image
       const platform::Status visited = stores.visitRecords(
           dataclass, store.row, false,
           [&observed](const deviceimage::Record& record, std::string_view /*content*/) {
-            observed.records.push_back({record.uid, bytesOfHexadecimal(record.contentHash)});
+            observed.records.push_back({record.uid, bytesOfHexadecimal(record.contentHash),
+                                        record.conflictCopyOf.value_or("")});
             return true;
           });
       if (!visited.isSuccess()) {

@@ -15,6 +15,8 @@ namespace host {
 struct ObservedRecord {
   std::string uid;
   std::string contentHash;  // SHA-256 in 32 bytes
+  // The record is another version of the one with this UID; empty: it is that one itself.
+  std::string otherVersionOf = {};
   bool operator==(const ObservedRecord&) const = default;
 };
 

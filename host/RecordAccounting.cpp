@@ -13,7 +13,7 @@ namespace {
 using deviceimage::Dataclass;
 using deviceimage::dataclassName;
 
-using Counts = std::unordered_map<std::string, std::int64_t>;
+using Counts = std::unordered_map<std::string, std::int64_t>;  // by key, see keyOf
 
 // Finds an active store of an observation, which must live on.
 class ActiveStores {
@@ -51,6 +51,33 @@ std::string amount(std::int64_t count, Dataclass dataclass) {
          std::string(dataclassName(dataclass));
 }
 
+// What makes two records of different stores the same: the record that they are versions of, and
+// the content. (Hashes are all of one length.)
+std::string keyOf(const ObservedRecord& record) {
+  return record.contentHash + (record.otherVersionOf.empty() ? record.uid : record.otherVersionOf);
+}
+
+Counts countsOf(const ObservedStore* store) {
+  Counts counts;
+  if (store != nullptr)
+    for (const ObservedRecord& record : store->records) ++counts[keyOf(record)];
+  return counts;
+}
+
+// Takes one away; false when there is none.
+bool take(Counts& counts, const std::string& key) {
+  const auto found = counts.find(key);
+  if (found == counts.end() || found->second == 0) return false;
+  --found->second;
+  return true;
+}
+
+std::int64_t sumOf(const Counts& counts) {
+  std::int64_t sum = 0;
+  for (const auto& [key, count] : counts) sum += count;
+  return sum;
+}
+
 // Follows the records of one dataclass from before to after.
 class DataclassAccounting {
  public:
@@ -63,26 +90,33 @@ class DataclassAccounting {
   void takeRetiredStores(const Observation& before, const Observation& after) {
     for (const ObservedStore& store : after.stores)
       if (store.dataclass == _dataclass && store.retired)
-        for (const ObservedRecord& record : store.records) _retired.insert(record.contentHash);
-    _checkThatRetiredRecordsStayed(before);
+        for (const ObservedRecord& record : store.records) ++_freshRetired[keyOf(record)];
+    std::int64_t gone = 0;
+    for (const ObservedStore& store : before.stores)
+      if (store.dataclass == _dataclass && store.retired)
+        for (const ObservedRecord& record : store.records)
+          if (!take(_freshRetired, keyOf(record))) ++gone;
+    if (gone > 0)
+      _contradict(amount(gone, _dataclass) + " in retired stores are gone or have changed.");
   }
 
   // Gives each record of an account's store its place in the account's line.
   void follow(const ObservedStore& before, const ObservedStore* after, DataclassReport& line) {
-    std::unordered_set<std::string> stillThere;
-    if (after != nullptr)
-      for (const ObservedRecord& record : after->records) stillThere.insert(record.contentHash);
+    Counts still = countsOf(after);
     std::int64_t lost = 0;
     for (const ObservedRecord& record : before.records) {
       ++line.serviceBefore;
-      if (!_wasThere(record) && _takeFresh(record.contentHash))
-        ++(_localContent.emplace(record.uid, record.contentHash).second ? line.moved
-                                                                        : line.conflictCopies);
-      else if (_localAfter.contains(record.contentHash))
+      const std::string key = keyOf(record);
+      // What went to the local store may be retired, or still be in its own store, as well.
+      const bool isRetired = take(_freshRetired, key);
+      const bool isStillThere = take(still, key);
+      if (!_localBefore.contains(key) && take(_fresh, key))
+        ++(_localUIDs.insert(record.uid).second ? line.moved : line.conflictCopies);
+      else if (_localAfter.contains(key))
         ++line.alreadyThere;
-      else if (_retired.contains(record.contentHash))
+      else if (isRetired)
         ++line.retired;
-      else if (stillThere.contains(record.contentHash))
+      else if (isStillThere)
         ++line.leftBehind;
       else
         ++lost;
@@ -90,6 +124,9 @@ class DataclassAccounting {
     if (lost > 0)
       _contradict(amount(lost, _dataclass) + " from the store of account " + line.account +
                   " cannot be found any more.");
+    if (const std::int64_t more = sumOf(still); more > 0)
+      _contradict(amount(more, _dataclass) + " in the store of account " + line.account +
+                  " were not there before.");
   }
 
   void fillLocalFigures(DataclassReport& line) const {
@@ -99,12 +136,14 @@ class DataclassAccounting {
 
   // To be called when every store has been followed.
   void checkThatNothingElseCame() {
-    std::int64_t unexplained = 0;
-    for (const auto& [content, count] : _fresh) unexplained += count;
-    if (unexplained > 0)
+    if (const std::int64_t unexplained = sumOf(_fresh); unexplained > 0)
       _contradict(amount(unexplained, _dataclass) +
                   " in the local store were in no store of an account to be retired, or are there "
                   "more than once.");
+    if (const std::int64_t unexplained = sumOf(_freshRetired); unexplained > 0)
+      _contradict(amount(unexplained, _dataclass) +
+                  " came into retired stores and were in no store of an account to be retired, or "
+                  "came more than once.");
   }
 
  private:
@@ -113,56 +152,29 @@ class DataclassAccounting {
   void _takeLocalStores(const ObservedStore* before, const ObservedStore* after) {
     _before = countOf(before);
     _after = countOf(after);
-    if (after != nullptr)
-      for (const ObservedRecord& record : after->records) {
-        _localAfter.insert(record.contentHash);
-        ++_fresh[record.contentHash];
-      }
+    _fresh = countsOf(after);
+    for (const auto& [key, count] : _fresh) _localAfter.insert(key);
     std::int64_t gone = 0;
     if (before != nullptr)
       for (const ObservedRecord& record : before->records) {
-        _localContent.emplace(record.uid, record.contentHash);
-        if (!_takeFresh(record.contentHash)) ++gone;
+        _localUIDs.insert(record.uid);
+        _localBefore.insert(keyOf(record));
+        if (!take(_fresh, keyOf(record))) ++gone;
       }
     if (gone > 0)
       _contradict(amount(gone, _dataclass) + " in the local store are gone or have changed.");
-  }
-
-  void _checkThatRetiredRecordsStayed(const Observation& before) {
-    std::int64_t gone = 0;
-    for (const ObservedStore& store : before.stores)
-      if (store.dataclass == _dataclass && store.retired)
-        for (const ObservedRecord& record : store.records)
-          if (!_retired.contains(record.contentHash) && !_localAfter.contains(record.contentHash))
-            ++gone;
-    if (gone > 0)
-      _contradict(amount(gone, _dataclass) + " in retired stores are gone or have changed.");
-  }
-
-  // Whether the local store had the very record before, and still has it.
-  bool _wasThere(const ObservedRecord& record) const {
-    const auto local = _localContent.find(record.uid);
-    return local != _localContent.end() && local->second == record.contentHash &&
-           _localAfter.contains(record.contentHash);
-  }
-
-  // Takes one of the local store's records of this content that were not there before.
-  bool _takeFresh(const std::string& content) {
-    const auto fresh = _fresh.find(content);
-    if (fresh == _fresh.end() || fresh->second == 0) return false;
-    --fresh->second;
-    return true;
   }
 
   Dataclass _dataclass;
   RecordAccounting& _result;
   std::int64_t _before = 0;
   std::int64_t _after = 0;
-  // By UID: what the local store had before, and then what came into it account by account.
-  std::unordered_map<std::string, std::string> _localContent;
-  std::unordered_set<std::string> _localAfter;
-  Counts _fresh;  // what the local store has more than before, by content
-  std::unordered_set<std::string> _retired;
+  std::unordered_set<std::string> _localBefore;  // keys
+  std::unordered_set<std::string> _localAfter;   // keys
+  // What the local store had before, and then what came into it account by account.
+  std::unordered_set<std::string> _localUIDs;
+  Counts _fresh;         // what the local store has more than before
+  Counts _freshRetired;  // what the retired stores have more than before
 };
 
 void checkOtherStore(const ObservedStore& before, const ObservedStore* after,
@@ -172,6 +184,15 @@ void checkOtherStore(const ObservedStore& before, const ObservedStore* after,
   result.contradictions.push_back("The store " + *before.account + " with " +
                                   std::string(dataclassName(before.dataclass)) +
                                   " belongs to no account to be retired and has changed.");
+}
+
+void checkNewStore(const ObservedStore& store, const ActiveStores& before,
+                   RecordAccounting& result) {
+  if (store.retired || !store.account || store.records.empty() || before.find(store) != nullptr)
+    return;
+  result.contradictions.push_back("The store " + *store.account + " with " +
+                                  std::string(dataclassName(store.dataclass)) +
+                                  " was not there before.");
 }
 
 void listWhatIsNotLocal(RecordAccounting& result) {
@@ -212,6 +233,7 @@ RecordAccounting accountForRecords(const Observation& before, const Observation&
       if (line.dataclass == dataclass) accounting.fillLocalFigures(line);
     accounting.checkThatNothingElseCame();
   }
+  for (const ObservedStore& store : after.stores) checkNewStore(store, activeBefore, result);
   result.dataclasses = std::move(owners.lines());
   listWhatIsNotLocal(result);
   return result;

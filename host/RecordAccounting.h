@@ -16,12 +16,12 @@ struct RecordAccounting {
   std::vector<std::string> contradictions;   // sentences: what does not add up
 };
 
-// Finds each record of before by its content, never by what the migrator says. An account to be
-// retired has a line for each dataclass it has enabled, and for any other of which its stores hold
-// records. A store that several such accounts share belongs to the first one in file order that has
-// the dataclass enabled, else to the first one. All other stores, and the records that the local
-// and the retired stores had before, must still be there unchanged; nothing else may come new into
-// a local store.
+// Finds each record of before by its content and by the record that it is a version of, never by
+// what the migrator says. An account to be retired has a line for each dataclass it has enabled,
+// and for any other of which its stores hold records. A store that several such accounts share
+// belongs to the first one in file order that has the dataclass enabled, else to the first one. All
+// other stores, and the records that the local and the retired stores had before, must still be
+// there unchanged and as many times; nothing else may come new into any store.
 RecordAccounting accountForRecords(const Observation& before, const Observation& after,
                                    const Selection& selection, const deviceimage::SyncAgent& agent);
 

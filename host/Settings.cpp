@@ -83,4 +83,16 @@ bool Selection::covers(const Dictionary& account) const {
   });
 }
 
+bool UnkeepableAccounts::covers(const Dictionary& account) const {
+  const auto holds = [](const std::vector<std::string>& list, const std::string& text) {
+    return std::find(list.begin(), list.end(), text) != list.end();
+  };
+  if (!holds(types, typeOf(account)) || holds(knownClasses, textUnder(account, "Class")))
+    return false;
+  const std::string path = textUnder(account, "AccountPath");
+  return std::none_of(knownPathParts.begin(), knownPathParts.end(), [&](const std::string& part) {
+    return path.find(part) != std::string::npos;
+  });
+}
+
 }  // namespace host

@@ -46,4 +46,14 @@ struct Selection {
   bool covers(const propertylist::Dictionary& account) const;
 };
 
+// Accounts that a migrator cannot keep, although it is not to retire them: those of the types whose
+// class is none of the known ones, unless a known class can be told from a part of the path in
+// their "AccountPath".
+struct UnkeepableAccounts {
+  std::vector<std::string> types;
+  std::vector<std::string> knownClasses;
+  std::vector<std::string> knownPathParts;
+  bool covers(const propertylist::Dictionary& account) const;
+};
+
 }  // namespace host

@@ -91,13 +91,33 @@ void checkTemporaryDirectory(const DeviceImage& image, Reasons& reasons) {
                       ", so that no save could replace that file in one step; unmount it.");
 }
 
+bool isGroupOfCaller(gid_t group) {
+  if (group == getegid()) return true;
+  const int count = getgroups(0, nullptr);
+  std::vector<gid_t> groups(count > 0 ? static_cast<std::size_t>(count) : 0);
+  return getgroups(count, groups.data()) > 0 &&
+         std::find(groups.begin(), groups.end(), group) != groups.end();
+}
+
+// A save gives the settings file to "mobile", which only root may do for others than themselves.
+void checkThatOwnerCanBeGiven(const DeviceImage& image, uid_t user, gid_t group, Reasons& reasons) {
+  if (geteuid() == 0 || (user == geteuid() && isGroupOfCaller(group))) return;
+  reasons.push_back("Only root or \"mobile\" itself, user " + std::to_string(user) + " and group " +
+                    std::to_string(group) + " in " + image.absolutePath(DeviceImage::kUsersFile) +
+                    " and " + image.absolutePath(DeviceImage::kGroupsFile) +
+                    ", can save the settings file; run the host as that user or as root.");
+}
+
 void checkOwner(const DeviceImage& image, Reasons& reasons) {
-  if (!image.userNumber(kMobile))
+  const std::optional<uid_t> user = image.userNumber(kMobile);
+  const std::optional<gid_t> group = image.groupNumber(kMobile);
+  if (!user)
     reasons.push_back(image.absolutePath(DeviceImage::kUsersFile) +
                       " has no user \"mobile\", who owns the settings file; add the line.");
-  if (!image.groupNumber(kMobile))
+  if (!group)
     reasons.push_back(image.absolutePath(DeviceImage::kGroupsFile) +
                       " has no group \"mobile\", which owns the settings file; add the line.");
+  if (user && group) checkThatOwnerCanBeGiven(image, *user, *group, reasons);
 }
 
 // What is not there yet is made when it is needed, in a directory that is looked at too.

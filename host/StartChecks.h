@@ -17,7 +17,8 @@ namespace host {
 //   type that each bundle knows which lists its types: an account that a migrator cannot read would
 //   be gone after its first save;
 // - tmp/ is a directory on the settings file's file system, else no save could replace the file;
-// - "mobile" is in the image's user database as a user and a group;
+// - "mobile" is in the image's user database as a user and a group, and the caller is root or that
+//   user, of that group: only they can give the settings file its owner;
 // - settings, databases and logs can be written.
 std::vector<std::string> reasonsNotToStart(const deviceimage::DeviceImage& image,
                                            const Settings& settings,

@@ -12,7 +12,8 @@ namespace host {
 namespace {
 
 const Selection kSelection = {"Status", {{{"Quillnet"}, 1}}};
-const std::vector<std::string> kCorrected = {"Class", "Identifier"};
+const AccountRights kRights = {
+    {"Class", "Identifier"}, {{{"Mail"}, {"IMAPAccount"}, {"Mail/POP-"}}}, {"OnMyDevice"}};
 
 const Dictionary kMail = {{"Identifier", "M"}, {"Type", "Mail"}, {"Class", "Old"}, {"Port", 25}};
 const Dictionary kQuillnet = {{"Identifier", "Q"}, {"Type", "Quillnet"}, {"Status", 1}};
@@ -20,7 +21,7 @@ const Dictionary kExchange = {{"Identifier", "E"}, {"Type", "Exchange"}, {"Displ
 
 AccountComparison compare(const std::vector<Dictionary>& before,
                           const std::vector<Dictionary>& after) {
-  return compareAccounts(before, after, kSelection, kCorrected);
+  return compareAccounts(before, after, kSelection, kRights);
 }
 
 Dictionary with(Dictionary account, std::string_view key, const propertylist::Value& value) {
@@ -52,12 +53,37 @@ TEST(CompareAccounts, ReportsASelectedAccountThatIsThereAsKept) {
   EXPECT_THAT(comparison.leftBehind, ElementsAre("The Quillnet account Q is still there."));
 }
 
-TEST(CompareAccounts, ReportsAnotherAccountThatIsGoneAsDropped) {
+TEST(CompareAccounts, NoticesAnotherAccountThatIsGone) {
   const AccountComparison comparison = compare({kMail, kExchange}, {kMail});
   EXPECT_THAT(outcomes(comparison),
               ElementsAre(AccountOutcome::notSelected, AccountOutcome::dropped));
-  EXPECT_THAT(comparison.leftBehind, ElementsAre(HasSubstr("Exchange account Work")));
-  EXPECT_THAT(comparison.contradictions, IsEmpty());
+  EXPECT_THAT(comparison.contradictions,
+              ElementsAre("The Exchange account Work was not to be retired and is gone from the "
+                          "settings file."));
+  EXPECT_THAT(comparison.leftBehind, IsEmpty());
+}
+
+TEST(CompareAccounts, LeavesBehindOnlyWhatAMigratorCannotKeep) {
+  struct Case {
+    const char* name;
+    Dictionary account;
+    bool mayGo;
+  };
+  const Case kCases[] = {
+      {"unknown class", {{"Type", "Mail"}, {"Class", "Old"}}, true},
+      {"no class", {{"Type", "Mail"}}, true},
+      {"unknown class and path", {{"Type", "Mail"}, {"AccountPath", "Mail/Fax-1"}}, true},
+      {"known class", {{"Type", "Mail"}, {"Class", "IMAPAccount"}}, false},
+      {"a path that tells the class", {{"Type", "Mail"}, {"AccountPath", "/x/Mail/POP-1"}}, false},
+      {"another type", {{"Type", "Exchange"}, {"Class", "Old"}}, false},
+  };
+  for (const Case& c : kCases) {
+    SCOPED_TRACE(c.name);
+    const AccountComparison comparison = compare({c.account}, {});
+    EXPECT_THAT(outcomes(comparison), ElementsAre(AccountOutcome::dropped));
+    EXPECT_EQ(comparison.leftBehind.size(), c.mayGo ? 1U : 0U);
+    EXPECT_EQ(comparison.contradictions.size(), c.mayGo ? 0U : 1U);
+  }
 }
 
 TEST(CompareAccounts, NoticesEveryChangeOfAnAccountThatStays) {
@@ -91,10 +117,20 @@ TEST(CompareAccounts, CountsTwoAccountsOfOneIdentifierAsTwo) {
               ElementsAre(AccountOutcome::notSelected, AccountOutcome::dropped));
 }
 
-TEST(CompareAccounts, PassesOverAccountsThatCameNew) {
+TEST(CompareAccounts, NoticesAccountsThatCameNew) {
   const AccountComparison comparison = compare({kMail}, {kExchange, kMail});
   EXPECT_THAT(outcomes(comparison), ElementsAre(AccountOutcome::notSelected));
-  EXPECT_THAT(comparison.contradictions, IsEmpty());
+  EXPECT_THAT(comparison.contradictions,
+              ElementsAre("The Exchange account Work was not there before."));
+}
+
+TEST(CompareAccounts, LetsTheFirstAccountOfATypeThatMayBeAddedCome) {
+  const Dictionary local = {{"Identifier", "L"}, {"Type", "OnMyDevice"}};
+  const Dictionary another = {{"Identifier", "L2"}, {"Type", "OnMyDevice"}};
+  EXPECT_THAT(compare({kMail}, {kMail, local}).contradictions, IsEmpty());
+  EXPECT_THAT(compare({kMail, local}, {kMail, local, another}).contradictions,
+              ElementsAre("The OnMyDevice account L2 was not there before."));
+  EXPECT_EQ(compare({kMail}, {kMail, local, another}).contradictions.size(), 2U);
 }
 
 }  // namespace

@@ -136,6 +136,20 @@ class WholeRun(hosttest.HostTestCase):
         self.assertEqual((3, "dropped", True), (run.code, run.report["accounts"][1]["outcome"],
                                                 run.report["balanced"]))
 
+    def test_every_mail_account_that_the_bundle_says_it_keeps_is_kept(self):
+        bundle = next(hosttest.MIGRATORS.glob("*.migrator"))
+        known = plistlib.loads((bundle / "Info.plist").read_bytes())["UnkeepableAccounts"]
+        accounts = [account(name, "Mail", Class=name) for name in known["KnownClasses"]]
+        accounts += [account(part, "Mail", Class="GoneAccount", AccountPath=f"/x/{part}y")
+                     for part in known["KnownPathParts"]]
+        self.assertEqual((8, 16), (len(known["KnownClasses"]), len(accounts)))
+        self.write_settings(RETIRED, *accounts)
+        run = self.run_host("--json", "--quiet")
+        self.assertEqual(0, run.code, run.output)
+        self.assertEqual(accounts[:8], self.settings()["Accounts"][:8])
+        self.assertLessEqual({entry["Class"] for entry in self.settings()["Accounts"]},
+                             set(known["KnownClasses"]))
+
     def test_an_account_without_an_identifier_gets_one_and_is_known_again(self):
         nameless = account("", "Exchange", DisplayName="Nameless")
         del nameless["Identifier"]
@@ -185,6 +199,32 @@ class Calendars(hosttest.HostTestCase):
         self.assertEqual(sorted((event("a", "Party").encode(), event("l", "Local").encode())),
                          self.contents("calendars"))
         self.assertEqual([todo.encode()], self.contents("reminders"))
+
+
+    def run_with_events_beside_the_reminders(self, *dataclasses):
+        self.write_agent_name("ada")
+        self.write_settings(account("Q", "Quillnet", dataclasses, status=1))
+        self.todo = event("t", "Task").replace("VEVENT", "VTODO")
+        self.make_image([record("calendars", hosttest.SERVICE, "a", event("a", "Party")),
+                         record("reminders", hosttest.SERVICE, "t", self.todo)])
+        return self.run_host("--json", "--quiet")
+
+    def test_events_beside_the_reminders_of_an_account_without_calendars_are_retired(self):
+        run = self.run_with_events_beside_the_reminders("Reminders")
+        self.assertEqual((3, True), (run.code, run.report["balanced"]), run.output)
+        self.assertEqual([("reminders", 1, 0), ("calendars", 0, 1)],
+                         sorted(((line["dataclass"], line["moved"], line["retired"])
+                                 for line in run.report["dataclasses"]), reverse=True))
+        self.assertEqual([self.todo.encode()], self.contents("reminders"))
+        self.assertEqual([], self.contents("calendars"))
+        self.assertEqual([event("a", "Party").encode()],
+                         self.contents("calendars", hosttest.SERVICE, retired=True))
+
+    def test_calendars_move_first_whatever_the_order_they_are_enabled_in(self):
+        run = self.run_with_events_beside_the_reminders("Reminders", "Calendars")
+        self.assertEqual((0, True), (run.code, run.report["balanced"]), run.output)
+        self.assertEqual([self.todo.encode()], self.contents("reminders"))
+        self.assertEqual([event("a", "Party").encode()], self.contents("calendars"))
 
 
 class SampleImage(hosttest.HostTestCase):

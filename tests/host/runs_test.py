@@ -149,6 +149,16 @@ class StaleFiles(hosttest.HostTestCase):
         self.run_host("--bundle", GOOD)
         self.assertEqual(before, sorted(os.listdir(self.image / "tmp")))
 
+    def test_a_run_that_is_refused_for_a_damaged_database_sweeps_nothing(self):
+        self.make_image([hosttest.record("notes", None, "a", "a note")])
+        database = self.image / hosttest.KINDS["notes"][1]
+        content = bytearray(database.read_bytes())
+        content[100:200] = bytes(100)
+        database.write_bytes(content)
+        self.place("fileAb12Cd", b"bplist00")
+        with self.unchanged_image():
+            self.assertEqual(7, self.run_host().code)
+
     def test_a_refused_run_sweeps_nothing(self):
         self.place("fileAb12Cd", b"bplist00")
         self.write_settings(account("B", "Telegraph"))
@@ -189,10 +199,20 @@ class Verification(hosttest.HostTestCase):
         self.assertEqual((3, "left behind"), (run.code, run.report["outcome"]))
         self.assertEqual("kept", self.outcomes(run)["Q"])
 
-    def test_an_account_that_is_gone_unasked_is_dropped(self):
+    def test_accounts_that_are_gone_unasked_fail_the_verification(self):
         run = self.run_change("drop")
-        self.assertEqual(3, run.code)
+        self.assertEqual((5, False), (run.code, run.report["balanced"]))
         self.assertEqual({"A": "dropped", "Q": "retired", "E": "dropped"}, self.outcomes(run))
+        self.assertIn("The Exchange account e@example.net was not to be retired and is gone from "
+                      "the settings file.", run.report["reasons"])
+
+    def test_settings_that_are_gone_fail_the_verification(self):
+        self.assertEqual(5, self.run_change("remove").code)
+
+    def test_an_account_that_came_new_fails_the_verification(self):
+        run = self.run_change("add")
+        self.assertEqual((5, False), (run.code, run.report["balanced"]))
+        self.assertIn("The Mail account New was not there before.", run.report["reasons"])
 
     def test_a_changed_account_fails_the_verification(self):
         run = self.run_change("change")

@@ -88,6 +88,32 @@ class ImageChecks(hosttest.HostTestCase):
         (self.image / "etc/group").write_text("wheel:x:0:\n")
         self.check_refusal("etc/group", 'no group "mobile"', "add the line")
 
+    OTHER_USER = 12345  # any number that nobody has
+
+    def run_as_other_user(self, user, group, *identity):
+        """Runs as somebody who owns the image, whose "mobile" has these numbers."""
+        (self.image / "etc/passwd").write_text(f"mobile:x:{user}:{group}::/var/mobile:/bin/sh\n")
+        (self.image / "etc/group").write_text(f"mobile:x:{group}:\n")
+        for path in [self.directory, *self.directory.rglob("*")]:
+            os.chown(path, self.OTHER_USER, self.OTHER_USER)
+        return ("setpriv", f"--reuid={self.OTHER_USER}", f"--regid={self.OTHER_USER}", *identity)
+
+    @hosttest.skip_unless_root
+    def test_a_caller_who_is_neither_root_nor_mobile(self):
+        self.check_refusal("user 501 and group 501", "run the host as that user or as root",
+                           prefix=self.run_as_other_user(501, 501, "--clear-groups"))
+
+    @hosttest.skip_unless_root
+    def test_a_caller_who_is_not_of_the_group_of_mobile(self):
+        prefix = self.run_as_other_user(self.OTHER_USER, 501, "--clear-groups")
+        self.check_refusal("group 501", "run the host as that user", prefix=prefix)
+
+    @hosttest.skip_unless_root
+    def test_a_caller_who_is_mobile_runs(self):
+        self.write_settings(account("Q", "Quillnet", status=1))
+        prefix = self.run_as_other_user(self.OTHER_USER, 501, "--groups=501")
+        self.assertEqual(0, self.run_host("--quiet", prefix=prefix).code)
+
     def test_a_damaged_database(self):
         self.make_image([record("contacts", None, "a", card("a", "Ada"))])
         databases = [path for path in self.image.rglob("*")

@@ -1,6 +1,8 @@
 // Does to the settings file what the process default "TestChange" says: "retire" takes the accounts
 // that are to be retired out and nothing else, "drop" takes all of them out, "change" renames those
-// that are to stay, "reverse" turns their order round, "destroy" writes what is no property list.
+// that are to stay, "reverse" turns their order round, "add" puts one more behind them, "destroy"
+// writes what is no property list, and "remove" removes the file.
+#include <cstdio>
 #include <fstream>
 #include <string>
 #include <vector>
@@ -31,6 +33,7 @@ Array changed(const Array& accounts, const std::string& change) {
     else
       result.emplace_back(account);
   }
+  if (change == "add") result.emplace_back(Dictionary{{"Identifier", "New"}, {"Type", "Mail"}});
   return Array(result);
 }
 
@@ -43,6 +46,7 @@ bool migrate() {
   const auto change = services.preferences.readDefault("TestChange");
   const auto settings = services.fileServices.readPropertyListFile(path);
   if (!change || !settings.value) return false;
+  if (*change->asString() == "remove") return std::remove(path.c_str()) == 0;
   Dictionary root = *settings.value->asDictionary();
   root.set("Accounts", changed(*propertylist::findArray(root, "Accounts"), *change->asString()));
   propertylist::Bytes bytes = *propertylist::writeBinaryPropertyList(root);
