@@ -22,7 +22,7 @@ struct ServiceOptions {
   std::vector<std::string> preferredLanguages = {"en"};
   // Where the resources of the account settings library lie; empty for the folder of the object
   // file that asks. A program that is no bundle has none beside it and names the plug-in's folder.
-  std::optional<std::string> resourceDirectory;
+  std::optional<std::string> resourceDirectory = {};
 };
 
 // Every platform service over one device image. What a service cannot read in the image counts as
