@@ -1,6 +1,8 @@
 #include "host/MigrationHost.h"
 
 #include <algorithm>
+#include <cerrno>
+#include <system_error>
 #include <utility>
 
 #include "deviceimage/DeviceImageServices.h"
@@ -115,6 +117,10 @@ void MigrationHost::_refuse(std::string reason) {
 
 void MigrationHost::_runUnderLock(const RunOptions& options, int lockDescriptor) {
   _listener.stageBegan("Checking the image");
+  if (!adoptOrphans())
+    _refuse("The system does not let the host find what a migrator leaves running: " +
+            std::generic_category().message(errno) +
+            "; run the host outside of the sandbox that forbids it.");
   _readBundles(options);
   for (std::string& reason : reasonsNotToStart(*_image, readSettings(*_image), _bundles))
     _refuse(std::move(reason));
@@ -175,7 +181,6 @@ bool MigrationHost::_checkDatabases(RunOutcome whenDamaged) {
 }
 
 void MigrationHost::_runMigrators(const RunOptions& options, int lockDescriptor) {
-  adoptOrphans();
   for (const MigratorBundle& bundle : _bundles) {
     _listener.stageBegan("Running " + bundle.name);
     const MigratorTask task = {_image->rootPath(), _image->temporaryDirectory(), lockDescriptor,

@@ -23,6 +23,8 @@ using std::chrono::milliseconds;
 // How much is taken from each source before the others and the clock have their turn.
 constexpr int kMessagesATurn = 256;
 constexpr int kReadsATurn = 16;
+// How long a killed process may take to end, and how long what was sent before is read.
+constexpr std::chrono::seconds kPatience{10};
 
 // Watches one process from its start to its end.
 class Watch {
@@ -34,7 +36,7 @@ class Watch {
   }
 
   MigratorOutcome untilItEnds(Interruption& interruption) {
-    while (!_hasEnded()) {
+    while (!_hasEnded() && !(_stopped && Clock::now() >= _deadline + kPatience)) {
       _waitForNews(interruption);
       _takeNews();
       if (interruption.requested())
@@ -47,7 +49,11 @@ class Watch {
   }
 
  private:
+  // A process that somebody traces has ended before its parent can take its end away; the
+  // descriptor tells.
   bool _hasEnded() {
+    pollfd ended = {_process.ended.number(), POLLIN, 0};
+    if (poll(&ended, 1, 0) > 0) return true;
     siginfo_t information = {};
     return waitid(P_PID, static_cast<id_t>(_process.identifier), &information,
                   WEXITED | WNOHANG | WNOWAIT) != 0 ||
@@ -57,7 +63,7 @@ class Watch {
   void _waitForNews(const Interruption& interruption) {
     // A process that was killed needs a moment to end.
     const auto left =
-        _stopped ? milliseconds(1000) : std::chrono::ceil<milliseconds>(_deadline - Clock::now());
+        _stopped ? milliseconds(100) : std::chrono::ceil<milliseconds>(_deadline - Clock::now());
     std::array<pollfd, 4> sources = {
         pollfd{_process.ended.number(), POLLIN, 0},
         pollfd{_channelIsOpen ? _process.channel.number() : -1, POLLIN, 0},
@@ -121,20 +127,19 @@ class Watch {
   void _stop(Ending why) {
     if (_stopped) return;
     _stopped = why;
+    _deadline = Clock::now();
     kill(-_process.identifier, SIGKILL);
     kill(_process.identifier, SIGKILL);
   }
 
   void _collectEnd() {
-    int status = 0;
-    while (waitpid(_process.identifier, &status, 0) < 0 && errno == EINTR) {
-    }
     kill(-_process.identifier, SIGKILL);
-    killAllChildren();
-    // The rest of what was sent; all senders are gone, so this comes to an end.
+    const EndedChildren ended = endAllChildren(_process.identifier);
+    // The rest of what was sent. Who cannot be killed may go on sending.
+    const Clock::time_point end = Clock::now() + (ended.all ? kPatience : std::chrono::seconds(0));
     do _takeNews();
-    while (_isAnythingLeft());
-    _judge(status);
+    while (_isAnythingLeft() && Clock::now() < end);
+    _judge(ended);
   }
 
   bool _isAnythingLeft() {
@@ -144,9 +149,11 @@ class Watch {
     return poll(sources.data(), sources.size(), 0) > 0;
   }
 
-  void _judge(int status) {
-    if (_stopped) {
-      _outcome.ending = *_stopped;
+  void _judge(const EndedChildren& ended) {
+    const int status = ended.status.value_or(0);
+    if (_stopped || !ended.all) {
+      _outcome.ending = _stopped.value_or(Ending::left);
+      if (!ended.all) _outcome.detail = "processes that it started could not be ended";
     } else if (WIFSIGNALED(status)) {
       _outcome.ending = Ending::crashed;
       _outcome.detail =

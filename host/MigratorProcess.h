@@ -18,7 +18,7 @@ enum class Ending {
   notLoaded,    // no code of the migrator's own was run but that of its loading
   raised,       // an exception came out of it
   crashed,      // a signal ended its process
-  left,         // its process ended without an answer
+  left,         // its process ended without an answer, or left some that could not be ended
   timedOut,     // it ran past its limit and was killed
   interrupted,  // the user stopped it
   notStarted    // the system gave no process
@@ -49,12 +49,13 @@ using LineSink = std::function<void(std::string_view line)>;
 // Runs the migrator of a bundle in a process of its own and comes back in time, whatever it does:
 //
 // - The process is this program anew (/proc/self/exe with kRunMigratorArgument), so that it
-// inherits
-//   nothing but an environment with TMPDIR in it, umask 077, its end of the channel and the image's
-//   lock. It is in a session of its own, its address space is limited, and it dies with the host.
+//   inherits nothing but umask 077, its end of the channel and the image's lock. Its environment is
+//   TMPDIR alone, in a build with sanitizers their options too. It is in a session of its own, its
+//   address space is limited, and it dies with the host.
 // - Past the limit of the task, or when the user interrupts, it is killed.
 // - When it has ended, every process that it left behind is killed, and none remains a zombie. The
-//   caller has no other children meanwhile.
+//   caller has no other children meanwhile, and has called adoptOrphans. Processes that cannot be
+//   killed within ten seconds are left alone, and the migrator counts as having left.
 MigratorOutcome runMigrator(const MigratorTask& task, Interruption& interruption,
                             const LineSink& sink);
 

@@ -44,12 +44,15 @@ std::vector<pid_t> childrenOf(pid_t parent) {
   return children;
 }
 
-// Takes away the ends of children that have ended. False when there are no children at all.
-bool reapEndedChildren() {
+// Takes away the ends of children that have ended.
+void reapEndedChildren(pid_t awaited, EndedChildren& ended) {
   for (;;) {
-    const pid_t reaped = waitpid(-1, nullptr, WNOHANG);
-    if (reaped == 0) return true;
-    if (reaped < 0 && errno != EINTR) return false;
+    int status = 0;
+    const pid_t reaped = waitpid(-1, &status, WNOHANG);
+    if (reaped == awaited) ended.status = status;
+    if (reaped > 0 || (reaped < 0 && errno == EINTR)) continue;
+    ended.all = reaped < 0;
+    return;
   }
 }
 
@@ -57,12 +60,16 @@ bool reapEndedChildren() {
 
 bool adoptOrphans() { return prctl(PR_SET_CHILD_SUBREAPER, 1, 0, 0, 0) == 0; }
 
-void killAllChildren() {
+EndedChildren endAllChildren(pid_t awaited) {
   const auto deadline = std::chrono::steady_clock::now() + Seconds(10);
-  while (reapEndedChildren() && std::chrono::steady_clock::now() < deadline) {
+  EndedChildren ended;
+  reapEndedChildren(awaited, ended);
+  while (!ended.all && std::chrono::steady_clock::now() < deadline) {
     for (const pid_t child : childrenOf(getpid())) kill(child, SIGKILL);
     poll(nullptr, 0, 1);  // a killed process ends a moment later
+    reapEndedChildren(awaited, ended);
   }
+  return ended;
 }
 
 }  // namespace host

@@ -3,6 +3,7 @@ import shutil
 import signal
 import subprocess
 import time
+import unittest.mock
 
 import hosttest
 
@@ -88,6 +89,47 @@ class FaultyBundles(hosttest.HostTestCase):
             with self.assertRaises(ProcessLookupError):
                 hosttest.os.kill(number, 0)
 
+    def check_that_nobody_is_left(self, name, code, result, limit=60):
+        run = self.check(name, code, result, limit)
+        with self.assertRaises(ProcessLookupError):
+            hosttest.os.kill(int(run.report["log"][0].removeprefix("left ")), 0)
+
+    def test_one_that_leaves_a_daemon_that_writes_for_ever(self):
+        self.check_that_nobody_is_left("LeavesAWriter", 0, "done")
+
+    def test_one_that_leaves_its_output_open(self):
+        self.check_that_nobody_is_left("KeepsItsOutputOpen", 0, "done")
+
+    def test_one_that_ignores_what_asks_it_to_end(self):
+        self.check_that_nobody_is_left("IgnoresTermination", 8, "timed out", limit=1)
+
+    def test_one_that_is_traced_by_its_child(self):
+        self.check_that_nobody_is_left("IsTracedByItsChild", 0, "done")
+
+    def check_what_cannot_be_killed(self, name):
+        ended = subprocess.run(
+            [hosttest.WITHOUT_CALL, "kill", *self.command(
+                "--json", "--quiet", "--bundle", hosttest.BUNDLES / f"{name}.migrator")],
+            capture_output=True, timeout=100, check=False)
+        report = hosttest.json.loads(ended.stdout)
+        left = int(report["log"][0].removeprefix("left "))
+        hosttest.os.kill(left, signal.SIGKILL)
+        self.assertEqual((8, "ended without an answer",
+                          "processes that it started could not be ended"),
+                         (ended.returncode, report["migrators"][0]["result"],
+                          report["migrators"][0]["detail"]))
+
+    def test_the_host_ends_when_a_writer_cannot_be_killed(self):
+        self.check_what_cannot_be_killed("LeavesAWriter")
+
+    def test_the_host_ends_when_what_holds_the_output_cannot_be_killed(self):
+        self.check_what_cannot_be_killed("KeepsItsOutputOpen")
+
+    def test_a_host_that_cannot_find_what_is_left_refuses(self):
+        with self.unchanged_image():
+            run = self.run_host("--json", "--quiet", prefix=(hosttest.WITHOUT_CALL, "subreaper"))
+        self.assert_refused(run, "find what a migrator leaves running", "outside of the sandbox")
+
     def test_one_without_an_entry_is_refused(self):
         run = self.check("NoEntry", 7, "not loaded",
                          detail="offers no migrator class named TestMigrator")
@@ -121,11 +163,17 @@ class FaultyBundles(hosttest.HostTestCase):
         self.check("AllocatesWithoutEnd", 8, "raised", detail="std::bad_alloc")
 
     def test_surroundings_are_those_of_a_new_process(self):
-        run = self.check("ShowsItsSurroundings", 0, "done")
-        self.assertEqual([f"TMPDIR={self.image}/tmp", "HOME=(null)", "umask=63",
-                          "leads its session: 1", "few descriptors: 1", "signals held back: 0",
-                          "a child holds the lock: 0"],
-                         run.report["log"])
+        with unittest.mock.patch.dict(hosttest.os.environ, {
+                "HOME": "/root", "LD_BIND_NOW": "1", "LC_ALL": "C", "ASAN_OPTIONS": "verbosity=0",
+                "GCOV_PREFIX": "/nowhere", "SECRET": "x"}):
+            run = self.check("ShowsItsSurroundings", 0, "done")
+        environment = [f"TMPDIR={self.image}/tmp"]
+        if hosttest.os.environ.get("SANITIZED"):
+            environment.append("ASAN_OPTIONS=verbosity=0")
+        self.assertEqual([*environment, "umask=63", "leads its session: 1", "few descriptors: 1",
+                          "signals held back: 0", "a child holds the lock: 0"],
+                         [line for line in run.report["log"]
+                          if not line.startswith(("LSAN_", "TSAN_", "UBSAN_"))])
 
     def test_the_next_migrator_runs_after_one_that_crashed(self):
         migrators = self.image / "System/Library/DataClassMigrators"

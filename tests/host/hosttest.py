@@ -20,6 +20,7 @@ import jsonschema
 
 HOST = os.environ["MIGRATION_HOST"]
 MAKE_IMAGE = os.environ["MAKE_TEST_IMAGE"]
+WITHOUT_CALL = os.environ["WITHOUT_CALL"]
 BUNDLES = pathlib.Path(os.environ["TEST_BUNDLES"])
 MIGRATORS = pathlib.Path(os.environ["INSTALLED_MIGRATORS"])
 SETTINGS = "var/mobile/Library/Preferences/com.vantor.accountsettings.plist"

@@ -6,7 +6,6 @@
 #include <unistd.h>
 
 #include <csignal>
-#include <cstdlib>
 
 #include "tests/host/bundles/TestMigrator.h"
 
@@ -39,8 +38,8 @@ bool doesAChildHoldTheLock() {
 
 bool migrate() {
   const mode_t mask = umask(0);
-  platform::logToSystem("TMPDIR=%@", std::getenv("TMPDIR"));
-  platform::logToSystem("HOME=%@", std::getenv("HOME"));
+  for (char** variable = environ; *variable != nullptr; ++variable)
+    platform::logToSystem("%@", *variable);
   platform::logToSystem("umask=%d", static_cast<int>(mask));
   platform::logToSystem("leads its session: %d", getsid(0) == getpid() ? 1 : 0);
   platform::logToSystem("few descriptors: %d", countOfDescriptors() <= 8 ? 1 : 0);
