@@ -3,6 +3,7 @@
 #include <sys/types.h>
 
 #include <cstdint>
+#include <functional>
 #include <memory>
 #include <optional>
 #include <span>
@@ -23,6 +24,8 @@ class DeviceImage;
 struct OpenedImage {
   std::shared_ptr<const DeviceImage> image;
   std::string error;  // empty exactly when there is an image
+  // Only `create` says so: it had begun to write when it failed, and has removed what it had made.
+  bool hadBegun = false;
 };
 
 // An open file of the image. The caller closes the descriptor; -1 on failure, whose code is the
@@ -61,9 +64,10 @@ class DeviceImage {
   static OpenedImage open(const std::string& path);
 
   // Makes an image without accounts and records. `path` must not exist, or be an empty directory.
-  // "mobile" is the user and group that calls this; for root, number 501. After a failure part of
-  // the image may be there.
-  static OpenedImage create(const std::string& path);
+  // "mobile" is the user and group that calls this; for root, number 501. `complete` puts the last
+  // things into the image. After a failure, also one of `complete`, `path` is as it was before.
+  using Completion = std::function<platform::Status(const DeviceImage& image)>;
+  static OpenedImage create(const std::string& path, const Completion& complete = {});
 
   ~DeviceImage();
   DeviceImage(const DeviceImage&) = delete;

@@ -103,11 +103,23 @@ void checkPrivacy(const DeviceImage& image, const std::string& relative,
   if (error) problems.push_back({relative, "cannot be listed: " + error.message()});
 }
 
+// Removes what is in the directory. False when something stays.
+bool removeAllIn(const std::filesystem::path& directory) {
+  std::error_code error;
+  for (std::filesystem::directory_iterator it(directory, error), end; !error && it != end;
+       it.increment(error)) {
+    std::filesystem::remove_all(it->path(), error);
+    if (error) return false;
+  }
+  return !error;
+}
+
 }  // namespace
 
-OpenedImage DeviceImage::create(const std::string& path) {
+OpenedImage DeviceImage::create(const std::string& path, const Completion& complete) {
   std::error_code error;
-  if (::mkdir(path.c_str(), S_IRWXU) != 0) {
+  const bool isNew = ::mkdir(path.c_str(), S_IRWXU) == 0;
+  if (!isNew) {
     const int code = errno;
     if (code != EEXIST)
       return {nullptr, "cannot make the directory \"" + path +
@@ -118,14 +130,23 @@ OpenedImage DeviceImage::create(const std::string& path) {
   const std::filesystem::path canonical = std::filesystem::canonical(path, error);
   Descriptor root(
       error ? -1 : ::open(canonical.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
-  if (!root.isOpen() || ::fchmod(root.number(), S_IRWXU) != 0)
+  struct stat before {};
+  if (!root.isOpen() || ::fstat(root.number(), &before) != 0 ||
+      ::fchmod(root.number(), S_IRWXU) != 0)
     return {nullptr,
             "cannot use the directory \"" + path + "\": " +
                 (error ? error : std::error_code(errno, std::generic_category())).message()};
   std::shared_ptr<const DeviceImage> image(new DeviceImage(canonical.string(), root.release()));
-  const platform::Status populated = image->_populate();
-  if (!populated.isSuccess()) return {nullptr, populated.error->description};
-  return {std::move(image), {}};
+  platform::Status status = image->_populate();
+  if (status.isSuccess() && complete) status = complete(*image);
+  if (status.isSuccess()) return {std::move(image), {}};
+  const bool isRemoved = removeAllIn(canonical) && (!isNew || ::rmdir(canonical.c_str()) == 0);
+  if (!isNew) ::chmod(canonical.c_str(), before.st_mode & 07777U);
+  return {nullptr,
+          status.error->description +
+              (isRemoved ? "; nothing is left of the image" : "; remove \"" + path + "\"") +
+              ", make room for it and try again",
+          true};
 }
 
 platform::Status DeviceImage::_populate() const {

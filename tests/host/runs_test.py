@@ -64,6 +64,23 @@ class Output(hosttest.HostTestCase):
         self.assertEqual(run.report["log"], path.read_text().splitlines())
         self.assertEqual(0o600, path.stat().st_mode & 0o7777)
 
+    def test_a_log_file_that_is_there_is_emptied_and_made_private(self):
+        path = self.directory / "run.log"
+        path.write_text("what was there before is longer than what comes\n" * 10)
+        path.chmod(0o644)
+        run = self.run_host("--bundle", GOOD, "--quiet", "--json", "--log", path)
+        self.assertEqual(run.report["log"], path.read_text().splitlines())
+        self.assertEqual(0o600, path.stat().st_mode & 0o7777)
+
+    def test_a_log_file_that_cannot_be_written_to_its_end_is_a_failure(self):
+        mode = os.stat("/dev/full").st_mode
+        run = self.run_host("--bundle", GOOD, "--quiet", "--json", "--log", "/dev/full")
+        self.assertEqual((1, "failed", True),
+                         (run.code, run.report["outcome"], run.report["balanced"]))
+        self.assertIn("could not be written to its end", run.report["reasons"][0])
+        self.assertIn("could not be written to its end", run.errors)
+        self.assertEqual(mode, os.stat("/dev/full").st_mode)
+
     def test_the_images_system_log_gets_the_lines(self):
         self.run_host("--bundle", GOOD)
         lines = (self.image / "var/log/system.log").read_text().splitlines()

@@ -1,5 +1,3 @@
-#include <fmt/format.h>
-
 #include <memory>
 
 #include "deviceimage/SyncAgent.h"
@@ -14,23 +12,24 @@ struct Options {
   std::string syncAccountName;
 };
 
-void setSyncAccountName(const deviceimage::DeviceImage& image, const std::string& name) {
-  const std::string file =
-      *deviceimage::DeviceImage::preferencesFile(deviceimage::SyncAgent::kApplication);
-  const platform::Status written = image.writePropertyList(
-      file, propertylist::Dictionary{{deviceimage::SyncAgent::kAccountNameKey, name}});
-  if (!written.isSuccess())
-    throw CommandFailure(ExitCode::unexpectedFailure,
-                         fmt::format("cannot write {}: {}; remove the image and make it anew",
-                                     image.absolutePath(file), written.error->description));
+platform::Status setSyncAccountName(const deviceimage::DeviceImage& image,
+                                    const std::string& name) {
+  if (name.empty()) return platform::Status::success();
+  return image.writePropertyList(
+      *deviceimage::DeviceImage::preferencesFile(deviceimage::SyncAgent::kApplication),
+      propertylist::Dictionary{{deviceimage::SyncAgent::kAccountNameKey, name}});
 }
 
 ExitCode run(const Options& options) {
   if (!isText(options.syncAccountName))
     throw CommandFailure(ExitCode::wrongUsage, "the account name is not UTF-8 text");
-  const deviceimage::OpenedImage made = deviceimage::DeviceImage::create(options.directory);
-  if (!made.image) throw CommandFailure(ExitCode::refused, made.error);
-  if (!options.syncAccountName.empty()) setSyncAccountName(*made.image, options.syncAccountName);
+  const deviceimage::OpenedImage made = deviceimage::DeviceImage::create(
+      options.directory, [&options](const deviceimage::DeviceImage& image) {
+        return setSyncAccountName(image, options.syncAccountName);
+      });
+  if (!made.image)
+    throw CommandFailure(made.hadBegun ? ExitCode::unexpectedFailure : ExitCode::refused,
+                         made.error);
   return ExitCode::done;
 }
 

@@ -18,7 +18,8 @@ class Terminal : public host::RunListener {
   Terminal(const Terminal&) = delete;
   Terminal& operator=(const Terminal&) = delete;
 
-  // Opens the log file anew, readable by its owner only. Empty on success, else why not.
+  // Opens the log file and empties it, readable by its owner only from then on. Empty on success,
+  // else why not; a file that is there has then kept its content.
   std::string openLogFile(const std::string& path);
   // Closes it. Empty when everything was written, else why not.
   std::string closeLogFile();

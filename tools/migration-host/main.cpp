@@ -43,7 +43,12 @@ int run(const CommandLine& command) {
   }
   terminal.stageEnded();
   const std::string logProblem = terminal.closeLogFile();
-  if (!logProblem.empty()) std::fprintf(stderr, "migration-host: %s\n", logProblem.c_str());
+  if (!logProblem.empty()) {
+    std::fprintf(stderr, "migration-host: %s\n", logProblem.c_str());
+    report.reasons.push_back(logProblem);
+    if (report.outcome == host::RunOutcome::done || report.outcome == host::RunOutcome::leftBehind)
+      report.outcome = host::RunOutcome::failed;
+  }
   const bool colours = isatty(STDOUT_FILENO) != 0;
   if (!print(command.json ? jsonReport(report) : textReport(report, colours)) &&
       report.outcome == host::RunOutcome::done)

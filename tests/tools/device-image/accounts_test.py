@@ -3,6 +3,7 @@
 import datetime
 import fcntl
 import plistlib
+import resource
 import stat
 import unittest
 
@@ -24,6 +25,28 @@ class Create(ImageTest):
     def test_refuses_what_is_there_already(self):
         self.assertIn("is there already", self.fail_with(7, "create", self.image))
         self.assertIn("is there already", self.fail_with(7, "create", self.file("plain", "x")))
+
+
+    def test_leaves_nothing_behind_when_it_cannot_write_to_the_end(self):
+        empty = self.directory / "empty"
+        empty.mkdir(mode=0o755)
+        empty.chmod(0o755)
+        cases = [
+            ("the first file", 20, [], "etc/passwd"),
+            ("the last file", 300, ["--sync-account-name", "a" * 500], "com.vantor.OTASyncAgent.plist"),
+        ]
+        for name, limit, options, file in cases:
+            for directory in (self.directory / "new", empty):
+                with self.subTest(name, directory=directory.name):
+                    ended = run("create", directory, *options, restore_signals=False,
+                                preexec_fn=lambda: resource.setrlimit(resource.RLIMIT_FSIZE, (limit, limit)))
+                    self.assertEqual(ended.returncode, 1, ended.stderr)
+                    self.assertIn(file, ended.stderr.decode())
+                    self.assertIn("nothing is left of the image, make room for it and try again",
+                                  ended.stderr.decode())
+                    self.assertFalse((self.directory / "new").exists())
+                    self.assertEqual(list(empty.iterdir()), [])
+                    self.assertEqual(stat.S_IMODE(empty.stat().st_mode), 0o755)
 
 
 class AddAccount(ImageTest):
