@@ -12,6 +12,7 @@
 #include "host/AccountComparison.h"
 #include "host/ProcessTree.h"
 #include "host/RecordAccounting.h"
+#include "host/SettingsFileCheck.h"
 #include "host/StaleFiles.h"
 #include "host/StartChecks.h"
 
@@ -206,9 +207,7 @@ void MigrationHost::_compare(const Observation& before, const Observation& after
                              const Selection& selection, const deviceimage::SyncAgent& agent) {
   std::vector<std::string> contradictions;
   if (!after.error.empty()) contradictions.push_back(after.error);
-  if (!after.settings.error.empty())
-    contradictions.push_back(_image->settingsFile() +
-                             " cannot be read any more: " + after.settings.error + ".");
+  append(contradictions, checkSettingsFile(*_image, before.settings, after.settings));
   AccountComparison accounts = compareAccounts(before.settings.accounts, after.settings.accounts,
                                                selection, rightsOf(_bundles));
   _report.accounts = std::move(accounts.accounts);

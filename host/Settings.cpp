@@ -1,8 +1,12 @@
 #include "host/Settings.h"
 
+#include <fcntl.h>
+
 #include <algorithm>
 #include <cmath>
 #include <limits>
+
+#include "deviceimage/Descriptor.h"
 
 namespace host {
 namespace {
@@ -43,11 +47,16 @@ Settings readSettings(const deviceimage::DeviceImage& image) {
   Settings settings;
   const auto read = image.readPropertyList(deviceimage::DeviceImage::kSettingsFile);
   settings.exists = read.exists;
+  const deviceimage::Descriptor file(
+      image.openFile(deviceimage::DeviceImage::kSettingsFile, O_RDONLY).descriptor);
+  if (file.isOpen() && fstat(file.number(), &settings.file) != 0) settings.file = {};
   const Dictionary* root = read.value ? read.value->asDictionary() : nullptr;
   if (root == nullptr) {
     if (read.exists) settings.error = read.value ? "it holds no dictionary" : read.error;
     return settings;
   }
+  const Value* version = root->find("Version");
+  if (version != nullptr) settings.version = version->asInteger();
   const propertylist::Array* accounts = propertylist::findArray(*root, "Accounts");
   if (accounts == nullptr) return settings;
   for (const Value& entry : *accounts) {

@@ -1,5 +1,7 @@
 #pragma once
 
+#include <sys/stat.h>
+
 #include <cstdint>
 #include <optional>
 #include <string>
@@ -18,6 +20,8 @@ struct Settings {
   std::string error;  // why an existing file cannot be read as a dictionary; empty when it can
   std::vector<propertylist::Dictionary> accounts;  // in file order
   std::size_t strangeEntries = 0;                  // entries of "Accounts" that are no dictionary
+  std::optional<std::int64_t> version;             // the integer under "Version"
+  struct stat file = {};                           // of an existing regular file
 };
 Settings readSettings(const deviceimage::DeviceImage& image);
 

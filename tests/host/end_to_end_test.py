@@ -105,8 +105,7 @@ class WholeRun(hosttest.HostTestCase):
         self.assertEqual({"Version": 12, "Accounts": OTHERS}, self.settings())
         status = path.stat()
         self.assertEqual(0o100600, status.st_mode)
-        numbers = (self.image / "etc/passwd").read_text().split("mobile:", 1)[1].split(":")
-        self.assertEqual((int(numbers[1]), int(numbers[2])), (status.st_uid, status.st_gid))
+        self.assertEqual(self.mobile(), (status.st_uid, status.st_gid))
         self.assertEqual([], os.listdir(self.image / "tmp"))
 
     def test_settings_in_the_xml_form_come_out_binary(self):

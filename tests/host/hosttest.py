@@ -120,6 +120,12 @@ class HostTestCase(unittest.TestCase):
 
     def write_settings(self, *accounts):
         self.write_plist(SETTINGS, {"Version": 12, "Accounts": list(accounts)})
+        os.chown(self.image / SETTINGS, *self.mobile())
+
+    def mobile(self):
+        """The numbers of the image's own "mobile", as user and group."""
+        fields = (self.image / "etc/passwd").read_text().split("mobile:", 1)[1].split(":")
+        return int(fields[1]), int(fields[2])
 
     def settings(self):
         return plistlib.loads((self.image / SETTINGS).read_bytes())

@@ -239,6 +239,32 @@ class Verification(hosttest.HostTestCase):
     def test_accounts_in_another_order_fail_the_verification(self):
         self.assertEqual(5, self.run_change("reverse").code)
 
+    def check_written_settings(self, change, words):
+        run = self.run_change(change)
+        self.assertEqual((5, False), (run.code, run.report["balanced"]))
+        self.assertTrue(any(words in reason for reason in run.report["reasons"]),
+                        run.report["reasons"])
+
+    def test_settings_that_are_written_as_they_must_be_pass(self):
+        run = self.run_change("touch")
+        self.assertEqual((3, True), (run.code, run.report["balanced"]))
+
+    def test_settings_that_are_written_with_an_old_version_fail_the_verification(self):
+        self.check_written_settings("version", "was written without the version 12")
+
+    def test_settings_that_others_may_read_afterwards_fail_the_verification(self):
+        self.check_written_settings("mode", "not readable and writable by its owner alone")
+
+    @hosttest.skip_unless_root
+    def test_settings_that_have_lost_their_owner_fail_the_verification(self):
+        self.check_written_settings("owner", 'does not belong to "mobile"')
+
+    def test_old_settings_that_are_not_written_pass(self):
+        self.write_plist(hosttest.SETTINGS, {"Version": 3, "Accounts": list(self.ACCOUNTS)})
+        (self.image / hosttest.SETTINGS).chmod(0o640)
+        run = self.run_bundle("LogsAndSucceeds")
+        self.assertEqual((3, True), (run.code, run.report["balanced"]))
+
     def test_destroyed_settings_fail_the_verification(self):
         self.assertEqual(5, self.run_change("destroy").code)
 

@@ -1,7 +1,19 @@
-// Does to the settings file what the process default "TestChange" says: "retire" takes the accounts
-// that are to be retired out and nothing else, "drop" takes all of them out, "change" renames those
-// that are to stay, "reverse" turns their order round, "add" puts one more behind them, "destroy"
-// writes what is no property list, and "remove" removes the file.
+// Does to the settings file what the process default "TestChange" says:
+//
+//   retire   takes the accounts that are to be retired out and nothing else
+//   drop     takes all accounts out
+//   change   renames those that are to stay
+//   reverse  turns their order round
+//   add      puts one more behind them
+//   touch    writes the file as it is
+//   version  writes an old version
+//   mode     writes the file so that everybody may read it
+//   owner    gives the file to root
+//   destroy  writes what is no property list
+//   remove   removes the file
+#include <sys/stat.h>
+#include <unistd.h>
+
 #include <cstdio>
 #include <fstream>
 #include <string>
@@ -43,16 +55,20 @@ bool migrate() {
   const platform::Services& services = platform::services();
   const std::string path = services.deviceInfo.systemRootDirectory() +
                            "/var/mobile/Library/Preferences/com.vantor.accountsettings.plist";
-  const auto change = services.preferences.readDefault("TestChange");
+  const auto value = services.preferences.readDefault("TestChange");
   const auto settings = services.fileServices.readPropertyListFile(path);
-  if (!change || !settings.value) return false;
-  if (*change->asString() == "remove") return std::remove(path.c_str()) == 0;
+  if (!value || !settings.value) return false;
+  const std::string change = *value->asString();
+  if (change == "remove") return std::remove(path.c_str()) == 0;
   Dictionary root = *settings.value->asDictionary();
-  root.set("Accounts", changed(*propertylist::findArray(root, "Accounts"), *change->asString()));
+  root.set("Accounts", changed(*propertylist::findArray(root, "Accounts"), change));
+  if (change == "version") root.set("Version", 11);
   propertylist::Bytes bytes = *propertylist::writeBinaryPropertyList(root);
-  if (*change->asString() == "destroy") bytes.resize(bytes.size() / 2);
+  if (change == "destroy") bytes.resize(bytes.size() / 2);
   std::ofstream file(path, std::ios::binary | std::ios::trunc);
   file.write(reinterpret_cast<const char*>(bytes.data()),
              static_cast<std::streamsize>(bytes.size()));
+  if (change == "mode" && chmod(path.c_str(), 0644) != 0) return false;
+  if (change == "owner" && chown(path.c_str(), 0, 0) != 0) return false;
   return file.good();
 }
