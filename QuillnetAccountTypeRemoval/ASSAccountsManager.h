@@ -17,6 +17,7 @@
 #include "QuillnetAccountTypeRemoval/ASSRuntimeFixMailAccount.h"
 #include "QuillnetAccountTypeRemoval/AccountChanges.h"
 #include "QuillnetAccountTypeRemoval/StringLists.h"
+#include "platform/ExclusiveFileLock.h"
 #include "propertylist/Value.h"
 
 namespace accountsettings {
@@ -150,6 +151,45 @@ class ASSAccountsManager {
   static std::optional<std::string> displayNameForGroupOfAccountTypeForBeginningOfSentence(
       std::string_view type, bool beginningOfSentence);
 
+  // --- Migration support: keeping other processes out, and what older systems left behind ---
+  //
+  // Class operations for clients that migrate, back up or restore account data. The store itself
+  // calls none of them. They work on the calling thread and may take long.
+
+  // Waits, however long, until this process holds the system's migration lock; null when the lock
+  // cannot be made. The holder gives it back through releaseMigrationLock; the system frees it when
+  // the process ends. The file behind it, kAccountMigrationLockFilename, is never removed.
+  static platform::HeldFileLockPtr createAndLockMigrationLock();
+  static void releaseMigrationLock(const platform::HeldFileLockPtr& lock);
+  // Returns when nobody holds the migration lock; holds nothing afterwards.
+  static void waitForMigrationToFinish();
+  // Has the data-access daemon leave: asks it, waits for five seconds, kills it, waits for five
+  // more, and goes on in any case; the log tells how far it came. The calling thread's run loop
+  // runs meanwhile. Does nothing, and says nothing, when the daemon does not run or is the caller.
+  // The daemon is gone as soon as its name leads to another process; whoever has the name when the
+  // time is up gets the signal.
+  static void killDataAccessIfNecessary();
+
+  // Whether accounts of an older system lie in its mail accounts file (data-access preferences).
+  static bool _oldMailAccountsInformationFound();
+  static bool _oldDAAccountsInformationFound();
+  // Whether the settings file's version is older than currentVersion. A file that is missing, is
+  // unreadable or has no version is none to migrate; versions compare as unsigned numbers, so a
+  // negative one is newer than any.
+  static bool accountSettingsNeedsToBeMigrated();
+  // What there is to migrate, written to all three flags. With legacy files the settings file's
+  // version is not looked at, since the file will be built anew. No flag may be null
+  // (InternalConsistencyFailure). The log line's third number is the low half of the third flag's
+  // address; readers of old logs expect it there.
+  static void shouldMigrateOldMailAccountsOldDAAccountsNewAccountSettings(
+      bool* migrateOldMailAccounts, bool* migrateOldDAAccounts, bool* migrateNewAccounts);
+  // Removes the settings file, so that it is built from the legacy files. A failure is logged.
+  static void removeNewAccountSettingsToMigrateOldAccountInformation();
+  // Runs the device's accounts data migrator, under the migration lock, when there is something to
+  // migrate: once per process, whatever comes of it. Without that migrator's bundle nothing is
+  // said, and a removed settings file stays removed. The legacy files are not touched.
+  static void _migrateAccountsIfNeeded();
+
  protected:
   // Change records by the name of the notifier class that is to hear of them.
   using NotificationTable = std::map<std::string, propertylist::Array>;
@@ -194,6 +234,7 @@ class ASSAccountsManager {
   using AccountsByID = std::map<std::string, AccountPtr, std::less<>>;
 
   static std::atomic<bool> shouldSkipNotifications;
+  static std::atomic<bool> migrationAttempted;
 
   void _loadAccount(const propertylist::Value& info, bool& fixedAny);
   void _register(const AccountPtr& account);
@@ -223,5 +264,9 @@ class ASSAccountsManager {
 
 // The path of the settings file, for callers outside the store.
 std::string accountSettingsAccountsPath();
+
+// Where older systems kept mail accounts and data-access accounts, below the user's home directory.
+std::string mailAccountsPath();
+std::string daAccountPath();
 
 }  // namespace accountsettings

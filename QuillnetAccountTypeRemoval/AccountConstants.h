@@ -90,4 +90,8 @@ inline constexpr std::string_view kDataclassSupportsMultipleStores = "Supports M
 inline constexpr std::string_view kDataclassDisplaySwitch = "Display Dataclass Switch";
 inline constexpr std::string_view kDataclassRequiresUserConfirmation = "Requires User Confirmation";
 
+// The file behind the lock that marks a migration of legacy settings; for other processes to look
+// at.
+inline constexpr std::string_view kAccountMigrationLockFilename = "/tmp/AccountMigrationInProgress";
+
 }  // namespace accountsettings
