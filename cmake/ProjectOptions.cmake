@@ -36,6 +36,7 @@ endif()
 set(CMAKE_RUNTIME_OUTPUT_DIRECTORY ${PROJECT_BINARY_DIR}/bin)
 set(CMAKE_LIBRARY_OUTPUT_DIRECTORY ${PROJECT_BINARY_DIR}/lib)
 set(PROJECT_MIGRATORS_DIRECTORY ${PROJECT_BINARY_DIR}/lib/account-retirement/migrators)
+set(PROJECT_SERVICES_DIRECTORY ${PROJECT_BINARY_DIR}/lib/account-retirement/services)
 set(CMAKE_INSTALL_RPATH $ORIGIN $ORIGIN/../${CMAKE_INSTALL_LIBDIR} $ORIGIN/../../..)
 
 # project_test(<name> <source>... LIBRARIES <target>...) builds one GoogleTest program. CTest runs each

@@ -85,6 +85,7 @@ class DeviceImage {
   static constexpr std::string_view kSettingsFile =
       "var/mobile/Library/Preferences/com.vantor.accountsettings.plist";
   static constexpr std::string_view kMigratorsDirectory = "System/Library/DataClassMigrators";
+  static constexpr std::string_view kAccountServicesDirectory = "System/Library/AccountServices";
   static constexpr std::string_view kTemporaryDirectory = "tmp";
   static constexpr std::string_view kUsersFile = "etc/passwd";
   static constexpr std::string_view kGroupsFile = "etc/group";
@@ -97,6 +98,8 @@ class DeviceImage {
   static constexpr std::string_view kSystemLogFile = "var/log/system.log";
   static constexpr std::string_view kNotificationsFile = "var/log/notifications.jsonl";
   static constexpr std::string_view kPreferenceChangesFile = "var/log/preference-changes.jsonl";
+  static constexpr std::string_view kAccountChangesFile = "var/log/account-changes.jsonl";
+  static constexpr std::string_view kRefreshesFile = "var/log/refreshes.jsonl";
   static constexpr std::string_view kLockFile = "var/run/image.lock";
   // The SQLite database of the type's records.
   static std::string_view databaseFile(platform::SyncDataType type);

@@ -168,8 +168,8 @@ platform::Status DeviceImage::_populate() const {
       {kSettingsFile, {{"Version", kSettingsVersion}, {"Accounts", propertylist::Array()}}}};
   for (const auto& [name, content] : kLists)
     if (status.isSuccess()) status = writePropertyList(name, content);
-  for (const std::string_view name :
-       {kSystemLogFile, kNotificationsFile, kPreferenceChangesFile, kLockFile})
+  for (const std::string_view name : {kSystemLogFile, kNotificationsFile, kPreferenceChangesFile,
+                                      kAccountChangesFile, kRefreshesFile, kLockFile})
     if (status.isSuccess()) status = createFile(name, {});
   return status;
 }
@@ -192,6 +192,8 @@ std::vector<ImageProblem> DeviceImage::checkFiles() const {
     problems.push_back({std::string(kGroupsFile), "has no line for the group \"mobile\"; add one"});
   for (const std::string_view directory : {kHomeDirectory, kLogDirectory, kTemporaryDirectory})
     checkPrivacy(*this, std::string(directory), problems);
+  if (exists(kAccountServicesDirectory))  // an image may be without services
+    checkPrivacy(*this, std::string(kAccountServicesDirectory), problems);
   for (const std::string_view name :
        {kSettingsFile, kDevicePropertiesFile, kProcessDefaultsFile, kRestrictionsFile}) {
     const propertylist::FileReadResult read = readPropertyList(name);

@@ -39,7 +39,7 @@ std::size_t sequenceLength(std::string_view text) {
   return isTooLong || isNoCharacter ? 0 : length;
 }
 
-void appendJSONText(std::string& line, std::string_view text) {
+void appendJSON(std::string& line, std::string_view text) {
   line += '"';
   while (!text.empty()) {
     const std::size_t length = sequenceLength(text);
@@ -56,6 +56,19 @@ void appendJSONText(std::string& line, std::string_view text) {
     text.remove_prefix(length == 0 ? 1 : length);
   }
   line += '"';
+}
+
+void appendJSON(std::string& line, bool boolean) { line += boolean ? "true" : "false"; }
+void appendJSON(std::string& line, std::int64_t number) { line += std::to_string(number); }
+void appendJSON(std::string& line, const std::vector<std::string>& texts) {
+  std::string_view separator = "[";
+  for (const std::string& text : texts) {
+    line += separator;
+    appendJSON(line, std::string_view(text));
+    separator = ", ";
+  }
+  if (texts.empty()) line += '[';
+  line += ']';
 }
 
 }  // namespace
@@ -111,13 +124,13 @@ std::string oneLine(std::string_view text) {
   return line;
 }
 
-std::string jsonLine(const std::vector<std::pair<std::string_view, std::string_view>>& members) {
+std::string jsonLine(const JSONMembers& members) {
   std::string line = "{";
-  for (const auto& [name, text] : members) {
+  for (const auto& [name, value] : members) {
     if (line.size() > 1) line += ", ";
-    appendJSONText(line, name);
+    appendJSON(line, name);
     line += ": ";
-    appendJSONText(line, text);
+    std::visit([&line](const auto& content) { appendJSON(line, content); }, value);
   }
   return line + "}";
 }

@@ -1,10 +1,12 @@
 #pragma once
 
+#include <cstdint>
 #include <memory>
 #include <mutex>
 #include <string>
 #include <string_view>
 #include <utility>
+#include <variant>
 #include <vector>
 
 #include "deviceimage/Descriptor.h"
@@ -37,7 +39,10 @@ std::string timestamp();
 // their like, in bytes; so are those of the second control block, which some terminals obey.
 std::string oneLine(std::string_view text);
 
-// One JSON object with these texts. Bytes that are not UTF-8 become U+FFFD.
-std::string jsonLine(const std::vector<std::pair<std::string_view, std::string_view>>& members);
+// The members of a JSON object, in order. Texts are views; bytes of them that are not UTF-8 become
+// U+FFFD.
+using JSONValue = std::variant<std::string_view, bool, std::int64_t, std::vector<std::string>>;
+using JSONMembers = std::vector<std::pair<std::string_view, JSONValue>>;
+std::string jsonLine(const JSONMembers& members);
 
 }  // namespace deviceimage

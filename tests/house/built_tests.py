@@ -11,7 +11,7 @@ from pathlib import Path
 from report import finish
 
 FLOORS = ["propertylist", "platform", "QuillnetAccountTypeRemoval", "localdata", "migrator",
-          "deviceimage", "host", "tools"]
+          "deviceimage", "accountservices", "host", "tools"]
 
 
 def check(tree: Path, build: Path) -> tuple[list[str], int]:

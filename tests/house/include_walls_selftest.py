@@ -27,6 +27,8 @@ class IncludeWalls(unittest.TestCase):
             ("migrator/a.cpp", '#include "localdata/a.h"'),
             ("deviceimage/a.cpp", "#include <sqlite3.h>"),
             ("host/a.cpp", '#include "deviceimage/a.h"'),
+            ("accountservices/a.cpp", '#include "deviceimage/Journal.h"'),
+            ("accountservices/a.cpp", '#include "QuillnetAccountTypeRemoval/AccountChanges.h"'),
             ("tools/a.cpp", "#include <CLI/CLI.hpp>"),
         ):
             with self.subTest(file=file, line=line):
@@ -47,6 +49,9 @@ class IncludeWalls(unittest.TestCase):
             ("migrator/a.cpp", '#include "host/a.h"'),
             ("deviceimage/a.cpp", '#include "host/a.h"'),
             ("deviceimage/a.cpp", '#include "QuillnetAccountTypeRemoval/a.h"'),
+            ("accountservices/a.cpp", '#include "deviceimage/RecordStores.h"'),
+            ("accountservices/a.cpp", '#include "QuillnetAccountTypeRemoval/ASSAccountsManager.h"'),
+            ("host/a.cpp", '#include "accountservices/a.h"'),
             ("host/a.cpp", '#include "migrator/a.h"'),
             ("host/a.cpp", '  #  include "localdata/a.h"  // wanted'),
             ("tools/a.cpp", '#include "tests/a.h"'),

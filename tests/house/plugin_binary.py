@@ -1,8 +1,10 @@
-"""What the built plug-in needs and what it shows.   usage: plugin_binary.py SHARED_OBJECT [--sanitized]
+"""What a built bundle needs and what it shows.
+usage: plugin_binary.py SHARED_OBJECT [--sanitized] [--account-classes]
 
 It may need the C and the C++ run time and the two libraries it shares with its host, nothing else; and
 since it is loaded into somebody else's process, none of its own symbols may be seen there.
---sanitized allows the sanitizers' own run time.
+--sanitized allows the sanitizers' own run time, --account-classes what describes the interfaces of
+account creators and notifiers.
 """
 
 import re
@@ -24,6 +26,10 @@ SHARED_WEAK = re.compile(
     r"([^()]* )?((std|__gnu_cxx|platform|propertylist)::|operator (new|delete))"
 )
 
+ACCOUNT_CLASSES = re.compile(
+    r"(vtable|typeinfo|typeinfo name) for accountsettings::\w+(Class|Creator|Notifier|Protocol)$"
+)
+
 
 def lines_of(*command: str) -> list[str]:
     return subprocess.run(command, check=True, capture_output=True, text=True).stdout.splitlines()
@@ -41,7 +47,7 @@ def exported(binary: Path) -> list[tuple[str, str]]:
     return [(row[1], row[2]) for row in rows if len(row) == 3]
 
 
-def check(binary: Path, sanitized: bool) -> tuple[list[str], int]:
+def check(binary: Path, sanitized: bool, account_classes: bool = False) -> tuple[list[str], int]:
     """The problems, and the number of libraries and symbols that were looked at."""
     problems = []
     libraries = needed(binary)
@@ -50,7 +56,8 @@ def check(binary: Path, sanitized: bool) -> tuple[list[str], int]:
             problems.append(f"{binary}: needs {name}")
     symbols = exported(binary)
     for kind, name in symbols:
-        weak = kind in "VWu" and SHARED_WEAK.match(name)
+        shared = SHARED_WEAK.match(name) or account_classes and ACCOUNT_CLASSES.match(name)
+        weak = kind in "VWu" and shared
         from_compiler = sanitized and re.match(r"_*(asan|ubsan|tsan|odr)_", name)
         if not weak and not from_compiler:
             problems.append(f"{binary}: shows the symbol {name} ({kind})")
@@ -58,4 +65,6 @@ def check(binary: Path, sanitized: bool) -> tuple[list[str], int]:
 
 
 if __name__ == "__main__":
-    finish(*check(Path(sys.argv[1]), "--sanitized" in sys.argv[2:]), "libraries and symbols")
+    options = sys.argv[2:]
+    finish(*check(Path(sys.argv[1]), "--sanitized" in options, "--account-classes" in options),
+           "libraries and symbols")

@@ -39,8 +39,8 @@ class Resources(unittest.TestCase):
         self.assertIn("LDAQ: unknown", said)
 
     def test_a_type_without_creators_list_is_found(self):
-        said = self.replaced("AccountCreators.plist", "  <key>SMTP</key>\n  <array/>\n", "")
-        self.assertIn("SMTP: missing", said)
+        said = self.replaced("AccountCreators.plist", "  <key>Quillnet</key>\n  <array/>\n", "")
+        self.assertIn("Quillnet: missing", said)
 
     def test_a_type_that_stands_twice_is_found(self):
         said = self.replaced("AccountCreators.plist", "<key>SMTP</key>", "<key>Mail</key>")

@@ -20,4 +20,6 @@ std::string installedAccountResources() {
   return installedFolder("migrators/QuillnetAccountRemoval.migrator");
 }
 
+std::string installedAccountServices() { return installedFolder("services"); }
+
 }  // namespace tools

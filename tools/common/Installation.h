@@ -10,5 +10,7 @@ namespace tools {
 std::string installedMigrators();
 // The folder with the resources of the account settings library: the installed plug-in's bundle.
 std::string installedAccountResources();
+// The folder of the account services' bundles.
+std::string installedAccountServices();
 
 }  // namespace tools

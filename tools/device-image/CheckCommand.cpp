@@ -7,6 +7,7 @@
 #include "deviceimage/RecordStores.h"
 #include "tools/common/Images.h"
 #include "tools/common/Program.h"
+#include "tools/device-image/AccountServices.h"
 #include "tools/device-image/AccountTypes.h"
 #include "tools/device-image/Commands.h"
 #include "tools/device-image/Settings.h"
@@ -65,8 +66,9 @@ void checkLeftovers(const DeviceImage& image, std::vector<ImageProblem>& found) 
                        "is no preferences file; remove it"});
 }
 
-std::vector<ImageProblem> findingsOf(const ImagePtr& image) {
+std::vector<ImageProblem> findingsOf(const ImagePtr& image, const ServicesCheck& services) {
   std::vector<ImageProblem> found = image->checkFiles();
+  found.insert(found.end(), services.missing.begin(), services.missing.end());
   checkAccounts(*image, found);
   checkLeftovers(*image, found);
   RecordStores records(image, RecordStores::Access::readOnly);
@@ -75,20 +77,29 @@ std::vector<ImageProblem> findingsOf(const ImagePtr& image) {
   return found;
 }
 
+ordered_json jsonOf(const std::vector<ImageProblem>& problems) {
+  ordered_json json = ordered_json::array();
+  for (const ImageProblem& problem : problems)
+    json.push_back({{"path", problem.path}, {"text", problem.text}});
+  return json;
+}
+
 ExitCode run(const Options& options) {
   const ImagePtr image = openImage(options.directory);
-  const std::vector<ImageProblem> found = findingsOf(image);
+  const ServicesCheck services = checkServices(*image);
+  const std::vector<ImageProblem> found = findingsOf(image, services);
   if (options.json) {
     ordered_json json;
     json["image"] = image->rootPath();
     json["sound"] = found.empty();
-    json["findings"] = ordered_json::array();
-    for (const ImageProblem& problem : found)
-      json["findings"].push_back({{"path", problem.path}, {"text", problem.text}});
+    json["findings"] = jsonOf(found);
+    json["warnings"] = jsonOf(services.warnings);
     fmt::print("{}\n", json.dump(2, ' ', false, ordered_json::error_handler_t::replace));
   } else {
     for (const ImageProblem& problem : found)
       printMessage(fmt::format("{}: {}", image->absolutePath(problem.path), problem.text));
+    for (const ImageProblem& warning : services.warnings)
+      printMessage(fmt::format("{}: warning: {}", image->absolutePath(warning.path), warning.text));
     if (found.empty()) fmt::print("{}: sound\n", image->rootPath());
   }
   return found.empty() ? ExitCode::done : ExitCode::imageDamaged;
@@ -103,8 +114,11 @@ void addCheckCommand(CLI::App& app, ExitCode& outcome) {
   command->add_option("DIR", options->directory, "The image")->required();
   command->add_flag("--json", options->json, "For programs");
   command->footer(
-      "Looks at the databases (integrity, references, contents), the settings, the modes of files\n"
-      "and what stopped programs left behind. Changes nothing.\n\n"
+      "Looks at the databases (integrity, references, contents), the settings, the modes of "
+      "files,\n"
+      "the account services, and what stopped programs left behind. Changes nothing. A service "
+      "that\n"
+      "is not the installed one is a warning and no finding.\n\n"
       "Example:\n  device-image check my-device");
   command->callback([options, &outcome] { outcome = run(*options); });
 }

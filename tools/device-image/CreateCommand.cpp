@@ -1,6 +1,8 @@
 #include <memory>
+#include <vector>
 
 #include "deviceimage/SyncAgent.h"
+#include "tools/device-image/AccountServices.h"
 #include "tools/device-image/Commands.h"
 #include "tools/device-image/import/TextLines.h"
 
@@ -10,6 +12,7 @@ namespace {
 struct Options {
   std::string directory;
   std::string syncAccountName;
+  bool withoutServices = false;
 };
 
 platform::Status setSyncAccountName(const deviceimage::DeviceImage& image,
@@ -23,9 +26,12 @@ platform::Status setSyncAccountName(const deviceimage::DeviceImage& image,
 ExitCode run(const Options& options) {
   if (!isText(options.syncAccountName))
     throw CommandFailure(ExitCode::wrongUsage, "the account name is not UTF-8 text");
+  const std::vector<AccountService> services =
+      options.withoutServices ? std::vector<AccountService>() : installedServices();
   const deviceimage::OpenedImage made = deviceimage::DeviceImage::create(
-      options.directory, [&options](const deviceimage::DeviceImage& image) {
-        return setSyncAccountName(image, options.syncAccountName);
+      options.directory, [&](const deviceimage::DeviceImage& image) {
+        const platform::Status named = setSyncAccountName(image, options.syncAccountName);
+        return named.isSuccess() ? placeServices(image, services) : named;
       });
   if (!made.image)
     throw CommandFailure(made.hadBegun ? ExitCode::unexpectedFailure : ExitCode::refused,
@@ -42,6 +48,8 @@ void addCreateCommand(CLI::App& app, ExitCode& outcome) {
   command->add_option("--sync-account-name", options->syncAccountName,
                       "The account name that the Quillnet sync agent knows; the stores of Quillnet "
                       "accounts are named after it");
+  command->add_flag("--without-services", options->withoutServices,
+                    "Leave out the bundles of the account services");
   command->footer("Example:\n  device-image create my-device --sync-account-name ada");
   command->callback([options, &outcome] { outcome = run(*options); });
 }

@@ -1,10 +1,16 @@
 """device-image check, and what the other commands say of a damaged image."""
 
 import json
+import os
 import plistlib
+import shutil
+import subprocess
 import unittest
+from pathlib import Path
 
-from imagetest import SETTINGS, ImageTest, run
+from imagetest import SETTINGS, TOOL, ImageTest, run
+
+SERVICES = "System/Library/AccountServices"
 
 CARD = "BEGIN:VCARD\r\nVERSION:3.0\r\nUID:ada\r\nFN:Ada\r\nEND:VCARD\r\n"
 
@@ -14,7 +20,7 @@ class Check(ImageTest):
         """What check says, by path in the image; asked twice, since looking changes nothing."""
         ended = run("check", self.image, "--json")
         report = json.loads(ended.stdout)
-        self.assertEqual(set(report), {"image", "sound", "findings"})
+        self.assertEqual(set(report), {"image", "sound", "findings", "warnings"})
         self.assertEqual(report["sound"], not report["findings"])
         self.assertEqual(ended.returncode, 6 if report["findings"] else 0)
         self.assertEqual(run("check", self.image, "--json").stdout, ended.stdout)
@@ -33,6 +39,62 @@ class Check(ImageTest):
         self.import_text("contacts", "a.vcf", CARD, "--account", "Q1")
         self.retire_stores()
         self.assertEqual(self.findings(), {})
+
+    def warnings(self) -> dict:
+        report = json.loads(run("check", self.image, "--json").stdout)
+        return {warning["path"]: warning["text"] for warning in report["warnings"]}
+
+    def test_finds_a_missing_account_service(self):
+        (self.image / SERVICES / "MailService.so").unlink()
+        self.assertEqual(set(self.findings()), {f"{SERVICES}/MailService.so"})
+        self.assertEqual(self.warnings(), {})
+        self.assertIn(f"{SERVICES}/MailService.so: is missing, and accounts need this service; copy ",
+                      self.fail_with(6, "check", self.image))
+
+    def test_finds_an_account_service_that_others_can_change(self):
+        (self.image / SERVICES / "MailService.so").chmod(0o622)
+        self.assertEqual(set(self.findings()), {f"{SERVICES}/MailService.so"})
+
+    def test_warns_of_an_account_service_that_is_not_the_installed_one(self):
+        for content in (b"", b"other", (self.image / SERVICES / "MailService.so").read_bytes()[:-1]):
+            with self.subTest(len(content)):
+                (self.image / SERVICES / "MailService.so").write_bytes(content)
+                self.assertEqual(self.findings(), {})
+                self.assertEqual(set(self.warnings()), {f"{SERVICES}/MailService.so"})
+                ended = run("check", self.image)
+                self.assertEqual(ended.stdout.decode(), f"{self.image.resolve()}: sound\n")
+                self.assertIn(f"{SERVICES}/MailService.so: warning: is not the installed service",
+                              ended.stderr.decode())
+
+    def test_an_image_without_account_services_is_sound(self):
+        self.image = self.directory / "bare"
+        self.succeed("create", self.image, "--without-services")
+        self.assertFalse((self.image / SERVICES).exists())
+        self.assertEqual(self.findings(), {})
+        self.assertEqual(self.warnings(), {})
+
+    def test_a_new_image_has_private_copies_of_the_account_services(self):
+        files = sorted((self.image / SERVICES).iterdir())
+        self.assertEqual([path.name for path in files],
+                         ["CalendarService.so", "ContactsService.so", "MailService.so"])
+        installed = Path(os.environ["INSTALLED_SERVICES"])
+        for path in files:
+            self.assertEqual(path.stat().st_mode & 0o7777, 0o600)
+            self.assertEqual(path.read_bytes(), (installed / path.name).read_bytes())
+
+    def test_no_image_is_made_where_the_account_services_are_not_installed(self):
+        programs = self.directory / "bin"
+        programs.mkdir()
+        shutil.copy(TOOL, programs)
+        alone = [programs / "device-image", "create", self.directory / "new"]
+        environment = {"LD_LIBRARY_PATH": str(Path(TOOL).resolve().parents[1] / "lib")}
+        ended = subprocess.run(alone, capture_output=True, env=environment, timeout=60)
+        self.assertEqual(ended.returncode, 7, ended.stderr)
+        self.assertIn(b"AccountCreators.plist", ended.stderr)
+        self.assertFalse((self.directory / "new").exists())
+        ended = subprocess.run([*alone, "--without-services"], capture_output=True, env=environment,
+                               timeout=60)
+        self.assertEqual(ended.returncode, 0, ended.stderr)
 
     def test_finds_what_stopped_programs_left_behind(self):
         (self.image / "tmp/settings.abc").touch(0o600)

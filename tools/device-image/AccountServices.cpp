@@ -1,0 +1,132 @@
+#include "tools/device-image/AccountServices.h"
+
+#include <fcntl.h>
+#include <fmt/format.h>
+#include <unistd.h>
+
+#include <array>
+#include <cerrno>
+#include <cstdint>
+#include <optional>
+#include <set>
+#include <span>
+#include <string_view>
+
+#include "deviceimage/Descriptor.h"
+#include "propertylist/Reading.h"
+#include "tools/common/ExitCode.h"
+#include "tools/common/Files.h"
+#include "tools/common/Installation.h"
+
+namespace tools {
+namespace {
+
+using deviceimage::DeviceImage;
+using propertylist::Array;
+using propertylist::Dictionary;
+using propertylist::Value;
+
+constexpr std::size_t kLargestBundle = std::size_t{64} << 20U;
+
+// The file's name when the entry names a bundle of the services' directory, else empty.
+std::string_view serviceOf(const Value& entry) {
+  const Dictionary* const creator = entry.asDictionary();
+  const Dictionary* const description =
+      creator == nullptr ? nullptr : propertylist::findDictionary(*creator, "Description");
+  const std::string* const framework =
+      description == nullptr ? nullptr : propertylist::findString(*description, "Framework");
+  const std::string directory = std::string(DeviceImage::kAccountServicesDirectory) + "/";
+  if (framework == nullptr || !framework->starts_with(directory)) return {};
+  const std::string_view name = std::string_view(*framework).substr(directory.size());
+  return name.find('/') == std::string_view::npos ? name : std::string_view();
+}
+
+// The names that the installed catalogue knows.
+std::set<std::string> namedServices() {
+  const std::string file = installedAccountResources() + "/AccountCreators.plist";
+  const propertylist::FileReadResult read = propertylist::readPropertyListFile(file);
+  const Dictionary* const catalogue = read.value ? read.value->asDictionary() : nullptr;
+  if (catalogue == nullptr)
+    throw CommandFailure(
+        ExitCode::refused,
+        fmt::format(
+            "cannot read the catalogue of account creators {}: {}; install the programs anew", file,
+            read.value ? "it holds no dictionary" : read.error));
+  std::set<std::string> names;
+  for (const Dictionary::Entry& type : *catalogue) {
+    const Array* const entries = type.value().asArray();
+    if (entries == nullptr) continue;
+    for (const Value& entry : *entries)
+      if (const std::string_view name = serviceOf(entry); !name.empty()) names.emplace(name);
+  }
+  return names;
+}
+
+std::string imageFile(std::string_view name) {
+  return fmt::format("{}/{}", DeviceImage::kAccountServicesDirectory, name);
+}
+
+// Empty when the file cannot be read.
+std::optional<std::string> contentOf(const DeviceImage& image, const std::string& file) {
+  const deviceimage::OpenedFile opened = image.openFile(file, O_RDONLY);
+  if (!opened.status.isSuccess()) return std::nullopt;
+  const deviceimage::Descriptor descriptor(opened.descriptor);
+  std::string content;
+  std::array<char, 65536> chunk{};
+  while (content.size() <= kLargestBundle) {
+    const ssize_t count = ::read(descriptor.number(), chunk.data(), chunk.size());
+    if (count < 0 && errno == EINTR) continue;
+    if (count < 0) return std::nullopt;
+    if (count == 0) break;
+    content.append(chunk.data(), static_cast<std::size_t>(count));
+  }
+  return content;
+}
+
+}  // namespace
+
+std::vector<AccountService> installedServices() {
+  std::vector<AccountService> services;
+  for (const std::string& name : namedServices())
+    services.push_back(
+        {imageFile(name), readWholeFile(installedAccountServices() + "/" + name, kLargestBundle)});
+  return services;
+}
+
+platform::Status placeServices(const DeviceImage& image,
+                               const std::vector<AccountService>& services) {
+  platform::Status status = platform::Status::success();
+  for (const AccountService& service : services)
+    if (status.isSuccess())
+      status = image.createFile(
+          service.file,
+          {reinterpret_cast<const std::uint8_t*>(service.content.data()), service.content.size()});
+  return status;
+}
+
+ServicesCheck checkServices(const DeviceImage& image) {
+  ServicesCheck check;
+  const std::string directory(DeviceImage::kAccountServicesDirectory);
+  if (!image.exists(directory)) return check;  // an image without services
+  try {
+    for (const std::string& name : namedServices()) {
+      const std::string file = imageFile(name);
+      const std::string installed = installedAccountServices() + "/" + name;
+      if (image.lookAt(file).kind != deviceimage::FileLook::Kind::file)
+        check.missing.push_back(
+            {file, fmt::format("is missing, and accounts need this service; copy {} there, with "
+                               "mode 0600",
+                               installed)});
+      else if (contentOf(image, file) != readWholeFile(installed, kLargestBundle))
+        check.warnings.push_back(
+            {file, fmt::format("is not the installed service; where it should be, copy {} there",
+                               installed)});
+    }
+  } catch (const CommandFailure& failure) {
+    check.warnings.push_back(
+        {directory, fmt::format("cannot be compared with what is installed: {}", failure.what())});
+  }
+  return check;
+}
+
+}  // namespace tools
