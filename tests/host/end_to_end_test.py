@@ -1,7 +1,9 @@
 """Whole runs of the real migrator in the real host, looked at with independent readers."""
 import hashlib
+import json
 import os
 import plistlib
+import shutil
 import subprocess
 
 import jsonschema
@@ -42,6 +44,61 @@ LOG = [
     "Checking account <ASSBasicAccount: B> of type Quillnet",
     "Checking account <ASSBasicAccount: E> of type Exchange",
 ]
+
+
+SERVICES = "System/Library/AccountServices"
+
+
+class AccountServices(hosttest.HostTestCase):
+    """Code bundles of the image, which make accounts and hear of changes."""
+
+    def place(self, source, *names):
+        folder = self.image / SERVICES
+        folder.mkdir(mode=0o700)
+        for name in names:
+            shutil.copy(source or hosttest.MIGRATORS.parent / "services" / name, folder / name)
+            (folder / name).chmod(0o600)
+
+    def journal(self, name):
+        lines = (self.image / "var/log" / name).read_text().splitlines()
+        return [{key: value for key, value in json.loads(line).items() if key != "time"}
+                for line in lines]
+
+    def test_a_migration_loads_none_of_them(self):
+        self.write_agent_name("ada")
+        self.write_settings(OTHERS[0], RETIRED, *OTHERS[1:])
+        self.make_image(RECORDS)
+        # Whoever loaded one of these would be killed.
+        self.place(hosttest.BUNDLES / "CrashesWhenLoaded.migrator/CrashesWhenLoaded.so",
+                   "CalendarService.so", "ContactsService.so", "MailService.so")
+        run = self.run_host("--json", "--quiet")
+        self.assertEqual((0, "done"), (run.code, run.report["outcome"]))
+        self.assertEqual([], self.journal("account-changes.jsonl"))
+
+    def test_a_plugin_in_the_host_loads_asks_and_notifies_them(self):
+        self.write_settings(account("cal", "CalDAV", ("Calendars",)),
+                            account("group", "Gmail", ("Calendars",)))
+        self.place(None, "CalendarService.so", "ContactsService.so", "MailService.so")
+        run = self.run_bundle("AsksAccountServices")
+        self.assertEqual((0, "done"), (run.code, run.report["outcome"]), run.output)
+        self.assertEqual(["<CalendarServiceAccount: cal>", "<GroupServiceAccount: group>"],
+                         run.report["log"])
+        self.assertEqual(
+            [{"notifier": "CalendarServiceNotifier", "change": "did change", "account": name,
+              "dataclass": "com.vantor.Dataclass.Calendars"} for name in ("cal", "group")],
+            self.journal("account-changes.jsonl"))
+        self.assertEqual(
+            [("CalendarService", "cal", True), ("MailService", "group", True)],
+            [(line["service"], line["account"], line["answer"])
+             for line in self.journal("refreshes.jsonl")])
+
+    def test_a_service_that_cannot_be_loaded_ends_the_plugin_that_asks_it(self):
+        self.write_settings(account("cal", "CalDAV", ("Calendars",)))
+        self.place(hosttest.BUNDLES / "UnresolvedSymbol.migrator/UnresolvedSymbol.so",
+                   "CalendarService.so")
+        run = self.run_bundle("AsksAccountServices")
+        self.assertEqual(8, run.code)
+        self.assertIn("Could not load the account creator framework", run.output)
 
 
 class WholeRun(hosttest.HostTestCase):

@@ -16,13 +16,20 @@ from report import finish
 BUNDLE = "account-retirement/migrators/QuillnetAccountRemoval.migrator"
 EXPECTED = [
     "bin/device-image", "bin/migration-host",
+    "include/account-retirement/QuillnetAccountTypeRemoval/ASSAccountsManager.h",
+    "include/account-retirement/deviceimage/DeviceImageServices.h",
+    "include/account-retirement/localdata/DataclassFunctions.h",
     "include/account-retirement/platform/Services.h",
     "include/account-retirement/propertylist/Value.h",
     "share/doc/account-retirement/LICENSE", "share/doc/account-retirement/architecture.md",
     "share/man/man1/device-image.1", "share/man/man1/migration-host.1",
 ]
 IN_LIBRARIES = [
-    "libplatform.so", "libpropertylist.so",
+    "libplatform.so", "libpropertylist.so", "libaccount_settings.a", "libdeviceimage.a",
+    *(f"account-retirement/services/{name}Service.so" for name in ("Calendar", "Contacts", "Mail")),
+    *(f"cmake/AccountRetirement/AccountRetirement{name}.cmake"
+      for name in ("Config", "ConfigVersion", "Targets", "DeviceImageTargets")),
+    *(f"pkgconfig/account-retirement{name}.pc" for name in ("", "-platform", "-deviceimage")),
     *(f"{BUNDLE}/{name}" for name in (
         "Info.plist", "QuillnetAccountRemoval.so", "AccountTypesProperties.plist",
         "DataclassesProperties.plist", "AccountCreators.plist",
