@@ -32,7 +32,8 @@ class DeviceImageServices::Implementation {
         _preferences(image),
         _restrictions(image),
         _syncDataSource(_databases),
-        _systemLog(image, std::move(options.processName), std::move(options.logSink)),
+        _systemLog(image, std::move(options.processName), std::move(options.logSink),
+                   options.writesLog),
         _notifyCenter(image),
         _userDatabase(image),
         _services{

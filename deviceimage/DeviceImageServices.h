@@ -15,7 +15,9 @@ namespace deviceimage {
 struct ServiceOptions {
   // What each line of the system log begins with, after the time.
   std::string processName = "migration-host";
-  // Also gets every line, as it is written to the log (one line, control characters escaped,
+  // False for a program that only looks: nothing is written to the image's log.
+  bool writesLog = true;
+  // Gets every line too, as it is written to the log (one line, control characters escaped,
   // without time and process). May be called on any thread, and writes no log line itself.
   std::function<void(std::string_view line)> logSink;
   // The user's languages, the preferred one first ("de", "en").

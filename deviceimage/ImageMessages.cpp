@@ -7,15 +7,17 @@
 namespace deviceimage {
 
 ImageSystemLog::ImageSystemLog(std::shared_ptr<const DeviceImage> image, std::string processName,
-                               Sink sink)
+                               Sink sink, bool writes)
     : _journal(std::move(image), DeviceImage::kSystemLogFile),
       _processName(std::move(processName)),
-      _sink(std::move(sink)) {}
+      _sink(std::move(sink)),
+      _writes(writes) {}
 
 void ImageSystemLog::writeLine(std::string_view text) {
   const std::string line = oneLine(text);
-  _journal.append(timestamp() + " " + _processName + "[" + std::to_string(::getpid()) +
-                  "]: " + line);
+  if (_writes)
+    _journal.append(timestamp() + " " + _processName + "[" + std::to_string(::getpid()) +
+                    "]: " + line);
   if (_sink) _sink(line);
 }
 

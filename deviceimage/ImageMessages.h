@@ -18,14 +18,16 @@ namespace deviceimage {
 class ImageSystemLog : public platform::SystemLog {
  public:
   using Sink = std::function<void(std::string_view line)>;
-  // `sink` may be empty; it gets the escaped text alone.
-  ImageSystemLog(std::shared_ptr<const DeviceImage> image, std::string processName, Sink sink);
+  // `sink` may be empty; it gets the escaped text alone. Without `writes` it alone gets the lines.
+  ImageSystemLog(std::shared_ptr<const DeviceImage> image, std::string processName, Sink sink,
+                 bool writes = true);
   void writeLine(std::string_view text) override;
 
  private:
   Journal _journal;
   std::string _processName;
   Sink _sink;
+  bool _writes;
 };
 
 // Notifications, as lines of var/log/notifications.jsonl: {"time": ..., "name": ...}. Nobody on an

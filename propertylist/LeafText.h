@@ -4,6 +4,7 @@
 #include <string>
 #include <string_view>
 
+#include "propertylist/Export.h"
 #include "propertylist/Value.h"
 
 // Leaves as texts, in the XML form and in descriptions. Blanks around a text that is read do not
@@ -21,8 +22,8 @@ std::optional<double> parseRealText(std::string_view text);
 std::string realText(double real);
 
 // Base64 with its padding; blanks may stand anywhere.
-std::optional<Bytes> parseBase64(std::string_view text);
-std::string base64Text(const Bytes& data);
+PROPERTYLIST_EXPORT std::optional<Bytes> parseBase64(std::string_view text);
+PROPERTYLIST_EXPORT std::string base64Text(const Bytes& data);
 
 std::string_view withoutBlanks(std::string_view text);
 

@@ -67,26 +67,30 @@ std::optional<Value> valueOf(std::string_view kind, std::string_view text) {
 
 }  // namespace
 
-std::pair<std::string, Value> typedProperty(const std::string& text) {
-  const std::size_t equals = text.find('=');
-  std::string key = text.substr(0, equals);
-  if (equals == std::string::npos || key.empty() || !isText(key))
-    throw CommandFailure(ExitCode::wrongUsage,
-                         fmt::format("\"{}\" is no property; write KEY=VALUE", text));
-  std::string kind = "string";
-  const std::size_t colon = key.rfind(':');
-  if (colon != std::string::npos && colon != 0) {
-    kind = key.substr(colon + 1);
-    key.resize(colon);
-  }
-  std::optional<Value> value = valueOf(kind, std::string_view(text).substr(equals + 1));
+Value typedValue(std::string_view kind, std::string_view text, std::string_view shown) {
+  std::optional<Value> value = valueOf(kind, text);
   if (!value)
     throw CommandFailure(
         ExitCode::wrongUsage,
-        fmt::format("the value of \"{}\" is no {}; write KEY:KIND=VALUE, where KIND is string, "
-                    "integer, real, boolean, date or data",
-                    text, kind));
-  return {std::move(key), *std::move(value)};
+        fmt::format("the value of \"{}\" is no {}; the KIND of KEY:KIND is string, integer, real, "
+                    "boolean, date or data",
+                    shown, kind));
+  return *std::move(value);
+}
+
+TypedKey typedKey(std::string_view text) {
+  const std::size_t colon = text.rfind(':');
+  if (colon == std::string_view::npos || colon == 0) return {std::string(text), "string"};
+  return {std::string(text.substr(0, colon)), std::string(text.substr(colon + 1))};
+}
+
+std::pair<std::string, Value> typedProperty(const std::string& text) {
+  const std::size_t equals = text.find('=');
+  auto [key, kind] = typedKey(std::string_view(text).substr(0, equals));
+  if (equals == std::string::npos || key.empty() || !isText(key))
+    throw CommandFailure(ExitCode::wrongUsage,
+                         fmt::format("\"{}\" is no property; write KEY=VALUE", text));
+  return {std::move(key), typedValue(kind, std::string_view(text).substr(equals + 1), text)};
 }
 
 }  // namespace tools

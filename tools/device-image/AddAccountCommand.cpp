@@ -5,8 +5,8 @@
 #include <optional>
 #include <vector>
 
-#include "deviceimage/Dataclass.h"
 #include "deviceimage/DeviceImageServices.h"
+#include "tools/common/DataclassNames.h"
 #include "tools/common/Images.h"
 #include "tools/common/TypedProperty.h"
 #include "tools/device-image/AccountTypes.h"
@@ -23,7 +23,6 @@ using propertylist::Dictionary;
 constexpr std::string_view kDeviceLocalType = "OnMyDevice";
 constexpr std::string_view kDeviceLocalIdentifier = "DeviceLocalAccount";
 constexpr std::string_view kSyncIdentifierKey = "Sync Identifier";
-constexpr std::string_view kDataclassPrefix = "com.vantor.Dataclass.";
 
 struct Options {
   std::string directory, type, identifier, accountClass, displayName, username;
@@ -37,19 +36,6 @@ void setText(Dictionary& account, std::string_view key, const std::string& text)
   if (!isText(text))
     throw CommandFailure(ExitCode::wrongUsage, fmt::format("the {} is not UTF-8 text", key));
   account.set(key, text);
-}
-
-// "contacts" and its like, or a whole identifier.
-std::string dataclassIdentifierOf(const std::string& name) {
-  if (const auto dataclass = deviceimage::dataclassNamed(name))
-    return std::string(deviceimage::dataclassIdentifier(*dataclass));
-  if (name.starts_with(kDataclassPrefix) && name.size() > kDataclassPrefix.size() && isText(name))
-    return name;
-  throw CommandFailure(
-      ExitCode::wrongUsage,
-      fmt::format("there is no dataclass \"{}\"; give mail, contacts, calendars, reminders, "
-                  "bookmarks, notes or a whole identifier ({}...)",
-                  name, kDataclassPrefix));
 }
 
 void setEnabled(Dictionary& account, const std::vector<std::string>& names) {

@@ -7,6 +7,7 @@
 
 #include "deviceimage/RecordStores.h"
 #include "deviceimage/SyncAgent.h"
+#include "tools/common/DataclassNames.h"
 #include "tools/common/Images.h"
 #include "tools/common/Table.h"
 #include "tools/device-image/AccountStores.h"
@@ -35,9 +36,7 @@ std::vector<std::string> enabledDataclasses(const Dictionary& account) {
   if (enabled == nullptr) return names;
   for (const propertylist::Value& value : *enabled) {
     if (value.asString() == nullptr) continue;
-    const auto dataclass = deviceimage::dataclassWithIdentifier(*value.asString());
-    names.push_back(dataclass ? std::string(deviceimage::dataclassName(*dataclass))
-                              : *value.asString());
+    names.push_back(shownDataclass(*value.asString()));
   }
   return names;
 }

@@ -1,0 +1,178 @@
+#include "tools/account-settings/Change.h"
+
+#include <fcntl.h>
+#include <fmt/format.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <chrono>
+#include <cstdlib>
+#include <nlohmann/json.hpp>
+#include <optional>
+#include <thread>
+#include <utility>
+
+#include "deviceimage/ImageLock.h"
+#include "platform/InternalConsistencyFailure.h"
+#include "tools/account-settings/BundleTrust.h"
+#include "tools/account-settings/Differences.h"
+#include "tools/account-settings/Oddities.h"
+#include "tools/account-settings/Shown.h"
+#include "tools/common/Images.h"
+#include "tools/common/Installation.h"
+
+namespace tools {
+namespace {
+
+using accountsettings::ASSAccountsManager;
+using deviceimage::DeviceImage;
+using deviceimage::ImageLock;
+
+// Null without --lock.
+std::unique_ptr<ImageLock> takeLock(const DeviceImage& image, const ChangeOptions& options) {
+  using Clock = std::chrono::steady_clock;
+  constexpr auto kPause = std::chrono::milliseconds(20);
+  if (!options.lock || options.dryRun) return nullptr;
+  const auto end = Clock::now() + std::chrono::duration<double>(options.wait);
+  for (;;) {
+    ImageLock::Attempt attempt = ImageLock::tryAcquire(image);
+    if (attempt.outcome == ImageLock::Outcome::held) return std::move(attempt.lock);
+    if (attempt.outcome != ImageLock::Outcome::heldByAnother)
+      throw CommandFailure(ExitCode::refused, attempt.error);
+    if (Clock::now() >= end)
+      throw CommandFailure(ExitCode::heldByAnotherRun,
+                           fmt::format("{} (waited {} seconds; --wait gives another time)",
+                                       attempt.error, options.wait));
+    std::this_thread::sleep_for(kPause);
+  }
+}
+
+// The library writes its temporary file into the directory that TMPDIR names, and moves it over the
+// settings file, which must be on the same file system.
+void useTemporaryDirectory(const DeviceImage& image) {
+  if (image.lookAt(DeviceImage::kTemporaryDirectory).kind != deviceimage::FileLook::Kind::directory)
+    throw CommandFailure(ExitCode::refused,
+                         fmt::format("{} is no directory; nothing was changed; make it",
+                                     image.temporaryDirectory()));
+  ::setenv("TMPDIR", image.temporaryDirectory().c_str(), 1);
+}
+
+void refuseLossySave(const AccountStore& store) {
+  std::string problems;
+  std::size_t count = 0;
+  for (const Oddity& oddity : findOddities(store.root())) {
+    if (!oddity.savingLoses) continue;
+    ++count;
+    if (problems.empty())
+      problems = fmt::format("{}{}{} {}", oddity.place, oddity.place.empty() ? "" : ": ",
+                             oddity.key, oddity.text);
+  }
+  if (count == 0) return;
+  throw CommandFailure(
+      ExitCode::imageDamaged,
+      fmt::format("{}: {}{}; nothing was changed, since a save would lose it; "
+                  "account-settings validate --image {} lists all; mend it with account-settings "
+                  "convert",
+                  store.image().settingsFile(), problems,
+                  count > 1 ? fmt::format(" (and {} more)", count - 1) : "",
+                  store.image().rootPath()));
+}
+
+// Tells one file at the settings file's place from another that was moved there later.
+struct FileIdentity {
+  ino_t number = 0;
+  timespec written = {};
+  bool operator==(const FileIdentity& other) const {
+    return number == other.number && written.tv_sec == other.written.tv_sec &&
+           written.tv_nsec == other.written.tv_nsec;
+  }
+};
+
+FileIdentity settingsFileIdentity(const DeviceImage& image) {
+  const deviceimage::OpenedFile file = image.openFile(DeviceImage::kSettingsFile, O_RDONLY);
+  struct stat status {};
+  if (file.descriptor < 0) return {};
+  ::fstat(file.descriptor, &status);
+  ::close(file.descriptor);
+  return {status.st_ino, status.st_mtim};
+}
+
+// The line with which the library says that a save failed; empty when it did not.
+std::optional<std::string> failureLine(const AccountStore& store) {
+  const auto& lines = store.logLines();
+  const auto line = std::find_if(lines.rbegin(), lines.rend(), [](const std::string& text) {
+    return text.starts_with("Failed to save accounts to filesystem.");
+  });
+  return line != lines.rend() ? std::optional(*line) : std::nullopt;
+}
+
+[[noreturn]] void failUnsaved(const AccountStore& store, const std::string& reason) {
+  throw CommandFailure(
+      ExitCode::unexpectedFailure,
+      fmt::format("{}: the accounts were not saved, the file is as it was: {} See that {} and the "
+                  "file's folder can be written, that there is room, and that {} has the user "
+                  "\"mobile\", then repeat the command",
+                  store.image().settingsFile(), reason, store.image().temporaryDirectory(),
+                  store.image().absolutePath(DeviceImage::kUsersFile)));
+}
+
+void save(AccountStore& store, bool notify) {
+  const FileIdentity before = settingsFileIdentity(store.image());
+  store.startLogging();
+  ASSAccountsManager::_setShouldSkipNotifications(!notify);
+  try {
+    store.manager().saveAllAccounts();
+  } catch (const platform::InternalConsistencyFailure& failure) {
+    const bool saved = settingsFileIdentity(store.image()) != before;
+    throw CommandFailure(
+        ExitCode::unexpectedFailure,
+        fmt::format("{}: the accounts were {}: {} ({}, line {}); the account services are "
+                    "listed in {}/AccountCreators.plist; install what it names into the image, or "
+                    "leave --notify out",
+                    store.image().settingsFile(),
+                    saved ? "saved, but not every notifier was told" : "not saved", failure.what(),
+                    failure.sourceFile(), failure.line(), installedAccountResources()));
+  }
+  if (const auto line = failureLine(store)) failUnsaved(store, *line);
+  if (settingsFileIdentity(store.image()) == before)
+    failUnsaved(store, "The library said nothing.");
+}
+
+void report(const AccountStore& store, const std::vector<Difference>& differences,
+            const ChangeOptions& options) {
+  const bool saved = !differences.empty() && !options.dryRun;
+  if (options.json) {
+    nlohmann::ordered_json json;
+    json["image"] = store.image().rootPath();
+    json["dry_run"] = options.dryRun;
+    json["saved"] = saved;
+    json["notified"] = saved && options.notify;
+    json["changes"] = nlohmann::ordered_json::array();
+    for (const Difference& difference : differences) json["changes"].push_back(jsonOf(difference));
+    printJson(json);
+  } else if (options.dryRun) {
+    for (const Difference& difference : differences) fmt::print("{}\n", describe(difference));
+    if (differences.empty()) fmt::print("nothing would change\n");
+  }
+}
+
+}  // namespace
+
+ExitCode changeAccounts(const ChangeOptions& options,
+                        const std::function<void(AccountStore&)>& edit) {
+  ImagePtr image = openImage(options.image);
+  if (options.notify) requireTrustedServices(*image);
+  const std::unique_ptr<ImageLock> lock = takeLock(*image, options);
+  useTemporaryDirectory(*image);
+  AccountStore store(std::move(image));
+  refuseLossySave(store);
+  const auto before = store.snapshot();
+  edit(store);
+  const std::vector<Difference> differences = differencesBetween(before, store.snapshot());
+  if (!differences.empty() && !options.dryRun) save(store, options.notify);
+  report(store, differences, options);
+  return ExitCode::done;
+}
+
+}  // namespace tools

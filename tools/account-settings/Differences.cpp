@@ -1,0 +1,139 @@
+#include "tools/account-settings/Differences.h"
+
+#include <fmt/format.h>
+
+#include <map>
+
+#include "QuillnetAccountTypeRemoval/AccountConstants.h"
+#include "tools/account-settings/Shown.h"
+
+namespace tools {
+
+using propertylist::Dictionary;
+using propertylist::Value;
+
+namespace {
+
+using AccountsByID = std::map<std::string, Dictionary>;
+
+std::optional<Value> valueOf(const Dictionary& properties, std::string_view key) {
+  const Value* const value = properties.find(key);
+  return value != nullptr ? std::optional(*value) : std::nullopt;
+}
+
+std::vector<Dictionary> childrenOf(const Dictionary& properties) {
+  std::vector<Dictionary> children;
+  const auto* const values =
+      propertylist::findArray(properties, accountsettings::kAccountChildAccounts);
+  if (values == nullptr) return children;
+  for (const Value& value : *values)
+    if (value.asDictionary() != nullptr) children.push_back(*value.asDictionary());
+  return children;
+}
+
+AccountsByID byIdentifier(const std::vector<Dictionary>& accounts) {
+  AccountsByID result;
+  for (const Dictionary& account : accounts) {
+    const std::string* const identifier =
+        propertylist::findString(account, accountsettings::kAccountIdentifier);
+    result[identifier != nullptr ? *identifier : std::string()] = account;
+  }
+  return result;
+}
+
+class Comparison {
+ public:
+  std::vector<Difference> differences;
+
+  void compareAccounts(const AccountsByID& before, const AccountsByID& after,
+                       const std::string& parent) {
+    for (const auto& [identifier, properties] : before)
+      if (!after.contains(identifier))
+        differences.push_back(
+            {Difference::Kind::deleted, identifier, parent, {}, properties, std::nullopt});
+    for (const auto& [identifier, properties] : after) {
+      const auto old = before.find(identifier);
+      if (old == before.end())
+        differences.push_back(
+            {Difference::Kind::added, identifier, parent, {}, std::nullopt, properties});
+      else
+        _compareProperties(old->second, properties, identifier, parent);
+    }
+  }
+
+ private:
+  void _compareProperties(const Dictionary& before, const Dictionary& after,
+                          const std::string& identifier, const std::string& parent) {
+    if (before == after) return;
+    Dictionary all = before;
+    for (const Dictionary::Entry& entry : after) all.set(entry.key(), entry.value());
+    for (const Dictionary::Entry& entry : all) {
+      const auto old = valueOf(before, entry.key());
+      const auto now = valueOf(after, entry.key());
+      if (old == now) continue;
+      if (entry.key() == accountsettings::kAccountChildAccounts)
+        compareAccounts(byIdentifier(childrenOf(before)), byIdentifier(childrenOf(after)),
+                        identifier);
+      else
+        differences.push_back(
+            {Difference::Kind::modified, identifier, parent, entry.key(), old, now});
+    }
+  }
+};
+
+std::string typeOf(const std::optional<Value>& properties) {
+  const std::string* const type =
+      propertylist::findString(*properties->asDictionary(), accountsettings::kAccountType);
+  return type != nullptr ? *type : std::string();
+}
+
+const char* nameOf(Difference::Kind kind) {
+  return kind == Difference::Kind::added     ? "added"
+         : kind == Difference::Kind::deleted ? "deleted"
+                                             : "modified";
+}
+
+}  // namespace
+
+std::vector<Difference> differencesBetween(const std::vector<Dictionary>& before,
+                                           const std::vector<Dictionary>& after) {
+  Comparison comparison;
+  comparison.compareAccounts(byIdentifier(before), byIdentifier(after), {});
+  return std::move(comparison.differences);
+}
+
+std::string describe(const Difference& difference) {
+  const std::string account =
+      difference.parent.empty() ? difference.account : difference.parent + "/" + difference.account;
+  switch (difference.kind) {
+    case Difference::Kind::added:
+      return fmt::format("{}: added, of type {}", account, typeOf(difference.after));
+    case Difference::Kind::deleted: {
+      const std::size_t children = childrenOf(*difference.before->asDictionary()).size();
+      return fmt::format("{}: deleted{}", account,
+                         children == 0 ? "" : fmt::format(", with {} child accounts", children));
+    }
+    case Difference::Kind::modified:
+      break;
+  }
+  if (!difference.after)
+    return fmt::format("{}: {}: {} removed", account, difference.key,
+                       shownValue(*difference.before));
+  if (!difference.before)
+    return fmt::format("{}: {}: {} added", account, difference.key, shownValue(*difference.after));
+  return fmt::format("{}: {}: {} -> {}", account, difference.key, shownValue(*difference.before),
+                     shownValue(*difference.after));
+}
+
+nlohmann::ordered_json jsonOf(const Difference& difference) {
+  nlohmann::ordered_json json;
+  json["account"] = difference.account;
+  json["parent"] = orNull(difference.parent);
+  json["change"] = nameOf(difference.kind);
+  json["key"] = orNull(difference.key);
+  if (difference.before) json["before"] = jsonFormOf(*difference.before);
+  if (difference.after) json["after"] = jsonFormOf(*difference.after);
+  return json;
+}
+
+}  // namespace tools

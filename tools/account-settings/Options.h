@@ -1,0 +1,24 @@
+#pragma once
+
+#include <CLI/CLI.hpp>
+#include <string>
+
+namespace tools {
+
+// What every command that looks at an image is told.
+struct LookOptions {
+  std::string image;
+  bool json = false;
+};
+void addLookOptions(CLI::App& command, LookOptions& options);
+
+// What every command that changes a settings file is told.
+struct ChangeOptions : LookOptions {
+  bool lock = true;     // hold the image's lock from the reading to the writing
+  double wait = 10;     // seconds for which a lock that another run holds is waited for
+  bool notify = false;  // tell the notifiers of the service bundles
+  bool dryRun = false;
+};
+void addChangeOptions(CLI::App& command, ChangeOptions& options);
+
+}  // namespace tools

@@ -1,0 +1,77 @@
+#include "tools/account-settings/Shown.h"
+
+#include <fmt/format.h>
+
+#include "propertylist/Writing.h"
+#include "tools/account-settings/JsonForm.h"
+#include "tools/common/DataclassNames.h"
+#include "tools/common/Program.h"
+
+namespace tools {
+
+using nlohmann::ordered_json;
+using propertylist::Value;
+
+std::vector<std::string> shownDataclasses(
+    const std::optional<accountsettings::StringList>& identifiers) {
+  std::vector<std::string> names;
+  if (!identifiers) return names;
+  for (const std::string& identifier : *identifiers) names.push_back(shownDataclass(identifier));
+  return names;
+}
+
+ordered_json orNull(const std::string& text) {
+  return text.empty() ? ordered_json() : ordered_json(text);
+}
+
+ordered_json jsonFormOf(const Value& value) { return ordered_json::parse(jsonFormText(value)); }
+
+std::string kindName(const Value& value) {
+  switch (value.kind()) {
+    case propertylist::Kind::dictionary:
+      return "dictionary";
+    case propertylist::Kind::array:
+      return "array";
+    case propertylist::Kind::string:
+      return "string";
+    case propertylist::Kind::integer:
+      return "integer";
+    case propertylist::Kind::real:
+      return "real";
+    case propertylist::Kind::boolean:
+      return "boolean";
+    case propertylist::Kind::date:
+      return "date";
+    case propertylist::Kind::data:
+      return "data";
+  }
+  return {};
+}
+
+std::string shownValue(const Value& value) {
+  constexpr std::size_t kLongest = 160;
+  if (const auto boolean = value.asBoolean()) return *boolean ? "true" : "false";
+  std::string text = propertylist::describe(value);
+  if (text.size() <= kLongest) return text;
+  std::size_t end = kLongest;
+  while ((static_cast<unsigned char>(text[end]) & 0xC0U) == 0x80) --end;  // whole characters
+  return text.substr(0, end) + "...";
+}
+
+void printJson(const ordered_json& json) {
+  fmt::print("{}\n", json.dump(2, ' ', false, ordered_json::error_handler_t::replace));
+}
+
+void warnOfUnusableEntries(AccountStore& store) {
+  const Value* const accounts = store.root().find("Accounts");
+  if (accounts == nullptr) return;
+  const propertylist::Array* const entries = accounts->asArray();
+  const std::size_t unusable = entries == nullptr ? 1 : entries->size() - store.manager().count();
+  if (unusable != 0)
+    printMessage(
+        fmt::format("{}: what the file holds is not all shown, since the library cannot use it; "
+                    "account-settings validate --image {} says what is wrong",
+                    store.image().settingsFile(), store.image().rootPath()));
+}
+
+}  // namespace tools

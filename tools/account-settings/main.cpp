@@ -1,0 +1,29 @@
+// account-settings: looks at and changes the account settings file of a device image.
+#include "tools/account-settings/Commands.h"
+#include "tools/common/Program.h"
+
+namespace {
+
+constexpr const char* kFooter =
+    "Exit codes: 0 done; 1 unexpected failure; 2 wrong usage; 6 the settings file is damaged, or\n"
+    "validate found something; 7 refused, nothing was written; 11 another run holds the image.\n\n"
+    "Example:\n"
+    "  account-settings list --image my-device\n"
+    "  account-settings show Q1 --image my-device\n"
+    "  account-settings set Q1 DisplayName \"Ada at home\" --image my-device";
+
+}  // namespace
+
+int main(int argumentCount, char** arguments) {
+  CLI::App app("Looks at and changes the account settings file of a device image.",
+               "account-settings");
+  app.set_version_flag("--version", "account-settings " PROJECT_VERSION);
+  app.footer(kFooter);
+  app.require_subcommand(1);
+  tools::ExitCode outcome = tools::ExitCode::done;
+  tools::addListCommand(app, outcome);
+  tools::addShowCommand(app, outcome);
+  tools::addSetCommand(app, outcome);
+  tools::addUnsetCommand(app, outcome);
+  return tools::runProgram(app, outcome, argumentCount, arguments);
+}
