@@ -10,12 +10,10 @@
 #include "tools/common/Program.h"
 #include "tools/device-image/AccountStores.h"
 #include "tools/device-image/Commands.h"
+#include "tools/device-image/KnownRecords.h"
 #include "tools/device-image/Records.h"
-#include "tools/device-image/import/BookmarksReader.h"
-#include "tools/device-image/import/CalendarReader.h"
-#include "tools/device-image/import/CardReader.h"
-#include "tools/device-image/import/NotesReader.h"
 #include "tools/device-image/import/TextLines.h"
+#include "tools/device-image/import/TextReader.h"
 
 namespace tools {
 namespace {
@@ -35,29 +33,11 @@ struct Gathered {
   std::size_t badCount = 0;
 };
 
-ReadText readText(Dataclass dataclass, std::string_view bytes) {
-  switch (dataclass) {
-    case Dataclass::calendars:
-    case Dataclass::reminders:
-      return readCalendars(bytes);
-    case Dataclass::bookmarks:
-      return readBookmarks(bytes);
-    case Dataclass::notes:
-      return readNotes(bytes);
-    case Dataclass::contacts:
-    case Dataclass::mail:
-      break;
-  }
-  return readCards(bytes);
-}
-
 // Where the record goes in its store; empty for the store's usual place.
-std::vector<std::string> collectionPath(const TextRecord& record, const std::string& collection) {
-  std::vector<std::string> path;
-  if (!collection.empty()) path.push_back(collection);
-  if (record.folder) path.insert(path.end(), record.folder->begin(), record.folder->end());
-  if (record.folder && path.empty()) path.emplace_back(kTopBookmarksFolder);
-  return path;
+std::vector<std::string> collectionPath(const TextRecord& record, const FolderPath& collection) {
+  if (!record.folder) return collection;
+  if (record.folder->empty()) return {std::string(kTopBookmarksFolder)};
+  return *record.folder;
 }
 
 void reportProblems(const std::string& file, const ReadText& text) {
@@ -75,7 +55,9 @@ void reportSkipped(const std::string& file, Dataclass dataclass, std::size_t ski
 
 void gather(const Options& options, Dataclass dataclass, const std::string& file,
             Progress& progress, Gathered& gathered) {
-  ReadText text = readText(dataclass, readWholeFile(file, kMaximumFileSize));
+  FolderPath collection;
+  if (!options.collection.empty()) collection.push_back(options.collection);
+  ReadText text = readText(dataclass, readWholeFile(file, kMaximumFileSize), collection);
   progress.wipe();
   reportProblems(file, text);
   gathered.badCount += text.problems.size();
@@ -85,16 +67,31 @@ void gather(const Options& options, Dataclass dataclass, const std::string& file
       ++skipped;
       continue;
     }
-    gathered.records.push_back({collectionPath(record, options.collection), std::move(record.uid),
+    gathered.records.push_back({collectionPath(record, collection), std::move(record.uid),
                                 std::move(record.bytes), record.modified.value_or(0)});
   }
   reportSkipped(file, dataclass, skipped);
 }
 
+// Puts the records into the store, apart from those that it holds already.
+deviceimage::Placed add(const ImagePtr& image, Dataclass dataclass, const ChosenStore& store,
+                        std::vector<NewRecord> records) {
+  RecordStores stores(image, RecordStores::Access::readWrite);
+  KnownRecords known(stores, dataclass, store.storeIdentifier);
+  const auto alreadyThere =
+      std::erase_if(records, [&known](const NewRecord& record) { return known.hold(record); });
+  if (records.empty()) return {0, static_cast<std::int64_t>(alreadyThere), 0};
+  RecordStores::Added added = stores.addRecords(dataclass, store.storeIdentifier, records);
+  requireSuccess(added.status, "nothing was imported");
+  added.placed.alreadyThere += static_cast<std::int64_t>(alreadyThere);
+  return added.placed;
+}
+
 ExitCode run(const Options& options) {
   const Dataclass dataclass = recordDataclassNamed(options.dataclass);
-  if (!isText(options.collection))
-    throw CommandFailure(ExitCode::wrongUsage, "the collection's name is not UTF-8 text");
+  if (!isText(options.collection) || options.collection.size() > kMaximumFolderName)
+    throw CommandFailure(ExitCode::wrongUsage,
+                         "the collection's name is not UTF-8 text of at most 1000 bytes");
   const LockedImage locked = openImageForWriting(options.directory);
   const ChosenStore store = chooseStore(*locked.image, dataclass, options.account);
   Gathered gathered;
@@ -106,11 +103,7 @@ ExitCode run(const Options& options) {
   deviceimage::Placed placed;
   if (!gathered.records.empty()) {
     progress.show(fmt::format("writing {} records", gathered.records.size()));
-    RecordStores stores(locked.image, RecordStores::Access::readWrite);
-    const RecordStores::Added added =
-        stores.addRecords(dataclass, store.storeIdentifier, gathered.records);
-    requireSuccess(added.status, "nothing was imported");
-    placed = added.placed;
+    placed = add(locked.image, dataclass, store, std::move(gathered.records));
   }
   progress.wipe();
   fmt::print("{}: {} added, {} already there, {} conflicting copies, {} bad; {}\n",

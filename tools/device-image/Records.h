@@ -8,9 +8,6 @@
 
 namespace tools {
 
-// The folder that holds the bookmarks which lie in no folder.
-inline constexpr std::string_view kTopBookmarksFolder = "Bookmarks";
-
 // The dataclass of that name: one that records are imported to and exported from.
 deviceimage::Dataclass recordDataclassNamed(const std::string& name);
 

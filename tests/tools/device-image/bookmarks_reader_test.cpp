@@ -80,6 +80,23 @@ TEST(Bookmarks, HaveAUIDThatDependsOnFolderAndAddressAlone) {
   EXPECT_NE(uidOf("<DL><DT><H3>F</H3><DL><DT><A HREF=\"x\">one</A></DL></DL>"), first);
 }
 
+TEST(Bookmarks, LieInTheFolderThatTheFileIsPutInto) {
+  const std::string inWork = "<DL><DT><H3>Work</H3><DL><DT><A HREF=\"x\">x</A></DL></DL>";
+  const ReadText moved = readBookmarks("<DL><DT><A HREF=\"x\">x</A></DL>", {"Work"});
+  ASSERT_EQ(moved.records.size(), 1U);
+  EXPECT_THAT(*moved.records[0].folder, ElementsAre("Work"));
+  EXPECT_EQ(moved.records[0].uid, readBookmarks(inWork).records.at(0).uid);
+  EXPECT_THAT(*readBookmarks(inWork, {"Old"}).records.at(0).folder, ElementsAre("Old", "Work"));
+}
+
+TEST(Bookmarks, OfTheTopFolderAreThoseOfNoFolder) {
+  const std::string top = readBookmarks("<DL><DT><A HREF=\"x\">x</A></DL>").records.at(0).uid;
+  const std::string inside = "<DL><DT><H3>Bookmarks</H3><DL><DT><A HREF=\"x\">x</A></DL></DL>";
+  EXPECT_EQ(readBookmarks(inside).records.at(0).uid, top);
+  EXPECT_NE(readBookmarks(inside, {"Work"}).records.at(0).uid, top);
+  EXPECT_NE(readBookmarks(inside, {"Bookmarks"}).records.at(0).uid, top);
+}
+
 struct BadBookmark {
   const char* name;
   std::string text;

@@ -35,20 +35,44 @@ const std::string kOnce =
     "BEGIN:VEVENT\r\nUID:once\r\nDTSTART;VALUE=DATE:20261224\r\nEND:VEVENT\r\n";
 const std::string kTask = "BEGIN:VTODO\r\nUID:task\r\nSUMMARY:Milch\r\nEND:VTODO\r\n";
 
-TEST(Calendars, KeepAFileWithOneRecordByteForByte) {
-  const std::string kFiles[] = {
+TEST(Calendars, KeepACalendarWithOneRecordByteForByte) {
+  const std::string kCalendars[] = {
       kHead + kParis + kTokyo + kWeekly + kException + kTail,
-      "\xEF\xBB\xBF" + kHead + kParis + kException + kWeekly + kTail + "\r\n",
       // Whatever else the calendar holds stays with its only record.
-      kHead + kOnce + "BEGIN:X-OWN\r\nA:b\r\nEND:X-OWN\r\nX-LATE:yes\r\nEND:VCALENDAR",
+      kHead + kOnce + "BEGIN:X-OWN\r\nA:b\r\nEND:X-OWN\r\nX-LATE:yes\r\n" + kTail,
   };
-  for (const std::string& file : kFiles) {
-    const ReadText read = readCalendars(file);
+  for (const std::string& calendar : kCalendars) {
+    const ReadText read = readCalendars(calendar);
     EXPECT_THAT(read.problems, IsEmpty());
     ASSERT_EQ(read.records.size(), 1U);
-    EXPECT_EQ(read.records[0].bytes, file);
+    EXPECT_EQ(read.records[0].bytes, calendar);
     EXPECT_EQ(read.records[0].dataclass, Dataclass::calendars);
   }
+}
+
+TEST(Calendars, AreTheSameWhateverStandsAroundThemInAFile) {
+  const std::string kUnix = "BEGIN:VCALENDAR\nVERSION:2.0\nBEGIN:VTODO\nUID:1\nEND:VTODO\n";
+  const struct {
+    const char* name;
+    std::string file, calendar;
+  } kCases[] = {
+      {"byte order mark", "\xEF\xBB\xBF" + kHead + kTask + kTail, kHead + kTask + kTail},
+      {"empty lines", "\r\n" + kHead + kTask + kTail + "\r\n", kHead + kTask + kTail},
+      {"no line end", kHead + kTask + "END:VCALENDAR", kHead + kTask + kTail},
+      {"half a line end", kHead + kTask + "END:VCALENDAR\r", kHead + kTask + kTail},
+      {"another line end", kUnix + "END:VCALENDAR", kUnix + "END:VCALENDAR\n"},
+  };
+  for (const auto& c : kCases) {
+    SCOPED_TRACE(c.name);
+    const ReadText read = readCalendars(c.file);
+    EXPECT_THAT(read.problems, IsEmpty());
+    ASSERT_EQ(read.records.size(), 1U);
+    EXPECT_EQ(read.records[0].bytes, c.calendar);
+  }
+  const ReadText divided = readCalendars(kHead + kOnce + kTask + "END:VCALENDAR");
+  ASSERT_EQ(divided.records.size(), 2U);
+  EXPECT_EQ(divided.records[0].bytes, kHead + kOnce + kTail);
+  EXPECT_EQ(divided.records[1].bytes, kHead + kTask + kTail);
 }
 
 TEST(Calendars, DivideAFileIntoOneCalendarForEachUID) {

@@ -46,12 +46,21 @@ TEST(Cards, LeaveBlankLinesAndAByteOrderMarkOutside) {
 TEST(Cards, KeepFoldsAndUnfoldThemToReadTheUID) {
   const std::string_view card =
       "BEGIN:VCARD\nVERSION:3.0\nUID:first\n -second\nFN:M\xC3\n \xBCller\nPHOTO;ENCODING=b:AAAA\n"
-      "\tBBBB\nEND:VCARD";
+      "\tBBBB\nEND:VCARD\n";
   const ReadText read = readCards(card);
   ASSERT_THAT(read.problems, IsEmpty());
   ASSERT_EQ(read.records.size(), 1U);
   EXPECT_EQ(read.records[0].uid, "first-second");
   EXPECT_EQ(read.records[0].bytes, card);
+}
+
+TEST(Cards, GetTheLineEndThatTheEndOfAFileTookFromThem) {
+  const ReadText unixCard = readCards("BEGIN:VCARD\nVERSION:3.0\nFN:A\nEND:VCARD");
+  ASSERT_EQ(unixCard.records.size(), 1U);
+  EXPECT_EQ(unixCard.records[0].bytes, "BEGIN:VCARD\nVERSION:3.0\nFN:A\nEND:VCARD\n");
+  const ReadText card = readCards("BEGIN:VCARD\r\nVERSION:3.0\r\nFN:A\r\nEND:VCARD");
+  ASSERT_EQ(card.records.size(), 1U);
+  EXPECT_EQ(card.records[0].bytes, "BEGIN:VCARD\r\nVERSION:3.0\r\nFN:A\r\nEND:VCARD\r\n");
 }
 
 TEST(Cards, DeriveAMissingUIDFromTheBytes) {

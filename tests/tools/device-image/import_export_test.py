@@ -51,9 +51,8 @@ class RoundTrip(ImageTest):
     def test_a_file_with_one_record_leaves_as_it_came(self):
         cases = [
             ("contacts", ADA),
-            ("contacts", ADA.removesuffix("\r\n")),
-            ("calendars", HEAD + "X-ODD:1\r\n" + EVENT + TAIL + "\r\n"),
-            ("reminders", HEAD + TASK + "END:VCALENDAR"),
+            ("calendars", HEAD + "X-ODD:1\r\n" + EVENT + TAIL),
+            ("reminders", HEAD + TASK + TAIL),
             ("notes", NOTES[0]),
             ("notes", NOTES[1]),
         ]
@@ -79,6 +78,14 @@ class RoundTrip(ImageTest):
         for dataclass in ["contacts", "calendars", "reminders", "bookmarks", "notes"]:
             self.import_text(dataclass, "exported", run("export", first, "--dataclass", dataclass).stdout)
         self.assertEqual(self.records(), before)
+
+    def test_a_record_is_the_same_wherever_in_a_file_it_stands(self):
+        self.import_text("contacts", "last", BOB.replace("Bob", "Al") + ADA.removesuffix("\r\n"))
+        said = self.import_text("contacts", "first", ADA + BOB.replace("Bob", "Al"))
+        self.assertIn(b"0 added, 2 already there", said)
+        self.import_text("reminders", "alone", "\ufeff" + HEAD + TASK + "END:VCALENDAR")
+        said = self.import_text("reminders", "not alone", HEAD + EVENT + TAIL + HEAD + TASK + TAIL + "\r\n")
+        self.assertIn(b"0 added, 1 already there", said)
 
     def test_a_calendar_of_several_events_is_divided(self):
         self.import_text("calendars", "a.ics", HEAD + EVENT + OTHER_EVENT + TAIL)

@@ -8,6 +8,7 @@
 
 #include "tools/device-image/Records.h"
 #include "tools/device-image/import/HtmlTags.h"
+#include "tools/device-image/import/TextRecord.h"
 
 namespace tools {
 namespace {
@@ -30,7 +31,7 @@ constexpr std::string_view kEnd = "</DL><p>\n";
 // One folder of a store, with what it holds directly.
 struct Folder {
   std::string name;
-  bool isTop = false;  // its content stands outside folders
+  bool isTop = false;  // its bookmarks stand outside folders
   std::vector<Row> folders;
   std::vector<Row> bookmarks;
 };
@@ -42,9 +43,9 @@ class StoreWriter {
   void write(const Store& store) {
     _load(store);
     for (const Row row : _roots)
-      if (_folders[row].isTop) _writeFolders(row);
+      if (_folders[row].isTop) _writeBookmarks(_folders[row]);
     for (const Row row : _roots)
-      if (!_folders[row].isTop) _writeFolders(row);
+      if (!_folders[row].isTop || !_folders[row].folders.empty()) _writeFolders(row);
   }
 
  private:
@@ -79,12 +80,10 @@ class StoreWriter {
     std::vector<Open> open;
     const auto enter = [&](Row row) {
       const Folder& folder = _folders[row];
-      if (!folder.isTop) {
-        _line(fmt::format("<DT><H3>{}</H3>", escapedForHtml(folder.name)));
-        _line("<DL><p>");
-        ++_depth;
-      }
-      for (const Row bookmark : folder.bookmarks) _writeBookmark(bookmark);
+      _line(fmt::format("<DT><H3>{}</H3>", escapedForHtml(folder.name)));
+      _line("<DL><p>");
+      ++_depth;
+      if (!folder.isTop) _writeBookmarks(folder);
       open.push_back({&folder});
     };
     enter(root);
@@ -94,12 +93,14 @@ class StoreWriter {
         enter(inner.folder->folders[inner.next++]);
         continue;
       }
-      if (!inner.folder->isTop) {
-        --_depth;
-        _line("</DL><p>");
-      }
+      --_depth;
+      _line("</DL><p>");
       open.pop_back();
     }
+  }
+
+  void _writeBookmarks(const Folder& folder) {
+    for (const Row bookmark : folder.bookmarks) _writeBookmark(bookmark);
   }
 
   void _writeBookmark(Row row) {

@@ -7,6 +7,7 @@
 #include "deviceimage/ContentHash.h"
 #include "tools/device-image/Records.h"
 #include "tools/device-image/export/BookmarksWriter.h"
+#include "tools/device-image/import/NotesReader.h"
 
 namespace tools {
 namespace {
@@ -36,17 +37,26 @@ void writeTexts(RecordStores& records, Dataclass dataclass, const std::vector<St
   });
 }
 
+// Whether a file that holds this note alone is read as this note.
+bool standsAlone(std::string_view note) {
+  const ReadText read = readNotes(note);
+  return read.records.size() == 1 && read.records.front().bytes == note;
+}
+
 void writeNotes(RecordStores& records, const std::vector<Store>& stores, Output& output) {
   // The boundary comes from the hashes of all notes, so that no note can hold it.
   std::string hashes;
   std::size_t count = 0;
-  visitAll(records, Dataclass::notes, stores, false, [&](const Record& record, std::string_view) {
-    hashes += record.contentHash;
-    ++count;
-    return true;
-  });
+  bool doesLastStandAlone = true;
+  visitAll(records, Dataclass::notes, stores, true,
+           [&](const Record& record, std::string_view content) {
+             hashes += record.contentHash;
+             ++count;
+             doesLastStandAlone = standsAlone(content);
+             return true;
+           });
   const std::string boundary = "notes-" + deviceimage::contentHash(hashes);
-  const bool isDigest = count > 1;
+  const bool isDigest = count > 1 || !doesLastStandAlone;
   if (isDigest)
     output.write(fmt::format("MIME-Version: 1.0\nContent-Type: multipart/digest; boundary=\"{}\"\n",
                              boundary));

@@ -12,8 +12,6 @@
 namespace tools {
 namespace {
 
-constexpr std::size_t kMaximumFolderName = 1000;  // bytes
-
 // The seconds of ADD_DATE and LAST_MODIFIED; some programs write them in smaller units.
 std::optional<std::int64_t> secondsOf(const std::optional<std::string>& text) {
   if (!text) return std::nullopt;
@@ -35,8 +33,8 @@ bool isInline(const HtmlTag& tag) {
 
 class Reader {
  public:
-  explicit Reader(std::string_view bytes) : _bytes(bytes), _tags(bytes) {
-    _folders.push_back({std::make_shared<const FolderPath>(), false});
+  Reader(std::string_view bytes, FolderPath outerFolder) : _bytes(bytes), _tags(bytes) {
+    _folders.push_back({std::make_shared<const FolderPath>(std::move(outerFolder)), false});
   }
 
   ReadText read() {
@@ -174,10 +172,12 @@ class Reader {
     _result.records.push_back(std::move(record));
   }
 
-  // No name holds a NUL byte, so different places give different texts.
+  // No name holds a NUL byte, so different places give different texts. The top folder's content
+  // lies in no folder of a file, whether it came in one or not.
   static std::string _uidOf(const FolderPath& folder, const std::string& address) {
     std::string identity;
-    for (const std::string& name : folder) identity.append(name).push_back('\0');
+    if (folder != FolderPath{std::string(kTopBookmarksFolder)})
+      for (const std::string& name : folder) identity.append(name).push_back('\0');
     identity += '\0';
     return deviceimage::contentHash(identity + address);
   }
@@ -196,6 +196,8 @@ class Reader {
 
 }  // namespace
 
-ReadText readBookmarks(std::string_view bytes) { return Reader(bytes).read(); }
+ReadText readBookmarks(std::string_view bytes, FolderPath outerFolder) {
+  return Reader(bytes, std::move(outerFolder)).read();
+}
 
 }  // namespace tools

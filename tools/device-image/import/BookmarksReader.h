@@ -12,6 +12,7 @@ namespace tools {
 // A record is one bookmark as it stands in the file, from its <DT> to its </A>, or to the end of
 // the <DD> description after it, byte for byte. Its UID is derived from its folder and its address.
 // The folders' names are kept; their other attributes are not, nor are folders without bookmarks.
-ReadText readBookmarks(std::string_view bytes);
+// The file's top level lies in `outerFolder`.
+ReadText readBookmarks(std::string_view bytes, FolderPath outerFolder = {});
 
 }  // namespace tools

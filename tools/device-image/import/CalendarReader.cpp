@@ -7,6 +7,7 @@
 
 #include "deviceimage/ContentHash.h"
 #include "tools/device-image/import/CalendarComponents.h"
+#include "tools/device-image/import/ContentLines.h"
 
 namespace tools {
 namespace {
@@ -62,8 +63,7 @@ class Divider {
   Divider(std::string_view bytes, CalendarObject& calendar, std::size_t& room, ReadText& result)
       : _bytes(bytes), _calendar(calendar), _room(room), _result(result) {}
 
-  // `whole` is what a calendar of one record is kept as.
-  void divide(Span whole) {
+  void divide() {
     if (!_isReadable()) return;
     for (CalendarComponent& component : _calendar.components) checkComponent(component, _calendar);
     const bool isWhole = _calendar.problems.empty() &&
@@ -76,7 +76,7 @@ class Divider {
     for (const Group& group : groups) {
       if (_reportProblems(group)) continue;
       if (isWhole && groups.size() == 1)
-        _add(group, std::string(whole.of(_bytes)));
+        _add(group, withLineEnd(_calendar.span.of(_bytes)));
       else if (auto text = _envelope(group))
         _add(group, *std::move(text));
     }
@@ -128,10 +128,10 @@ class Divider {
     text.reserve(size + 16);
     for (const Span& part : parts) text += part.of(_bytes);
     const std::string_view begin = _calendar.ownLines.front().of(_bytes);
-    text += _calendar.endLine         ? std::string(_calendar.endLine->of(_bytes))
+    text += _calendar.endLine         ? _calendar.endLine->of(_bytes)
             : begin.ends_with("\r\n") ? "END:VCALENDAR\r\n"
                                       : "END:VCALENDAR\n";
-    return text;
+    return withLineEnd(text);
   }
 
   // The time zones that the group names, in the order of the file. A zone that the calendar does
@@ -189,11 +189,7 @@ ReadText readCalendars(std::string_view bytes) {
   ReadText result;
   CalendarFile file = cutCalendars(bytes);
   std::size_t room = std::max(kMinimumRoom, bytes.size() * kRoomPerByte);
-  const bool isOneCalendar = file.calendars.size() == 1 && file.problems.empty();
-  for (CalendarObject& calendar : file.calendars) {
-    const Span whole = isOneCalendar ? Span{0, bytes.size()} : calendar.span;
-    Divider(bytes, calendar, room, result).divide(whole);
-  }
+  for (CalendarObject& calendar : file.calendars) Divider(bytes, calendar, room, result).divide();
   result.problems.insert(result.problems.end(), file.problems.begin(), file.problems.end());
   if (file.calendars.empty() && result.problems.empty())
     result.problems.push_back({1, "the file holds no calendar", "choose an iCalendar file"});

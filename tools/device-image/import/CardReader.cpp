@@ -65,7 +65,7 @@ void finish(Card& card, std::string_view bytes, std::size_t end, ReadText& resul
   }
   TextRecord record;
   record.dataclass = deviceimage::Dataclass::contacts;
-  record.bytes = bytes.substr(card.begin, end - card.begin);
+  record.bytes = withLineEnd(bytes.substr(card.begin, end - card.begin));
   record.uid = card.uid.empty() ? deviceimage::contentHash(record.bytes) : std::move(card.uid);
   record.modified = card.modified;
   record.line = card.line;

@@ -89,4 +89,14 @@ std::optional<ContentLine> ContentLines::next() {
   return line;
 }
 
+std::string withLineEnd(std::string_view text) {
+  std::string ended(text);
+  if (ended.ends_with('\n')) return ended;
+  const std::size_t first = text.find('\n');
+  const bool hasReturns = first != std::string_view::npos && first > 0 && text[first - 1] == '\r';
+  if (hasReturns && !ended.ends_with('\r')) ended += '\r';
+  ended += '\n';
+  return ended;
+}
+
 }  // namespace tools

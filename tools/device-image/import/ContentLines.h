@@ -27,6 +27,10 @@ struct ContentLine {
   std::optional<std::string> parameter(std::string_view parameterName) const;
 };
 
+// The text with a line end at its end, of the kind that its first line has: where a file was cut
+// off or joined must not make another record of it.
+std::string withLineEnd(std::string_view text);
+
 // Walks the property lines of a text, which outlives it.
 class ContentLines {
  public:

@@ -174,9 +174,15 @@ std::string resolvedEntities(std::string_view text) {
 }
 
 std::string escapedForHtml(std::string_view text) {
+  // Readers pass over blanks at the ends.
+  const std::size_t first = text.find_first_not_of(kBlank);
+  const std::size_t last = text.find_last_not_of(kBlank);
   std::string result;
-  for (const char c : text) {
-    if (c == '&')
+  for (std::size_t i = 0; i < text.size(); ++i) {
+    const char c = text[i];
+    if (first == kNone || i < first || i > last)
+      result += "&#" + std::to_string(static_cast<unsigned char>(c)) + ";";
+    else if (c == '&')
       result += "&amp;";
     else if (c == '<')
       result += "&lt;";

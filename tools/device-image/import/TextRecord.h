@@ -5,6 +5,7 @@
 #include <memory>
 #include <optional>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "deviceimage/Dataclass.h"
@@ -16,8 +17,12 @@ inline constexpr std::size_t kMaximumFileSize = std::size_t{256} << 20U;   // by
 inline constexpr std::size_t kMaximumRecordSize = std::size_t{16} << 20U;  // bytes
 inline constexpr std::size_t kMaximumUIDSize = 1000;                       // bytes
 inline constexpr std::size_t kMaximumFolderDepth = 64;
+inline constexpr std::size_t kMaximumFolderName = 1000;  // bytes
 
-// The folders around a bookmark, outermost first; empty at the top level.
+// The folder of a store that holds the bookmarks which lie in no folder of a file.
+inline constexpr std::string_view kTopBookmarksFolder = "Bookmarks";
+
+// The folders around a bookmark in its store, outermost first; empty at the top level.
 using FolderPath = std::vector<std::string>;
 
 // One record as a reader found it.
