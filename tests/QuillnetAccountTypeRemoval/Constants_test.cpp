@@ -23,6 +23,10 @@ TEST(Constants, PropertyKeysHaveTheTextsOfTheSettingsFile) {
   EXPECT_EQ(kAccountChildAccounts, "ChildAccounts");
 }
 
+TEST(Constants, TheMigrationLockHasTheNameThatOtherProcessesLookAt) {
+  EXPECT_EQ(kAccountMigrationLockFilename, "/tmp/AccountMigrationInProgress");
+}
+
 TEST(Constants, AccountTypesHaveTheTextsOfTheSettingsFile) {
   EXPECT_EQ(kSubscribedCalendarAccountType, "Subscribed Calendar");
   EXPECT_EQ(kCalDAVAccountType, "CalDAV");
