@@ -50,7 +50,9 @@ class PLATFORM_EXPORT FileServices {
   virtual Status synchronizeDirectoryOfFile(const std::string& path) = 0;
   virtual Status removeFile(const std::string& path) = 0;
   // Keeps what is at `path` under the first free name `path` + ".unreadable-" + n (n from 1), with
-  // mode 0600, and leaves `path` as it is. Answers success without a copy when nothing is at
+  // mode 0600; what such a name keeps already is not kept twice. What `path` names and its content
+  // stay, whatever comes of it, but a service may make its mode 0600 too and give it further names.
+  // Nothing that was there before is removed. Answers success without a copy when nothing is at
   // `path`.
   virtual Status setAsideUnreadableFile(const std::string& path) = 0;
 };

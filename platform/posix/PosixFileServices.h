@@ -24,11 +24,13 @@ class PLATFORM_EXPORT PosixFileServices : public FileServices {
   Status synchronizeDirectoryOfFile(const std::string& path) override;
   Status removeFile(const std::string& path) override;
   // A second name (hard link) for what is at `path`, which costs no space and cannot be half done;
-  // so a file's mode becomes 0600 under both names. Of a file that has further names already, or
-  // where the file system has no hard links, a copy with the same owner. A link is kept as a link,
-  // unfollowed, and a FIFO, socket or device as itself, with its mode. A directory fails with
-  // EISDIR: no rename of a file replaces one. What an earlier call has kept already, and nobody
-  // replaced, is not kept twice.
+  // so a file's mode becomes 0600 under both names, and stays so when `path` is not replaced after
+  // all. Of a file that has further names already, or where the file system has no hard links, a
+  // copy with the same owner, made by the other operations of this object. A link is kept as a
+  // link, unfollowed, and a FIFO, socket or device as itself, with its mode. A directory fails with
+  // EISDIR: no rename of a file replaces one. Nothing is kept again that any of the names keeps
+  // already: the very file, or a private copy with the same bytes. A failure may leave a complete
+  // aside behind, never a part of one.
   Status setAsideUnreadableFile(const std::string& path) override;
 };
 

@@ -1,12 +1,19 @@
 // PosixFileServices::setAsideUnreadableFile: what a save is about to replace without having
-// understood it stays beside it under another name.
+// understood it stays beside it under another name, an aside.
 
 #include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <array>
 #include <cerrno>
+#include <charconv>
+#include <filesystem>
+#include <set>
+#include <span>
+#include <string_view>
+#include <system_error>
 
 #include "platform/posix/PosixFileServices.h"
 #include "platform/posix/SystemError.h"
@@ -14,41 +21,133 @@
 namespace platform {
 namespace {
 
-constexpr int kMostCopies = 10000;
-
+constexpr std::string_view kMark = ".unreadable-";
+// How often the directory is looked at when somebody else takes the name that was free.
+constexpr int kAttempts = 8;
 constexpr mode_t kPrivateMode = S_IRUSR | S_IWUSR;
+
+using Buffer = std::array<std::uint8_t, 65536>;
 
 bool isSameFile(const struct stat& a, const struct stat& b) {
   return a.st_dev == b.st_dev && a.st_ino == b.st_ino;
 }
 
-// The first name beside `path` that is free or already names `kept`; empty when there are too many.
-std::string nameForAside(const std::string& path, const struct stat& kept) {
-  for (int n = 1; n <= kMostCopies; ++n) {
-    const std::string name = path + ".unreadable-" + std::to_string(n);
-    struct stat taken = {};
-    if (::lstat(name.c_str(), &taken) != 0) return name;
-    if (isSameFile(taken, kept)) return name;
-  }
-  return {};
+std::string asideName(const std::string& path, unsigned number) {
+  return path + std::string(kMark) + std::to_string(number);
 }
 
-Status copyContents(PosixFileServices& files, int from, int into) {
-  std::array<std::uint8_t, 65536> buffer;
+// The number in the name of an aside of `file`; empty for any other name.
+std::optional<unsigned> asideNumber(std::string_view name, std::string_view file) {
+  if (!name.starts_with(file)) return std::nullopt;
+  name.remove_prefix(file.size());
+  if (!name.starts_with(kMark)) return std::nullopt;
+  name.remove_prefix(kMark.size());
+  unsigned number = 0;
+  const char* const end = name.data() + name.size();
+  const auto [stop, error] = std::from_chars(name.data(), end, number);
+  const bool isPlain = error == std::errc() && stop == end && !name.starts_with('0');
+  return isPlain ? std::optional(number) : std::nullopt;
+}
+
+// The numbers of the asides of `path`, whoever made them.
+Status findAsides(const std::string& path, std::set<unsigned>& numbers) {
+  const std::filesystem::path whole(path);
+  const std::filesystem::path directory = whole.has_parent_path() ? whole.parent_path() : ".";
+  const std::string file = whole.filename();
+  std::error_code error;
+  for (std::filesystem::directory_iterator entry(directory, error), end; !error && entry != end;
+       entry.increment(error)) {
+    const std::string name = entry->path().filename();
+    if (const std::optional<unsigned> number = asideNumber(name, file)) numbers.insert(*number);
+  }
+  if (error) return systemFailure(error.value(), "read", directory);
+  return Status::success();
+}
+
+// A file that is open for reading, if it can be: without waiting, following a link, or taking a
+// terminal for this process's own.
+class OpenedFile {
+ public:
+  explicit OpenedFile(const std::string& path)
+      : _descriptor(
+            ::open(path.c_str(), O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_NOCTTY | O_CLOEXEC)),
+        _errorNumber(_descriptor < 0 || ::fstat(_descriptor, &_status) != 0 ? errno : 0) {}
+  OpenedFile(const OpenedFile&) = delete;
+  OpenedFile& operator=(const OpenedFile&) = delete;
+  ~OpenedFile() {
+    if (_descriptor >= 0) ::close(_descriptor);
+  }
+
+  int errorNumber() const { return _errorNumber; }  // 0 when it is open
+  const struct stat& status() const { return _status; }
+  // As many bytes as there are and fit; fewer at the end of the file only. -1 for an error.
+  ssize_t read(Buffer& buffer) const {
+    std::size_t filled = 0;
+    while (filled < buffer.size()) {
+      const ssize_t count = ::read(_descriptor, buffer.data() + filled, buffer.size() - filled);
+      if (count == 0) break;
+      if (count < 0 && errno == EINTR) continue;
+      if (count < 0) return -1;
+      filled += static_cast<std::size_t>(count);
+    }
+    return static_cast<ssize_t>(filled);
+  }
+
+ private:
+  struct stat _status = {};
+  int _descriptor;
+  int _errorNumber;
+};
+
+bool haveSameBytes(const OpenedFile& a, const OpenedFile& b) {
+  Buffer left;
+  Buffer right;
   for (;;) {
-    const ssize_t count = ::read(from, buffer.data(), buffer.size());
-    if (count == 0) return files.synchronizeFile(into);
-    if (count < 0 && errno == EINTR) continue;
-    if (count < 0) return systemFailure(errno, "read");
-    Status written = files.writeAll(into, std::span(buffer).first(static_cast<std::size_t>(count)));
-    if (!written.isSuccess()) return written;
+    const ssize_t count = a.read(left);
+    if (count < 0 || b.read(right) != count) return false;
+    const auto size = static_cast<std::size_t>(count);
+    if (!std::equal(left.begin(), left.begin() + count, right.begin())) return false;
+    if (size < left.size()) return true;
   }
 }
 
-// Copies the open regular file to the new name `aside`. The owner is kept where this process may
-// give files away: a copy made by the superuser must not become unreadable for the file's owner.
-Status copyOpenFile(PosixFileServices& files, int from, const struct stat& kept,
-                    const std::string& aside) {
+// Whether the aside is as this service leaves one behind, and holds the bytes of the regular file
+// at `path`. When in doubt it does not.
+bool isCopy(const std::string& path, const struct stat& kept, const std::string& aside) {
+  struct stat there = {};
+  if (::lstat(aside.c_str(), &there) != 0 || !S_ISREG(there.st_mode)) return false;
+  const bool isOurs = (there.st_mode & ALLPERMS) == kPrivateMode &&
+                      (there.st_uid == kept.st_uid || there.st_uid == ::geteuid());
+  if (!isOurs || there.st_size != kept.st_size) return false;
+  const OpenedFile original(path);
+  const OpenedFile copy(aside);
+  return original.errorNumber() == 0 && copy.errorNumber() == 0 &&
+         isSameFile(original.status(), kept) && isSameFile(copy.status(), there) &&
+         haveSameBytes(original, copy);
+}
+
+Status copyContents(FileServices& files, const OpenedFile& from, int into) {
+  Buffer buffer;
+  for (;;) {
+    const ssize_t count = from.read(buffer);
+    if (count < 0) return systemFailure(errno, "read");
+    const auto bytes = std::span(buffer).first(static_cast<std::size_t>(count));
+    Status written = files.writeAll(into, bytes);
+    if (!written.isSuccess()) return written;
+    if (bytes.size() < buffer.size()) return files.synchronizeFile(into);
+  }
+}
+
+// Copies the regular file at `path` to the new name `aside`. The owner is kept where this process
+// may give files away: a copy made by the superuser must not become unreadable for the file's
+// owner.
+Status copyFile(FileServices& files, const std::string& path, const struct stat& kept,
+                const std::string& aside) {
+  const OpenedFile from(path);
+  // A link is not opened, so it tells of a file that was replaced as another file does.
+  if (from.errorNumber() == ELOOP || (from.errorNumber() == 0 && !isSameFile(from.status(), kept)))
+    return Status::failure(EBUSY, "cannot keep " + path + ": it was replaced meanwhile");
+  if (from.errorNumber() != 0) return systemFailure(from.errorNumber(), "open", path);
   const FileServices::Opened created = files.createPrivateFile(aside);
   if (!created.status.isSuccess()) return created.status;
   Status outcome = copyContents(files, from, created.descriptor);
@@ -61,43 +160,50 @@ Status copyOpenFile(PosixFileServices& files, int from, const struct stat& kept,
   return outcome;
 }
 
-Status copyFile(PosixFileServices& files, const std::string& path, const struct stat& kept,
-                const std::string& aside) {
-  // Opened without waiting, and compared with what was seen: the name may have been given to
-  // something else meanwhile.
-  const int from = ::open(path.c_str(), O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC);
-  if (from < 0) return systemFailure(errno, "open", path);
-  struct stat opened = {};
-  Status outcome = Status::success();
-  if (::fstat(from, &opened) != 0)
-    outcome = systemFailure(errno, "examine", path);
-  else if (!isSameFile(opened, kept))
-    outcome = systemFailure(EBUSY, "keep", path);
-  else
-    outcome = copyOpenFile(files, from, kept, aside);
-  ::close(from);
-  return outcome;
-}
-
-// Gives what is at `path` the second name `aside`.
-Status linkFile(PosixFileServices& files, const std::string& path, const struct stat& kept,
-                const std::string& aside) {
-  const bool regular = S_ISREG(kept.st_mode);
-  struct stat taken = {};
-  if (::lstat(aside.c_str(), &taken) != 0) {
-    // A changed mode would show under the further names, which are not ours.
-    if (regular && kept.st_nlink > 1) return copyFile(files, path, kept, aside);
-    if (::linkat(AT_FDCWD, path.c_str(), AT_FDCWD, aside.c_str(), 0) != 0) {
-      if (!regular || errno == EEXIST) return systemFailure(errno, "link", path + " to " + aside);
-      return copyFile(files, path, kept, aside);
-    }
-  }
-  if (!regular || (kept.st_mode & ALLPERMS) == kPrivateMode) return Status::success();
+// Takes an aside that is a second name of the file from others' eyes. What is no regular file keeps
+// its mode.
+Status hideFromOthers(const struct stat& kept, const std::string& aside) {
+  if (!S_ISREG(kept.st_mode) || (kept.st_mode & ALLPERMS) == kPrivateMode) return Status::success();
   if (::fchmodat(AT_FDCWD, aside.c_str(), kPrivateMode, AT_SYMLINK_NOFOLLOW) == 0)
     return Status::success();
-  Status failed = systemFailure(errno, "change the mode of", aside);
-  files.removeFile(aside).ignore("the content is still at its first name");
-  return failed;
+  return systemFailure(errno, "change the mode of", aside);
+}
+
+// Makes the new name `aside` for what is at `path`.
+Status makeAside(FileServices& files, const std::string& path, const struct stat& kept,
+                 const std::string& aside) {
+  const bool regular = S_ISREG(kept.st_mode);
+  // A changed mode would show under the further names, which are not ours.
+  if (regular && kept.st_nlink > 1) return copyFile(files, path, kept, aside);
+  if (::linkat(AT_FDCWD, path.c_str(), AT_FDCWD, aside.c_str(), 0) != 0) {
+    const int why = errno;
+    if (!regular || why == EEXIST) return systemFailure(why, "link", path + " to " + aside);
+    return copyFile(files, path, kept, aside);
+  }
+  Status hidden = hideFromOthers(kept, aside);
+  if (!hidden.isSuccess()) files.removeFile(aside).ignore("the content is still at its first name");
+  return hidden;
+}
+
+// All asides are looked at before a name is taken, because one behind a gap may be the right one.
+Status keepFile(FileServices& files, const std::string& path, const struct stat& kept) {
+  std::set<unsigned> numbers;
+  Status found = findAsides(path, numbers);
+  if (!found.isSuccess()) return found;
+  for (const unsigned number : numbers) {
+    const std::string aside = asideName(path, number);
+    struct stat there = {};
+    if (::lstat(aside.c_str(), &there) == 0 && isSameFile(there, kept))
+      return hideFromOthers(kept, aside);
+  }
+  const bool isKept =
+      S_ISREG(kept.st_mode) && std::any_of(numbers.begin(), numbers.end(), [&](unsigned number) {
+        return isCopy(path, kept, asideName(path, number));
+      });
+  if (isKept) return Status::success();
+  unsigned free = 1;
+  while (numbers.contains(free)) ++free;
+  return makeAside(files, path, kept, asideName(path, free));
 }
 
 }  // namespace
@@ -109,11 +215,10 @@ Status PosixFileServices::setAsideUnreadableFile(const std::string& path) {
     return systemFailure(errno, "examine", path);
   }
   if (S_ISDIR(kept.st_mode)) return systemFailure(EISDIR, "keep", path);
-  const std::string aside = nameForAside(path, kept);
-  if (aside.empty()) return systemFailure(EEXIST, "keep", path);
-  PosixFileServices files;  // the inner steps are nobody's to override
-  const Status outcome = linkFile(files, path, kept, aside);
-  return outcome.isSuccess() ? files.synchronizeDirectoryOfFile(path) : outcome;
+  Status outcome = keepFile(*this, path, kept);
+  for (int attempt = 1; outcome.code == EEXIST && attempt < kAttempts; ++attempt)
+    outcome = keepFile(*this, path, kept);
+  return outcome.isSuccess() ? synchronizeDirectoryOfFile(path) : outcome;
 }
 
 }  // namespace platform

@@ -8,7 +8,9 @@
 namespace platform {
 
 // The real file services, with a journal and calls that fail. A planned failure without
-// `carriedOut` leaves the files as they are; a close that fails closes all the same.
+// `carriedOut` leaves the files as they are; a close that fails closes all the same. A creation
+// that is carried out and fails leaves the file behind, closed. The steps of setAsideUnreadableFile
+// are calls of their own.
 class JournaledFileServices : public PosixFileServices, public FakeService {
  public:
   propertylist::FileReadResult readPropertyListFile(const std::string& path) override;

@@ -2,7 +2,10 @@
 
 #include <gtest/gtest.h>
 
+#include <cerrno>
 #include <stdexcept>
+
+#include "platform/testing/TemporaryDirectory.h"
 
 namespace platform {
 namespace {
@@ -134,6 +137,25 @@ TEST(InMemoryRunLoop, LetsTimePassAtOnce) {
   EXPECT_EQ(services().clock.absoluteTime(), 5.0);
   EXPECT_EQ(slices, 20);
   EXPECT_EQ(device.runLoop.calls().front(), "runForAtMost(250 ms)");
+}
+
+TEST(JournaledFileServices, CarryOutACreationWhoseAnswerIsPlanned) {
+  const TemporaryDirectory directory;
+  JournaledFileServices files;
+  files.answerNext("createPrivateFile", {Status::failure(EIO, "injected"), true});
+  const auto failed = files.createPrivateFile(directory.path() + "/failed");
+  EXPECT_EQ(failed.status.code, EIO);
+  EXPECT_EQ(failed.descriptor, -1);
+  EXPECT_TRUE(files.fileExists(directory.path() + "/failed"));
+
+  files.answerNext("createPrivateFile", {Status::success(), true});
+  const auto made = files.createPrivateFile(directory.path() + "/made");
+  EXPECT_TRUE(made.status.isSuccess());
+  EXPECT_TRUE(files.closeFile(made.descriptor).isSuccess());
+
+  files.failNext("createPrivateFile");
+  EXPECT_EQ(files.createPrivateFile(directory.path() + "/not made").descriptor, -1);
+  EXPECT_FALSE(files.fileExists(directory.path() + "/not made"));
 }
 
 }  // namespace
