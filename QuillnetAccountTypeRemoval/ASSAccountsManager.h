@@ -124,6 +124,12 @@ class ASSAccountsManager {
 
   // Writes every account, merged with what the file holds by now, in one step: a reader sees the
   // old or the new file. When anything fails the file stays as it is, one line is logged and
+  //
+  // A file that cannot be read now, or could not be when this store was made from it, is kept under
+  // another name beside it (FileServices::setAsideUnreadableFile); where that fails, so does the
+  // save. Each account is merged with what accountWithIdentifier answers for its identifier in a
+  // store of the file: of several accounts with one identifier each is written, and each merged
+  // with the last one in the file; an identifier that is a child's there gives the child's parent.
   // nothing is returned. Accounts that another process added meanwhile are not carried over.
   void saveAllAccounts();
   // One account's properties out of three versions: what changed in memory since `original` wins,
@@ -258,7 +264,8 @@ class ASSAccountsManager {
   std::map<std::string, propertylist::Dictionary, std::less<>> originalAccountsByID_;
   std::int64_t dataVersion_ = 0;
   std::vector<RuntimeFixerPtr> runtimeFixers_;
-  // The file exists and could not be read as a dictionary when this store read it.
+  // The file existed and could not be read as a dictionary when this store was made from it. What
+  // it held is then neither in memory nor known to have been empty, until a save has replaced it.
   bool settingsFileIsUnreadable_ = false;
 };
 

@@ -94,10 +94,12 @@ void ASSAccountsManager::saveAllAccounts() {
     // What another process wrote since this store was loaded.
     const AccountsManagerPtr onDisk = initInsideOfMigration();
     const Dictionary root{{"Accounts", _mergedAccounts(*onDisk)}, {"Version", currentVersion()}};
-    saved = writeSettingsFile(root, fullPathToAccountSettingsPlist(),
-                              onDisk->settingsFileIsUnreadable_);
+    // The file may be readable by now, with accounts that this store never saw.
+    const bool holdsWhatNobodyRead = settingsFileIsUnreadable_ || onDisk->settingsFileIsUnreadable_;
+    saved = writeSettingsFile(root, fullPathToAccountSettingsPlist(), holdsWhatNobodyRead);
   }
   if (saved) {
+    settingsFileIsUnreadable_ = false;
     // From here on, what is in memory counts as known to the file, also where the file kept values
     // of its own: they stay on disk and are not taken into memory.
     for (const AccountPtr& account : *orderedTopLevelAccounts_)

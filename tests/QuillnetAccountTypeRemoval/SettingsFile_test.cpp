@@ -2,6 +2,8 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
+#include <cerrno>
 #include <filesystem>
 #include <fstream>
 #include <iterator>
@@ -196,6 +198,69 @@ TEST_F(SettingsFile, ThatWasReadOrWasNotThereIsNotSetAside) {
   saveOneAccount();
   EXPECT_EQ(namesBesideTheSettings(), (Lines{"com.vantor.accountsettings.plist"}));
   EXPECT_EQ(device.countOfFileCalls("setAsideUnreadableFile"), 0U);
+}
+
+// Only the store's own reading failed, as by a disk that answered the second time.
+TEST_F(SettingsFile, ThatTheStoreCouldNotReadIsSetAsideThoughTheSaveCanReadIt) {
+  device.writeAccounts({accountInfo("never seen")});
+  const std::string bytes = *device.readSettingsBytes();
+  device.fileServices.failNext("readPropertyListFile(" + device.settingsPath());
+  const AccountsManagerPtr store = ASSAccountsManager::init();
+  ASSERT_EQ(store->count(), 0U);
+  store->insertAccount(ASSBasicAccount::initWithProperties(accountInfo("1")));
+
+  device.fileServices.failNext("renameFileToFile");
+  store->saveAllAccounts();
+  EXPECT_EQ(device.readSettingsBytes(), bytes);
+
+  store->saveAllAccounts();
+  EXPECT_EQ(identifiersOf(device.savedAccounts()), (Lines{"1"}));
+  EXPECT_EQ(contentOf(aside(1)), bytes);
+
+  store->saveAllAccounts();  // the file is this store's own by now
+  EXPECT_EQ(namesBesideTheSettings(), (Lines{"com.vantor.accountsettings.plist",
+                                             "com.vantor.accountsettings.plist.unreadable-1"}));
+  EXPECT_EQ(device.countOfFileCalls("setAsideUnreadableFile"), 2U);
+}
+
+TEST_F(SettingsFile, ThatIsUnreadableIsKeptWholeAndOnceWhicheverFileCallFails) {
+  const std::string unreadable = "no property list";
+  Lines walked;
+  saveOneAccount();  // the catalogues are read by now
+  for (int n = 1; n < 100; ++n) {
+    SCOPED_TRACE(n);
+    fs::remove(aside(1));
+    fs::remove(device.settingsPath());
+    device.writeSettingsBytes(unreadable);
+    fs::remove(device.root() + "/other name");
+    fs::create_hard_link(device.settingsPath(), device.root() + "/other name");  // so it is copied
+
+    std::string failed;
+    device.fileServices.decideBy(
+        [&failed, n,
+         count = 0](const std::string& call) mutable -> std::optional<platform::PlannedAnswer> {
+          if (++count != n) return std::nullopt;
+          failed = call.substr(0, call.find('('));
+          return platform::PlannedAnswer{Status::failure(EIO, "injected"), false};
+        });
+    saveOneAccount();
+    device.fileServices.decideBy(nullptr);
+    if (failed.empty()) break;  // every call had its turn
+    walked.push_back(failed);
+    const bool saved = device.readSettingsBytes() != unreadable;
+    EXPECT_TRUE(!saved || contentOf(aside(1)) == unreadable) << failed;
+    EXPECT_TRUE(!fs::exists(aside(1)) || contentOf(aside(1)) == unreadable) << failed;
+
+    saveOneAccount();  // without the fault
+    EXPECT_EQ(contentOf(aside(1)), unreadable);
+    EXPECT_FALSE(fs::exists(aside(2)));
+    EXPECT_EQ(identifiersOf(device.savedAccounts()), (Lines{"1"}));
+    EXPECT_EQ(device.temporaryFiles(), Lines());
+  }
+  const Lines copying = {"setAsideUnreadableFile", "createPrivateFile", "writeAll",
+                         "synchronizeFile"};
+  EXPECT_NE(std::search(walked.begin(), walked.end(), copying.begin(), copying.end()),
+            walked.end());
 }
 
 TEST_F(SettingsFile, EachUnreadableOneIsKeptUnderANumberOfItsOwn) {
