@@ -2,6 +2,7 @@
 
 #include <map>
 #include <mutex>
+#include <utility>
 
 namespace platform {
 namespace {
@@ -21,8 +22,10 @@ Registry& registry() {
 }  // namespace
 
 void registerClass(RuntimeClass& registered) {
+  // Asked before the lock is taken: it is the bundle's code, which may use the registry itself.
+  std::string name = registered.className();
   const std::lock_guard lock(registry().mutex);
-  registry().classes.emplace(registered.className(), &registered);
+  registry().classes.emplace(std::move(name), &registered);
 }
 
 RuntimeClass* registeredClass(std::string_view name) {

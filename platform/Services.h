@@ -47,10 +47,13 @@ struct Services {
 };
 
 // Installs the services of this process, which outlive everything that uses them. Called before a
-// plug-in is created; a test may install others later.
+// plug-in is created; a test may install others later. No lock is taken: while it runs, no other
+// thread may call it or services(), or use what services() answered before. What happens before it
+// on other threads, and what they do after it, the caller puts in order, as by starting them later.
 PLATFORM_EXPORT void install(const Services& services);
 
-// The installed services. An InternalConsistencyFailure when none are.
+// The installed services. An InternalConsistencyFailure when none are. Any thread, but not during
+// install.
 PLATFORM_EXPORT const Services& services();
 
 }  // namespace platform

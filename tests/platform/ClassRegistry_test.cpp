@@ -23,6 +23,26 @@ TEST(RegisteredClass, IsTheFirstThatTookTheName) {
   EXPECT_EQ(registeredClass("Name"), &first);
 }
 
+// Registers another class while it tells its name, as a class does whose name is in a bundle that
+// is loaded for it.
+struct RegisteringClass : NamedClass {
+  RegisteringClass(std::string given, RuntimeClass& first)
+      : NamedClass(std::move(given)), other(first) {}
+  std::string className() const override {
+    registerClass(other);
+    return registeredClass(other.className()) == &other ? name : "nobody";
+  }
+  RuntimeClass& other;
+};
+
+TEST(RegisteredClass, MayUseTheRegistryWhileItTellsItsName) {
+  static NamedClass inner("Inner");
+  static RegisteringClass outer("Outer", inner);
+  registerClass(outer);
+  EXPECT_EQ(registeredClass("Outer"), &outer);
+  EXPECT_EQ(registeredClass("Inner"), &inner);
+}
+
 TEST(RegisteredClass, IsFoundWhileOtherThreadsRegister) {
   constexpr int kThreads = 4;
   constexpr int kClasses = 200;
