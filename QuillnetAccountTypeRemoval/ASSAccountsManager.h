@@ -9,7 +9,6 @@
 #include <set>
 #include <string>
 #include <string_view>
-#include <unordered_map>
 #include <vector>
 
 #include "QuillnetAccountTypeRemoval/ASSBasicAccount.h"
@@ -260,7 +259,7 @@ class ASSAccountsManager {
   std::map<std::string, std::string, std::less<>> childAccountIDToParentAccountID_;
   // The same map the other way round, so that one parent's children are found without a walk over
   // all.
-  std::unordered_map<std::string, std::set<std::string>> childIDsByParentID_;
+  std::map<std::string, std::set<std::string>> childIDsByParentID_;
   std::map<std::string, propertylist::Dictionary, std::less<>> originalAccountsByID_;
   std::int64_t dataVersion_ = 0;
   std::vector<RuntimeFixerPtr> runtimeFixers_;

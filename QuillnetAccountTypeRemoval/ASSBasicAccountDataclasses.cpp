@@ -3,7 +3,6 @@
 #include <algorithm>
 #include <array>
 #include <set>
-#include <unordered_set>
 
 #include "QuillnetAccountTypeRemoval/ASSBasicAccount.h"
 #include "platform/Services.h"
@@ -17,7 +16,7 @@ namespace {
 // The members of `dataclasses` that are (not) among `others`, in order.
 StringList filtered(const StringList& dataclasses, const StringList& others,
                     bool keepThoseInOthers) {
-  const std::unordered_set<std::string_view> members(others.begin(), others.end());
+  const std::set<std::string_view> members(others.begin(), others.end());
   StringList kept;
   for (const std::string& dataclass : dataclasses) {
     if (members.contains(dataclass) == keepThoseInOthers) kept.push_back(dataclass);
@@ -28,7 +27,7 @@ StringList filtered(const StringList& dataclasses, const StringList& others,
 }  // namespace
 
 StringList ASSBasicAccount::_orderedDataclasses(const StringList& dataclasses) {
-  const std::unordered_set<std::string_view> present(dataclasses.begin(), dataclasses.end());
+  const std::set<std::string_view> present(dataclasses.begin(), dataclasses.end());
   const StringList& known = allSupportedDataclasses();
   StringList ordered;
   for (const std::string& dataclass : known) {

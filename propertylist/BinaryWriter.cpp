@@ -16,7 +16,7 @@ using namespace binary;
 
 namespace {
 
-// Texts and data up to this size are hashed faster than they are looked up by address as well.
+// Texts and data up to this size are found faster by content than by address and content.
 constexpr std::size_t kShort = 64;
 
 // The sizes that offsets and references come in.

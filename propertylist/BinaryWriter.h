@@ -63,9 +63,11 @@ class BinaryWriter {
   const Value& _value;
   std::vector<Object> _objects;
   std::vector<Number> _references;
-  // Numbers by content; a long text or data is looked up by its address first.
-  std::unordered_map<std::string_view, Number> _texts;
-  std::unordered_map<std::string_view, Number> _datas;
+  // Numbers by content; a long text or data is looked up by its address first. The contents are
+  // ordered, not hashed, because whoever wrote a file that was read may have chosen ones that
+  // collide.
+  std::map<std::string_view, Number> _texts;
+  std::map<std::string_view, Number> _datas;
   std::unordered_map<const void*, Number> _byAddress;
   std::map<Scalar, Number> _scalars;
   std::vector<std::uint64_t> _offsets;

@@ -1,6 +1,6 @@
+#include <map>
 #include <memory>
 #include <string>
-#include <unordered_map>
 #include <utility>
 #include <vector>
 
@@ -140,7 +140,9 @@ class XMLReader {
   XMLScanner _scanner;
   std::vector<Container> _open;
   std::optional<Value> _top;
-  std::unordered_map<std::string, std::shared_ptr<const std::string>> _keys;
+  // Ordered: whoever writes a file may choose keys that would all meet in one place of a hash
+  // table.
+  std::map<std::string, std::shared_ptr<const std::string>> _keys;
 };
 
 }  // namespace

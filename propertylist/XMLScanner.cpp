@@ -1,7 +1,7 @@
 #include "propertylist/XMLScanner.h"
 
 #include <algorithm>
-#include <unordered_set>
+#include <set>
 
 #include "propertylist/UTF8.h"
 
@@ -152,7 +152,7 @@ std::optional<XMLScanner::Tag> XMLScanner::readTag() {
 
 // Reads attributes up to and with `end`, or "/>" for a tag's.
 bool XMLScanner::_readAttributes(std::string_view end, std::string* encoding) {
-  std::unordered_set<std::string_view> names;
+  std::set<std::string_view> names;  // not hashed: a file may hold names that collide
   while (true) {
     const bool isSeparate = _readBlanks();
     if (_accept(end) || (end == ">" && _accept("/>"))) return true;
