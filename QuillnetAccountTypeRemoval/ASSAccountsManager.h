@@ -123,13 +123,13 @@ class ASSAccountsManager {
 
   // Writes every account, merged with what the file holds by now, in one step: a reader sees the
   // old or the new file. When anything fails the file stays as it is, one line is logged and
+  // nothing is returned. Accounts that another process added meanwhile are not carried over.
   //
   // A file that cannot be read now, or could not be when this store was made from it, is kept under
   // another name beside it (FileServices::setAsideUnreadableFile); where that fails, so does the
   // save. Each account is merged with what accountWithIdentifier answers for its identifier in a
   // store of the file: of several accounts with one identifier each is written, and each merged
   // with the last one in the file; an identifier that is a child's there gives the child's parent.
-  // nothing is returned. Accounts that another process added meanwhile are not carried over.
   void saveAllAccounts();
   // One account's properties out of three versions: what changed in memory since `original` wins,
   // key by key, and what did not change follows `onDisk`. Without `original` or `onDisk`, absent or
@@ -199,8 +199,8 @@ class ASSAccountsManager {
   // Change records by the name of the notifier class that is to hear of them.
   using NotificationTable = std::map<std::string, propertylist::Array>;
 
-  static StringList _notifierClassNamesForAccountTypeDataclass(const std::string& type,
-                                                               std::string_view dataclass);
+  static StringList _notifierClassNamesForAccountTypeDataclass(
+      const std::optional<std::string>& type, std::string_view dataclass);
   // Adds a record for every notifier that serves a dataclass which the change affects: one for
   // each, however many dataclasses it serves. Compares what is stored, not what is provisioned or
   // allowed.

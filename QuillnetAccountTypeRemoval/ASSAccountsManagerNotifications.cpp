@@ -83,7 +83,7 @@ AccountChangeRecord changeRecord(AccountChangeType change, const std::string* id
   return record;
 }
 
-void loadFramework(const Dictionary& description, const std::string& type) {
+void loadFramework(const Dictionary& description, const std::optional<std::string>& type) {
   const std::string* framework = propertylist::findString(description, "Framework");
   if (framework == nullptr)
     raiseAssertionFailure(kSourceFile, kNoFrameworkLine,
@@ -113,9 +113,9 @@ std::atomic<bool> ASSAccountsManager::shouldSkipNotifications = true;
 void ASSAccountsManager::_setShouldSkipNotifications(bool skip) { shouldSkipNotifications = skip; }
 
 StringList ASSAccountsManager::_notifierClassNamesForAccountTypeDataclass(
-    const std::string& type, std::string_view dataclass) {
+    const std::optional<std::string>& type, std::string_view dataclass) {
   const std::optional<Dictionary>& map = ASSBasicAccount::_accountCreationMap();
-  const Array* entries = map ? propertylist::findArray(*map, type) : nullptr;
+  const Array* entries = map ? propertylist::findArray(*map, type.value_or("")) : nullptr;
   if (entries == nullptr)
     raiseAssertionFailure(kSourceFile, kNoEntryLine,
                           "Malformed AccountCreators information. Could not find the information "
@@ -147,7 +147,7 @@ StringList ASSAccountsManager::_notifierClassNamesForAccountTypeDataclass(
 void ASSAccountsManager::accountWillChangeForDataclass(const AccountPtr& account,
                                                        std::string_view dataclass) {
   for (const std::string& name :
-       _notifierClassNamesForAccountTypeDataclass(account->type().value_or(""), dataclass)) {
+       _notifierClassNamesForAccountTypeDataclass(account->type(), dataclass)) {
     platform::RuntimeClass& found = notifierClass(name, kWillChangeLine);
     if (auto* const notifier = dynamic_cast<AccountWillChangeNotifier*>(&found))
       notifier->accountWillChangeForDataclass(account->identifier().value_or(""), dataclass);
@@ -157,7 +157,7 @@ void ASSAccountsManager::accountWillChangeForDataclass(const AccountPtr& account
 void ASSAccountsManager::accountDidChangeForDataclass(const AccountPtr& account,
                                                       std::string_view dataclass) {
   for (const std::string& name :
-       _notifierClassNamesForAccountTypeDataclass(account->type().value_or(""), dataclass)) {
+       _notifierClassNamesForAccountTypeDataclass(account->type(), dataclass)) {
     platform::RuntimeClass& found = notifierClass(name, kDidChangeLine);
     if (auto* const notifier = dynamic_cast<AccountDidChangeNotifier*>(&found))
       notifier->accountDidChangeForDataclass(account->identifier().value_or(""), dataclass);
@@ -173,7 +173,7 @@ void ASSAccountsManager::
   std::set<std::string> names;
   for (const std::string& dataclass : affectedDataclasses(change, original, current)) {
     for (std::string& name : _notifierClassNamesForAccountTypeDataclass(
-             type != nullptr ? *type : std::string(), dataclass))
+             type != nullptr ? std::optional(*type) : std::nullopt, dataclass))
       names.insert(std::move(name));
   }
   for (const std::string& name : names)

@@ -168,11 +168,12 @@ class ASSBasicAccount : public platform::Describable,
   void setFullAccount(const FullAccountPtr& account);
   // The name of the class that creates full (sync) accounts of the type; empty when nobody does.
   // Loads the bundle of every entry that matches; the last one's class counts. Malformed entries
-  // are an InternalConsistencyFailure.
+  // are an InternalConsistencyFailure, and so is a type without any entry. A missing type is looked
+  // up as the empty one.
   std::optional<std::string> fullAccountCreatorClassNameForAccountTypeLoader(
-      const std::string& type, FullAccountLoader* loader) const;
+      const std::optional<std::string>& type, FullAccountLoader* loader) const;
   std::optional<std::string> syncAccountCreatorClassNameForAccountType(
-      const std::string& type) const;
+      const std::optional<std::string>& type) const;
   // Have the sync account refresh one container, the list of containers, or all containers of a
   // dataclass; what it answers, and false without one. The short forms pass false to the long ones
   // of the same record.
@@ -213,7 +214,8 @@ class ASSBasicAccount : public platform::Describable,
   // Reads that catalogue afresh.
   static std::optional<propertylist::Dictionary> _creatorsInfo();
   std::optional<std::string> _creatorClassNameForAccountTypeCreatorTypeLoader(
-      const std::string& type, std::string_view creatorType, FullAccountLoader* loader) const;
+      const std::optional<std::string>& type, std::string_view creatorType,
+      FullAccountLoader* loader) const;
   // The sync account, made at the first call and then kept; null when the type has no creator of
   // one, and, with a log line, when it could not be made. A malformed catalogue is an
   // InternalConsistencyFailure here too.

@@ -25,7 +25,7 @@ std::once_flag creatorsOnce;
 std::optional<Dictionary> CreatorsCatalog;
 
 void loadFramework(const Dictionary& description, std::string_view creatorType,
-                   const std::string& type) {
+                   const std::optional<std::string>& type) {
   const std::string* framework = propertylist::findString(description, "Framework");
   if (framework == nullptr)
     raiseAssertionFailure(kSourceFile, __LINE__,
@@ -63,9 +63,10 @@ const std::optional<Dictionary>& ASSBasicAccount::_accountCreationMap() {
 }
 
 std::optional<std::string> ASSBasicAccount::_creatorClassNameForAccountTypeCreatorTypeLoader(
-    const std::string& type, std::string_view creatorType, FullAccountLoader* loader) const {
+    const std::optional<std::string>& type, std::string_view creatorType,
+    FullAccountLoader* loader) const {
   const std::optional<Dictionary>& map = _accountCreationMap();
-  const Array* entries = map ? propertylist::findArray(*map, type) : nullptr;
+  const Array* entries = map ? propertylist::findArray(*map, type.value_or("")) : nullptr;
   if (entries == nullptr)
     raiseAssertionFailure(kSourceFile, __LINE__,
                           "Malformed AccountCreators information. Could not find the information "
@@ -99,18 +100,18 @@ std::optional<std::string> ASSBasicAccount::_creatorClassNameForAccountTypeCreat
 }
 
 std::optional<std::string> ASSBasicAccount::fullAccountCreatorClassNameForAccountTypeLoader(
-    const std::string& type, FullAccountLoader* loader) const {
+    const std::optional<std::string>& type, FullAccountLoader* loader) const {
   return _creatorClassNameForAccountTypeCreatorTypeLoader(type, kFullAccountCreator, loader);
 }
 
 std::optional<std::string> ASSBasicAccount::syncAccountCreatorClassNameForAccountType(
-    const std::string& type) const {
+    const std::optional<std::string>& type) const {
   return _creatorClassNameForAccountTypeCreatorTypeLoader(type, kSyncAccountCreator, nullptr);
 }
 
 FullAccountPtr ASSBasicAccount::fullAccountUsingLoader(FullAccountLoader* loader) {
   if (fullAccount_) return fullAccount_;
-  const std::string accountType = type().value_or("");
+  const std::optional<std::string> accountType = type();
   const std::optional<std::string> name =
       fullAccountCreatorClassNameForAccountTypeLoader(accountType, loader);
   platform::RuntimeClass* const creator = classNamed(name);
@@ -119,7 +120,8 @@ FullAccountPtr ASSBasicAccount::fullAccountUsingLoader(FullAccountLoader* loader
                           "The framework/bundle where %@ is defined has not been loaded", name);
   FullAccountPtr created;
   if (auto* const naming = dynamic_cast<FullAccountClassCreator*>(creator)) {
-    auto* const named = dynamic_cast<FullAccountClass*>(naming->classForAccountType(accountType));
+    auto* const named =
+        dynamic_cast<FullAccountClass*>(naming->classForAccountType(accountType.value_or("")));
     if (named != nullptr) created = named->initWithProperties(properties_);
   } else if (auto* const making = dynamic_cast<FullAccountCreator*>(creator)) {
     created = making->accountWithBasicAccount(shared_from_this());
@@ -137,8 +139,7 @@ void ASSBasicAccount::setFullAccount(const FullAccountPtr& account) { fullAccoun
 
 SyncAccountPtr ASSBasicAccount::_cachedSyncAccount() {
   if (syncAccount_) return syncAccount_;
-  const std::optional<std::string> name =
-      syncAccountCreatorClassNameForAccountType(type().value_or(""));
+  const std::optional<std::string> name = syncAccountCreatorClassNameForAccountType(type());
   if (!name) return nullptr;
   platform::RuntimeClass* const found = classNamed(name);
   if (found == nullptr) {

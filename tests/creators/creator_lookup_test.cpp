@@ -51,6 +51,16 @@ TEST_F(CreatorLookup, NeedsAListForTheType) {
       kSourceFile, [&] { account->syncAccountCreatorClassNameForAccountType("CalDAV"); });
 }
 
+TEST_F(CreatorLookup, NamesAMissingTypeAsSuch) {
+  device.setCreators({{"Mail", Array{}}});
+  const std::string text =
+      "Malformed AccountCreators information. Could not find the information for the type (null)";
+  const auto account = calendarAccount();
+  account->removeAccountPropertyForKey("Type");
+  expectAssertionFailure(text, kSourceFile, [&] { account->fullAccountUsingLoader(nullptr); });
+  expectAssertionFailure(text, kSourceFile, [&] { account->_cachedSyncAccount(); });
+}
+
 TEST_F(CreatorLookup, LoadsEveryMatchingBundleAndAnswersTheLastClass) {
   device.setCreators({{"CalDAV", Array{creator("SyncAccount", kFullAccounts, "First"),
                                        creator("SyncAccount", kSyncAccounts, "Second")}}});

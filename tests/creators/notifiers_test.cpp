@@ -19,6 +19,25 @@ TEST_F(Notifiers, NeedAListForTheType) {
       820, [] { namesFor("CalDAV", kContacts); });
 }
 
+TEST_F(Notifiers, NameAMissingTypeAsSuch) {
+  device.setCreators({{"Mail", Array{}}});
+  const std::string text =
+      "Malformed AccountCreators information. Could not find the information for the type (null)";
+  const auto account = calendarAccount();
+  account->removeAccountPropertyForKey("Type");
+  expectStoreFailure(
+      text, 820, [&] { ASSAccountsManager::accountWillChangeForDataclass(account, kContacts); });
+  expectStoreFailure(text, 820,
+                     [&] { ASSAccountsManager::accountDidChangeForDataclass(account, kContacts); });
+  expectStoreFailure(text, 820, [] {
+    TellingStore::NotificationTable table;
+    TellingStore::ofFile()
+        ->_addNotificationToDictionaryForChangeTypeOriginalPropertiesCurrentProperties(
+            table, AccountChangeType::added, std::nullopt,
+            Dictionary{{"Enabled Dataclasses", Array{kContacts}}});
+  });
+}
+
 TEST_F(Notifiers, AreAllTakenInOrderWithDuplicatesKept) {
   device.setCreators(
       {{"CalDAV", Array{notifier("Z", {kContacts}), notifier("A", {kNotes}),
