@@ -28,7 +28,8 @@ class Descriptor {
 int openForReading(const std::string& path) {
   int descriptor = -1;
   do {
-    descriptor = ::open(path.c_str(), O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC);
+    // A terminal at the path must not become this process's own.
+    descriptor = ::open(path.c_str(), O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_NOCTTY | O_CLOEXEC);
   } while (descriptor < 0 && errno == EINTR);
   return descriptor;
 }
@@ -43,6 +44,16 @@ ssize_t readOnce(int descriptor, std::span<std::uint8_t> buffer) {
 }
 
 std::string systemError(int number) { return std::system_category().message(number); }
+
+// Why `path` could not be opened. The system gives one number for a link as its last part and for
+// too many links before that.
+std::string openingError(int number, const std::string& path) {
+  struct stat status {};
+  if (number != ELOOP) return systemError(number);
+  return ::lstat(path.c_str(), &status) == 0 && S_ISLNK(status.st_mode)
+             ? "a symbolic link, which is not followed"
+             : "behind more symbolic links than are followed";
+}
 
 FileReadResult failure(bool exists, const std::string& path, const std::string& why) {
   return {std::nullopt, exists, path + ": " + why};
@@ -80,8 +91,7 @@ FileReadResult readPropertyListFile(const std::string& path) {
   if (file.number() < 0) {
     const int why = errno;
     const bool exists = why != ENOENT && why != ENOTDIR;
-    return failure(exists, path,
-                   why == ELOOP ? "a symbolic link, which is not followed" : systemError(why));
+    return failure(exists, path, openingError(why, path));
   }
   struct stat status {};
   if (::fstat(file.number(), &status) != 0) return failure(true, path, systemError(errno));

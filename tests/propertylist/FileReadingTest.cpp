@@ -1,8 +1,10 @@
 #include <fcntl.h>
 #include <gtest/gtest.h>
 #include <sys/stat.h>
+#include <sys/wait.h>
 #include <unistd.h>
 
+#include <cstdlib>
 #include <filesystem>
 #include <fstream>
 
@@ -65,6 +67,36 @@ TEST_F(FileReading, DoesNotFollowALinkInTheLastPartOfThePath) {
   std::filesystem::create_directory_symlink(folder, folder / "here");
   EXPECT_EQ(errorOf((folder / "link").string(), true), "a symbolic link, which is not followed");
   EXPECT_EQ(readPropertyListFile((folder / "here" / "list").string()).value, Value(1));
+}
+
+TEST_F(FileReading, TellsTooManyLinksOnTheWayFromALinkAtItsEnd) {
+  std::filesystem::create_symlink("loop", folder / "loop");
+  EXPECT_EQ(errorOf((folder / "loop" / "list").string(), true),
+            "behind more symbolic links than are followed");
+  EXPECT_EQ(errorOf((folder / "loop").string(), true), "a symbolic link, which is not followed");
+}
+
+// Reads the terminal at `path` in a process without one. 0 when it has none after that.
+int readTerminalInASessionOfItsOwn(const std::string& path) {
+  const pid_t child = ::fork();
+  if (child == 0) {
+    if (::setsid() < 0) ::_exit(2);
+    const FileReadResult result = readPropertyListFile(path);
+    if (result.error != path + ": not a regular file") ::_exit(3);
+    ::_exit(::open("/dev/tty", O_RDONLY | O_CLOEXEC) < 0 ? 0 : 1);
+  }
+  int status = 0;
+  EXPECT_EQ(::waitpid(child, &status, 0), child);
+  return WIFEXITED(status) ? WEXITSTATUS(status) : -1;
+}
+
+TEST_F(FileReading, DoesNotMakeATerminalTheProcesssOwn) {
+  const int terminal = ::posix_openpt(O_RDWR | O_NOCTTY | O_CLOEXEC);
+  if (terminal < 0) GTEST_SKIP() << "there are no terminals here";
+  ASSERT_EQ(::grantpt(terminal), 0);
+  ASSERT_EQ(::unlockpt(terminal), 0);
+  EXPECT_EQ(readTerminalInASessionOfItsOwn(::ptsname(terminal)), 0);
+  ::close(terminal);
 }
 
 TEST_F(FileReading, DoesNotWaitForAPipeNorReadAnythingButAFile) {
