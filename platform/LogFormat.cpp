@@ -2,8 +2,6 @@
 
 #include <algorithm>
 
-#include "propertylist/Writing.h"
-
 namespace platform {
 namespace {
 
@@ -16,10 +14,10 @@ std::string_view conversionAtStart(std::string_view rest) {
   return {};
 }
 
-std::string converted(std::string_view conversion, const LogArgument& argument) {
+std::string converted(std::string_view conversion, const LogArgument& argument, std::size_t limit) {
   if (conversion == "%d") return std::to_string(static_cast<std::int32_t>(argument.number()));
   if (conversion == "%ld") return std::to_string(argument.number());
-  return argument.text();
+  return argument.text(limit);
 }
 
 }  // namespace
@@ -76,22 +74,24 @@ LogArgument::LogArgument(const Describable* object) {
   if (object != nullptr) *this = *object;
 }
 
-std::string LogArgument::text() const {
+std::string LogArgument::text(std::size_t limit) const {
   switch (_form) {
     case Form::text:
-      return std::string(_text);
+      return propertylist::shortened(_text, limit);
     case Form::number:
       return std::to_string(_number);
     case Form::unsignedNumber:
       return std::to_string(static_cast<std::uint64_t>(_number));
     case Form::value:
-      return propertylist::describe(*static_cast<const propertylist::Value*>(_referent));
+      return propertylist::describe(*static_cast<const propertylist::Value*>(_referent), limit);
     case Form::dictionary:
-      return propertylist::describe(*static_cast<const propertylist::Dictionary*>(_referent));
+      return propertylist::describe(*static_cast<const propertylist::Dictionary*>(_referent),
+                                    limit);
     case Form::array:
-      return propertylist::describe(*static_cast<const propertylist::Array*>(_referent));
+      return propertylist::describe(*static_cast<const propertylist::Array*>(_referent), limit);
     case Form::object:
-      return static_cast<const Describable*>(_referent)->description();
+      return propertylist::shortened(static_cast<const Describable*>(_referent)->description(),
+                                     limit);
     case Form::none:
       break;
   }
@@ -100,7 +100,8 @@ std::string LogArgument::text() const {
 
 std::int64_t LogArgument::number() const { return _number; }
 
-std::string formatLogLine(std::string_view format, std::initializer_list<LogArgument> arguments) {
+std::string formatLogLine(std::string_view format, std::initializer_list<LogArgument> arguments,
+                          std::size_t limit) {
   std::string line;
   const LogArgument* next = arguments.begin();
   while (!format.empty()) {
@@ -114,7 +115,7 @@ std::string formatLogLine(std::string_view format, std::initializer_list<LogArgu
     else if (next == arguments.end())
       line += kNothing;
     else
-      line += converted(conversion, *next++);
+      line += converted(conversion, *next++, limit);
     format.remove_prefix(conversion.empty() ? 1 : conversion.size());
   }
   return line;

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 #include <initializer_list>
 #include <memory>
@@ -10,6 +11,7 @@
 #include "platform/Export.h"
 #include "platform/Status.h"
 #include "propertylist/Value.h"
+#include "propertylist/Writing.h"
 
 namespace platform {
 
@@ -48,8 +50,9 @@ class PLATFORM_EXPORT LogArgument {
       : LogArgument(static_cast<const Describable*>(object.get())) {}
   // NOLINTEND(google-explicit-constructor)
 
-  // The argument's text, as "%@" and "%s" print it.
-  std::string text() const;
+  // The argument's text, as "%@" and "%s" print it; cut as by propertylist::shortened when it has
+  // more than `limit` bytes.
+  std::string text(std::size_t limit = propertylist::kMaximumDescription) const;
   // The argument as a number for "%d" and "%ld": 0 when it is none.
   std::int64_t number() const;
 
@@ -63,8 +66,10 @@ class PLATFORM_EXPORT LogArgument {
 
 // Expands `format`: "%@" and "%s" print an argument's text, "%d" (32 bits) and "%ld" (64 bits) its
 // number, "%%" a percent sign; any other "%" stands for itself. Arguments left over are ignored; a
-// missing one prints as "(null)". A "%" inside an argument is never interpreted.
+// missing one prints as "(null)". A "%" inside an argument is never interpreted. An argument of
+// more than `limit` bytes is cut there, at the end of a character, and "..." is put behind it.
 PLATFORM_EXPORT std::string formatLogLine(std::string_view format,
-                                          std::initializer_list<LogArgument> arguments);
+                                          std::initializer_list<LogArgument> arguments,
+                                          std::size_t limit = propertylist::kMaximumDescription);
 
 }  // namespace platform

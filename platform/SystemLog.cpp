@@ -5,7 +5,7 @@
 namespace platform {
 
 void writeSystemLog(std::string_view format, std::initializer_list<LogArgument> arguments) {
-  services().systemLog.writeLine(formatLogLine(format, arguments));
+  services().systemLog.writeLine(formatLogLine(format, arguments, kLongestLogArgument));
 }
 
 }  // namespace platform

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstddef>
 #include <string_view>
 
 #include "platform/Export.h"
@@ -17,7 +18,10 @@ class PLATFORM_EXPORT SystemLog {
   virtual void writeLine(std::string_view text) = 0;
 };
 
-// Expands `format` with `arguments` and writes the line to the installed system log.
+// Expands `format` with `arguments` and writes the line to the installed system log. Of an argument
+// with a longer text than kLongestLogArgument bytes that much is written, and "...": a small
+// settings file can name one large value very often, and each place may get a line.
+inline constexpr std::size_t kLongestLogArgument = 1024;
 PLATFORM_EXPORT void writeSystemLog(std::string_view format,
                                     std::initializer_list<LogArgument> arguments);
 template <typename... Arguments>

@@ -1,38 +1,29 @@
+#include <algorithm>
 #include <vector>
 
 #include "propertylist/DateText.h"
 #include "propertylist/LeafText.h"
+#include "propertylist/UTF8.h"
 #include "propertylist/Writing.h"
 
 namespace propertylist {
 namespace {
-
-std::string dataText(const Bytes& data) {
-  constexpr std::string_view kDigits = "0123456789abcdef";
-  std::string text = "<";
-  for (const std::uint8_t byte : data) {
-    text += kDigits[byte >> 4U];
-    text += kDigits[byte & 0x0FU];
-  }
-  return text + ">";
-}
 
 std::string describedDate(Date date) {
   const std::optional<std::string> text = dateText(date);
   return text ? *text : realText(date.secondsSince2001) + " seconds since 2001-01-01T00:00:00Z";
 }
 
-// Writes a description from left to right. The containers that are open wait in a list.
+// Writes a description from left to right, until it is too long. The containers that are open wait
+// in a list.
 class Description {
  public:
+  explicit Description(std::size_t limit) : _limit(std::min(limit, kMaximumDescription)) {}
+
   std::string of(const Value& value) {
     _begin(value);
-    while (!_open.empty() && _text.size() <= kMaximumDescription) _continue();
-    if (_text.size() > kMaximumDescription) {
-      _text.resize(kMaximumDescription);
-      _text += "...";
-    }
-    return std::move(_text);
+    while (!_open.empty() && !_isTooLong()) _continue();
+    return _isTooLong() ? shortened(_text, _limit) : std::move(_text);
   }
 
  private:
@@ -40,6 +31,25 @@ class Description {
     const Value* value;
     std::size_t next;  // the member whose turn it is
   };
+
+  bool _isTooLong() const { return _text.size() > _limit; }
+
+  // Appends of `text` what shows where the description is cut: a whole character behind the limit.
+  void _append(std::string_view text) {
+    constexpr std::size_t kLongestCharacter = 4;
+    if (!_isTooLong()) _text += text.substr(0, _limit - _text.size() + kLongestCharacter);
+  }
+
+  void _appendData(const Bytes& data) {
+    constexpr std::string_view kDigits = "0123456789abcdef";
+    _text += '<';
+    for (const std::uint8_t byte : data) {
+      if (_isTooLong()) return;
+      _text += kDigits[byte >> 4U];
+      _text += kDigits[byte & 0x0FU];
+    }
+    _text += '>';
+  }
 
   void _begin(const Value& value) {
     switch (value.kind()) {
@@ -52,7 +62,7 @@ class Description {
         _open.push_back({&value, 0});
         break;
       case Kind::string:
-        _text += *value.asString();
+        _append(*value.asString());
         break;
       case Kind::integer:
         _text += integerText(value);
@@ -67,7 +77,7 @@ class Description {
         _text += describedDate(*value.asDate());
         break;
       case Kind::data:
-        _text += dataText(*value.asData());
+        _appendData(*value.asData());
         break;
     }
   }
@@ -84,8 +94,8 @@ class Description {
     if (index == dictionary.size()) return _close('}');
     if (index > 0) _text += "; ";
     const Dictionary::Entry& entry = dictionary.begin()[index];
-    _text += entry.key();
-    _text += " = ";
+    _append(entry.key());
+    _append(" = ");
     _begin(entry.value());
   }
 
@@ -94,12 +104,18 @@ class Description {
     _open.pop_back();
   }
 
+  std::size_t _limit;
   std::string _text;
   std::vector<Container> _open;
 };
 
 }  // namespace
 
-std::string describe(const Value& value) { return Description().of(value); }
+std::string describe(const Value& value, std::size_t limit) { return Description(limit).of(value); }
+
+std::string shortened(std::string_view text, std::size_t limit) {
+  if (text.size() <= limit) return std::string(text);
+  return std::string(text.substr(0, characterBoundary(text, limit))) + "...";
+}
 
 }  // namespace propertylist

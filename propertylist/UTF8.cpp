@@ -43,6 +43,16 @@ std::optional<std::size_t> findInvalidUTF8(std::string_view text) {
   return std::nullopt;
 }
 
+std::size_t characterBoundary(std::string_view text, std::size_t at) {
+  constexpr std::size_t kMostFollowing = 3;
+  const auto isFollowing = [text](std::size_t position) {
+    return position < text.size() && (static_cast<unsigned char>(text[position]) & 0xC0U) == 0x80U;
+  };
+  std::size_t boundary = at;
+  while (boundary > 0 && at - boundary < kMostFollowing && isFollowing(boundary)) --boundary;
+  return isFollowing(boundary) ? at : boundary;
+}
+
 void appendUTF8(std::string& text, char32_t codePoint) {
   if (codePoint < 0x80) {
     text += byteOf(codePoint);

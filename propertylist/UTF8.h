@@ -15,6 +15,10 @@ std::optional<char32_t> decodeUTF8(std::string_view text, std::size_t& position)
 // Where `text` stops being UTF-8; empty when it never does.
 std::optional<std::size_t> findInvalidUTF8(std::string_view text);
 
+// The last place up to `at` where `text` can be cut without splitting a character. In bytes that
+// are not UTF-8 it is `at` itself or at most three bytes before. `at` is within `text`.
+std::size_t characterBoundary(std::string_view text, std::size_t at);
+
 // `codePoint` is one that UTF-8 can hold.
 void appendUTF8(std::string& text, char32_t codePoint);
 

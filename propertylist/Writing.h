@@ -3,6 +3,7 @@
 #include <cstddef>
 #include <optional>
 #include <string>
+#include <string_view>
 
 #include "propertylist/Export.h"
 #include "propertylist/Value.h"
@@ -22,8 +23,14 @@ PROPERTYLIST_EXPORT std::optional<std::string> writeXMLPropertyList(const Value&
 
 // A description for logs and people: a string bare, numbers in decimal, a boolean as 1 or 0, a date
 // in ISO 8601 UTC, data as <hex>, an array as (a, b), a dictionary as {key = value; key = value}.
-// One of more than kMaximumDescription bytes is cut there and ends in "...".
+// One of more than `limit` bytes, or kMaximumDescription, is cut as by shortened; no more of it is
+// made, whatever the value's size.
 inline constexpr std::size_t kMaximumDescription = std::size_t{16} << 20U;
-PROPERTYLIST_EXPORT std::string describe(const Value& value);
+PROPERTYLIST_EXPORT std::string describe(const Value& value,
+                                         std::size_t limit = kMaximumDescription);
+
+// `text`; when it has more than `limit` bytes, as many characters as fit into them, then "...". No
+// character of UTF-8 is split.
+PROPERTYLIST_EXPORT std::string shortened(std::string_view text, std::size_t limit);
 
 }  // namespace propertylist

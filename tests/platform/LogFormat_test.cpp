@@ -119,6 +119,37 @@ TEST(LogFormat, DescribesAnObjectOnlyWhenALineIsMade) {
   EXPECT_EQ(account.described, 1);
 }
 
+TEST(LogFormat, CutsAnArgumentBehindItsLimitAtTheEndOfACharacter) {
+  const Account account;
+  const propertylist::Dictionary dictionary{{"a", "b"}};
+  const struct {
+    const char* name;
+    LogArgument argument;
+    std::size_t limit;
+    const char* printed;
+  } kCases[] = {
+      {"as long as the limit", "text", 4, "text"},
+      {"one byte more", "text", 3, "tex..."},
+      {"nothing fits", "text", 0, "..."},
+      {"before a character of two bytes", "ab\u00e9", 3, "ab..."},
+      {"behind a character of two bytes", "a\u00e9b", 3, "a\u00e9..."},
+      {"before a character of four bytes", "a\U0001F600", 4, "a..."},
+      {"value", dictionary, 4, "{a =..."},
+      {"object", account, 8, "<Account..."},
+      {"number", -1234, 3, "-1234"},
+      {"nothing", LogArgument(static_cast<const char*>(nullptr)), 3, "(null)"},
+  };
+  for (const auto& c : kCases) {
+    SCOPED_TRACE(c.name);
+    EXPECT_EQ(formatLogLine("[%@]", {c.argument}, c.limit), std::string("[") + c.printed + "]");
+  }
+}
+
+TEST(LogFormat, CutsNothingWithoutALimit) {
+  const std::string text(1'000'000, 'x');
+  EXPECT_TRUE(formatLogLine("%@", {text}) == text);
+}
+
 TEST(LogFormat, KeepsBytesThatAreNoText) {
   const std::string bytes("a\0\xFF", 3);
   EXPECT_EQ(formatLogLine("%@", {bytes}), bytes);

@@ -49,5 +49,15 @@ TEST(WriteSystemLog, ExpandsTheLineForTheInstalledLog) {
             (std::vector<std::string>{"Checking account 100 %@ of type Mail", "done"}));
 }
 
+TEST(WriteSystemLog, CutsEachArgumentThatIsTooLong) {
+  InMemoryDevice device;
+  const std::string longest(1024, 'x');
+  const propertylist::Dictionary dictionary{{"k", longest}};
+  logToSystem("[%s] is %@ of %@", longest, longest + "y", dictionary);
+  EXPECT_EQ(device.logLines(),
+            (std::vector<std::string>{"[" + longest + "] is " + longest +
+                                      "... of {k = " + longest.substr(5) + "..."}));
+}
+
 }  // namespace
 }  // namespace platform

@@ -1,6 +1,9 @@
 #include <gtest/gtest.h>
 
+#include <sys/resource.h>
+
 #include <cmath>
+#include <cstdint>
 
 #include "propertylist/Writing.h"
 
@@ -60,6 +63,61 @@ TEST(Description, IsCutWhenItIsTooLong) {
   EXPECT_EQ(describe(longest), longest);
   EXPECT_EQ(describe(longest + "y"), longest + "...");
   EXPECT_EQ(describe(Array{longest, "y"}), "(" + longest.substr(1) + "...");
+}
+
+TEST(Description, IsCutBetweenCharacters) {
+  const struct {
+    const char* name;
+    Value value;
+    std::size_t limit;
+    const char* text;
+  } kCases[] = {
+      {"it fits", "a\u00e9", 3, "a\u00e9"},
+      {"inside of a character of two bytes", "a\u00e9b", 2, "a..."},
+      {"behind one", "a\u00e9b", 3, "a\u00e9..."},
+      {"inside of a character of three bytes", "\u20ac\u20ac", 5, "\u20ac..."},
+      {"inside of a character of four bytes", "a\U0001F600", 4, "a..."},
+      {"inside of the only character", "\U0001F600", 3, "..."},
+      {"inside of a key", Dictionary{{"\u20ac", 1}}, 2, "{..."},
+      {"inside of data", Bytes{0x12, 0x34}, 4, "<123..."},
+      {"before the bracket", Array{"ab"}, 3, "(ab..."},
+      {"in bytes that are no characters", "\x80\x80\x80\x80\x80\x80", 5, "\x80\x80\x80\x80\x80..."},
+      {"everything", "ab", 0, "..."},
+  };
+  for (const auto& c : kCases) {
+    SCOPED_TRACE(c.name);
+    EXPECT_EQ(describe(c.value, c.limit), c.text);
+  }
+}
+
+TEST(Description, OfNothingIsNeverLongerThanTheLongest) {
+  const std::string longest(kMaximumDescription, 'x');
+  EXPECT_TRUE(describe(longest + "y", SIZE_MAX) == longest + "...");
+}
+
+// The most memory that this process has had so far, in KiB.
+long peakMemory() {
+  struct rusage usage {};
+  EXPECT_EQ(::getrusage(RUSAGE_SELF, &usage), 0);
+  return usage.ru_maxrss;
+}
+
+TEST(Description, TakesNoMoreMemoryThanItsLongestWhateverTheValueHas) {
+  constexpr std::size_t kSize = std::size_t{160} << 20U;
+  const struct {
+    const char* name;
+    Value value;
+  } kCases[] = {
+      {"a text", std::string(kSize, 'x')},
+      {"data", Bytes(kSize, 0x12)},
+      {"a key", Dictionary{{std::string(kSize, 'x'), 1}}},
+  };
+  for (const auto& c : kCases) {
+    SCOPED_TRACE(c.name);
+    const long before = peakMemory();
+    EXPECT_EQ(describe(c.value).size(), kMaximumDescription + 3);
+    EXPECT_LT(peakMemory() - before, 120L << 10U);
+  }
 }
 
 }  // namespace
