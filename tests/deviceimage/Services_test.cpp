@@ -5,6 +5,7 @@
 #include <fstream>
 
 #include "deviceimage/DeviceImageServices.h"
+#include "deviceimage/Journal.h"
 #include "tests/deviceimage/TemporaryImage.h"
 
 namespace deviceimage {
@@ -53,6 +54,18 @@ TEST_F(ImageServices, LetNoTextBeginASecondLogLine) {
   EXPECT_EQ(linesIn("var/log/system.log").size(), 2U);
   EXPECT_EQ(sunk[0],
             "a\\n2026-01-01T00:00:00Z tester[1]: forged\\r\\t\\x1b[31m\\x7f\\xc2\\x85\\x00z");
+}
+
+TEST(JSONLine, HoldsTextsBooleansNumbersAndLists) {
+  EXPECT_EQ(jsonLine({{"text", "a \"b\"\n\xff"},
+                      {"yes", true},
+                      {"no", false},
+                      {"number", std::int64_t{-7}},
+                      {"none", std::vector<std::string>{}},
+                      {"list", std::vector<std::string>{"[", "c\\", ""}}}),
+            "{\"text\": \"a \\\"b\\\"\\u000a\xef\xbf\xbd\", \"yes\": true, \"no\": false, "
+            "\"number\": -7, \"none\": [], \"list\": [\"[\", \"c\\\\\", \"\"]}");
+  EXPECT_EQ(jsonLine({}), "{}");
 }
 
 TEST_F(ImageServices, WriteNoLogThroughALink) {

@@ -25,14 +25,14 @@ struct Registered {
 
 
 class PluginBinary(unittest.TestCase):
-    def problems(self, source: str, *options: str) -> list[str]:
+    def problems(self, source: str, *options: str, account_classes: bool = False) -> list[str]:
         """What the check says of the shared object built from `source`."""
         with tempfile.TemporaryDirectory() as folder:
             file = Path(folder) / "object.cpp"
             file.write_text(source, encoding="utf-8")
             command = [COMPILER, "-shared", "-fPIC", "-fvisibility=hidden", str(file)]
             subprocess.run([*command, "-o", f"{folder}/object.so", *options], check=True)
-            found, _ = plugin_binary.check(Path(folder) / "object.so", sanitized=False)
+            found, _ = plugin_binary.check(Path(folder) / "object.so", False, account_classes)
             return [problem.removeprefix(f"{folder}/") for problem in found]
 
     def test_an_object_that_needs_the_run_time_and_shows_nothing_passes(self):
@@ -52,6 +52,21 @@ class PluginBinary(unittest.TestCase):
         shown = """struct __attribute__((visibility("default"))) Shown { virtual ~Shown() {} };
         struct __attribute__((visibility("hidden"))) User { Shown shown; } user;"""
         self.assertIn("object.so: shows the symbol vtable for Shown (V)", self.problems(shown))
+
+    def test_interfaces_of_account_classes_are_found_unless_they_are_allowed(self):
+        source = """namespace accountsettings {
+        struct __attribute__((visibility("default"))) ANotifier { virtual ~ANotifier() {} };
+        struct __attribute__((visibility("default"))) AStore { virtual ~AStore() {} };
+        }
+        namespace { struct : accountsettings::ANotifier {} notifier; accountsettings::AStore store; }"""
+        one = "object.so: shows the symbol vtable for accountsettings::ANotifier (V)"
+        other = "object.so: shows the symbol vtable for accountsettings::AStore (V)"
+        found = self.problems(source)
+        self.assertIn(one, found)
+        self.assertIn(other, found)
+        found = self.problems(source, account_classes=True)
+        self.assertNotIn(one, found)
+        self.assertIn(other, found)
 
 
 if __name__ == "__main__":

@@ -118,6 +118,11 @@ def creators(path: Path) -> list[str]:
                 for key in ("Framework", "Class")
                 if not description.get(key)
             ]
+            if entry.get("Type") == "NotifierAccount":
+                heard = set(description.get("Supported Dataclasses", []))
+                problems += unequal(where, heard, DATACLASSES & heard)
+                if not heard:
+                    problems.append(f"{where}: Supported Dataclasses: missing or empty")
             if ".." in Path(description.get("Framework", "")).parts:
                 problems.append(f"{where}: Framework: leads out of its root")
     if not any(entry.get("Type") == "FullAccount" for entry in catalogue.get("OnMyDevice", [])):

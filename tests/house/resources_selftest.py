@@ -68,6 +68,14 @@ class Resources(unittest.TestCase):
         said = self.replaced("AccountCreators.plist", "<string>ASSDeviceLocalAccount<", "<string><")
         self.assertIn("OnMyDevice: Class: missing or empty", said)
 
+    def test_a_notifier_for_an_unknown_dataclass_is_found(self):
+        said = self.replaced("AccountCreators.plist", "Dataclass.Notes<", "Dataclass.Note<")
+        self.assertIn("com.vantor.Dataclass.Note: unknown", said)
+
+    def test_a_notifier_that_hears_of_nothing_is_found(self):
+        said = self.replaced("AccountCreators.plist", "<key>Supported Dataclasses<", "<key>Dataclasses<")
+        self.assertIn("Supported Dataclasses: missing or empty", said)
+
     def test_a_bundle_path_that_leads_out_is_found(self):
         said = self.replaced("AccountCreators.plist", "System/Library", "../System/Library")
         self.assertIn("leads out of its root", said)

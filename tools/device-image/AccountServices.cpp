@@ -86,11 +86,17 @@ std::optional<std::string> contentOf(const DeviceImage& image, const std::string
 }  // namespace
 
 std::vector<AccountService> installedServices() {
-  std::vector<AccountService> services;
-  for (const std::string& name : namedServices())
-    services.push_back(
-        {imageFile(name), readWholeFile(installedAccountServices() + "/" + name, kLargestBundle)});
-  return services;
+  try {
+    std::vector<AccountService> services;
+    for (const std::string& name : namedServices())
+      services.push_back({imageFile(name),
+                          readWholeFile(installedAccountServices() + "/" + name, kLargestBundle)});
+    return services;
+  } catch (const CommandFailure& failure) {
+    throw CommandFailure(
+        failure.code(), fmt::format("{}; or leave the account services out with --without-services",
+                                    failure.what()));
+  }
 }
 
 platform::Status placeServices(const DeviceImage& image,

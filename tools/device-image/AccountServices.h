@@ -16,8 +16,8 @@ struct AccountService {
   std::string content;
 };
 
-// All of them. A catalogue or bundle that cannot be read ends the command, which has written
-// nothing yet.
+// All of them. A catalogue or bundle that cannot be read ends the command before anything is
+// written.
 std::vector<AccountService> installedServices();
 
 // Puts them into the image, up to the first that cannot be written.

@@ -82,19 +82,29 @@ class Check(ImageTest):
             self.assertEqual(path.stat().st_mode & 0o7777, 0o600)
             self.assertEqual(path.read_bytes(), (installed / path.name).read_bytes())
 
-    def test_no_image_is_made_where_the_account_services_are_not_installed(self):
+    def run_alone(self, *arguments) -> subprocess.CompletedProcess:
+        """Runs a copy of the tool beside which nothing is installed."""
         programs = self.directory / "bin"
-        programs.mkdir()
+        programs.mkdir(exist_ok=True)
         shutil.copy(TOOL, programs)
-        alone = [programs / "device-image", "create", self.directory / "new"]
         environment = {"LD_LIBRARY_PATH": str(Path(TOOL).resolve().parents[1] / "lib")}
-        ended = subprocess.run(alone, capture_output=True, env=environment, timeout=60)
+        return subprocess.run([programs / "device-image", *arguments], capture_output=True,
+                              env=environment, timeout=60)
+
+    def test_no_image_is_made_where_the_account_services_are_not_installed(self):
+        ended = self.run_alone("create", self.directory / "new")
         self.assertEqual(ended.returncode, 7, ended.stderr)
         self.assertIn(b"AccountCreators.plist", ended.stderr)
+        self.assertIn(b"--without-services", ended.stderr)
         self.assertFalse((self.directory / "new").exists())
-        ended = subprocess.run([*alone, "--without-services"], capture_output=True, env=environment,
-                               timeout=60)
+        ended = self.run_alone("create", "--without-services", self.directory / "new")
         self.assertEqual(ended.returncode, 0, ended.stderr)
+
+    def test_warns_where_account_services_cannot_be_compared(self):
+        ended = self.run_alone("check", self.image)
+        self.assertEqual(ended.returncode, 0, ended.stderr)
+        self.assertIn(f"{SERVICES}: warning: cannot be compared with what is installed: ",
+                      ended.stderr.decode())
 
     def test_finds_what_stopped_programs_left_behind(self):
         (self.image / "tmp/settings.abc").touch(0o600)
