@@ -104,6 +104,8 @@ class FaultyBundles(hosttest.HostTestCase):
         self.check_that_nobody_is_left("IgnoresTermination", 8, "timed out", limit=1)
 
     def test_one_that_is_traced_by_its_child(self):
+        if hosttest.os.environ.get("SANITIZED"):
+            self.skipTest("the search for leaks does not work in a traced process")
         self.check_that_nobody_is_left("IsTracedByItsChild", 0, "done")
 
     def check_what_cannot_be_killed(self, name):
@@ -217,6 +219,9 @@ class Stopping(hosttest.HostTestCase):
         deadline = time.monotonic() + 60
         while self.processes_of_runs() and time.monotonic() < deadline:
             time.sleep(0.01)
+        # A process that ends loses its environment before its descriptors.
+        with open(self.image / hosttest.LOCK, "rb") as lock:
+            hosttest.fcntl.flock(lock, hosttest.fcntl.LOCK_EX)
         self.assert_nothing_is_left()
 
     def test_the_migrator_shares_the_lock_so_that_it_outlives_a_killed_host(self):
