@@ -17,7 +17,7 @@ CODE = re.compile(r"`([^`\n]+)`")
 # A path between back quotes: begins with a folder at the top of the tree.
 PATH = re.compile(r"[\w.-]+(?:/[\w.{}-]*)+")
 # The project's own commands, at the beginning of a line of a code block or between back quotes.
-COMMAND = re.compile(r"(?:\./(check|demo)|(migration-host|device-image))\b([^`#|]*)")
+COMMAND = re.compile(r"(?:\./(check|demo)|(migration-host|device-image|account-settings))\b([^`#|]*)")
 
 
 def anchors(path: Path) -> set[str]:

@@ -15,14 +15,14 @@ from report import finish
 
 BUNDLE = "account-retirement/migrators/QuillnetAccountRemoval.migrator"
 EXPECTED = [
-    "bin/device-image", "bin/migration-host",
+    "bin/account-settings", "bin/device-image", "bin/migration-host",
     "include/account-retirement/QuillnetAccountTypeRemoval/ASSAccountsManager.h",
     "include/account-retirement/deviceimage/DeviceImageServices.h",
     "include/account-retirement/localdata/DataclassFunctions.h",
     "include/account-retirement/platform/Services.h",
     "include/account-retirement/propertylist/Value.h",
     "share/doc/account-retirement/LICENSE", "share/doc/account-retirement/architecture.md",
-    "share/man/man1/device-image.1", "share/man/man1/migration-host.1",
+    "share/man/man1/account-settings.1", "share/man/man1/device-image.1", "share/man/man1/migration-host.1",
 ]
 IN_LIBRARIES = [
     "libplatform.so", "libpropertylist.so", "libaccount_settings.a", "libdeviceimage.a",

@@ -72,17 +72,27 @@ AccountStore::AccountStore(ImagePtr image)
 
 void AccountStore::startLogging() { _services = installServices(_image, _logLines, true); }
 
+std::vector<FoundAccount> AccountStore::_all() const {
+  std::vector<FoundAccount> all;
+  for (const AccountPtr& account : *_manager->allBasicAccounts()) {
+    all.push_back({account, nullptr, 0});
+    const std::vector<FoundAccount> children = childrenOf(account);
+    all.insert(all.end(), children.begin(), children.end());
+  }
+  return all;
+}
+
+std::vector<std::string> AccountStore::identifiers() const {
+  std::vector<std::string> identifiers;
+  for (const FoundAccount& account : _all())
+    identifiers.push_back(storedIdentifier(*account.account));
+  return identifiers;
+}
+
 FoundAccount AccountStore::find(std::string_view identifier) const {
   std::vector<FoundAccount> found;
-  std::vector<std::string> known;
-  const auto look = [&](const FoundAccount& candidate) {
-    known.push_back(storedIdentifier(*candidate.account));
-    if (known.back() == identifier) found.push_back(candidate);
-  };
-  for (const AccountPtr& account : *_manager->allBasicAccounts()) {
-    look({account, nullptr, 0});
-    for (const FoundAccount& child : childrenOf(account)) look(child);
-  }
+  for (const FoundAccount& account : _all())
+    if (storedIdentifier(*account.account) == identifier) found.push_back(account);
   if (found.size() == 1) return found.front();
   if (found.size() > 1)
     throw CommandFailure(
@@ -93,7 +103,7 @@ FoundAccount AccountStore::find(std::string_view identifier) const {
   throw CommandFailure(
       ExitCode::refused,
       fmt::format("{}: there is no account \"{}\"{}; account-settings list --image {} lists them",
-                  _image->settingsFile(), identifier, suggestion(identifier, known),
+                  _image->settingsFile(), identifier, suggestion(identifier, identifiers()),
                   _image->rootPath()));
 }
 

@@ -36,6 +36,8 @@ class AccountStore {
   // From here on the library's lines go to the image's log as well.
   void startLogging();
 
+  // The stored identifiers of all accounts, children included; empty ones for those without.
+  std::vector<std::string> identifiers() const;
   // The one account, child accounts included, with the identifier. Ends the command when there is
   // none, or more than one.
   FoundAccount find(std::string_view identifier) const;
@@ -47,6 +49,8 @@ class AccountStore {
   std::vector<propertylist::Dictionary> snapshot() const;
 
  private:
+  std::vector<FoundAccount> _all() const;
+
   ImagePtr _image;
   std::shared_ptr<std::vector<std::string>> _logLines;
   std::unique_ptr<deviceimage::DeviceImageServices> _services;

@@ -11,8 +11,6 @@
 namespace tools {
 namespace {
 
-constexpr std::string_view kServicesDirectory = "System/Library/AccountServices";
-
 void requireTrust(const std::string& path) {
   if (const auto reason = host::whyNotTrusted(path))
     throw CommandFailure(ExitCode::refused,
@@ -25,7 +23,8 @@ void requireTrust(const std::string& path) {
 
 void requireTrustedServices(const deviceimage::DeviceImage& image) {
   namespace fs = std::filesystem;
-  const std::string services = image.absolutePath(kServicesDirectory);
+  const std::string services =
+      image.absolutePath(deviceimage::DeviceImage::kAccountServicesDirectory);
   std::error_code error;
   if (fs::symlink_status(services, error).type() == fs::file_type::not_found) return;
   requireTrust(services);  // and every folder above it

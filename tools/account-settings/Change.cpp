@@ -59,23 +59,16 @@ void useTemporaryDirectory(const DeviceImage& image) {
 }
 
 void refuseLossySave(const AccountStore& store) {
-  std::string problems;
-  std::size_t count = 0;
-  for (const Oddity& oddity : findOddities(store.root())) {
-    if (!oddity.savingLoses) continue;
-    ++count;
-    if (problems.empty())
-      problems = fmt::format("{}{}{} {}", oddity.place, oddity.place.empty() ? "" : ": ",
-                             oddity.key, oddity.text);
-  }
-  if (count == 0) return;
+  std::vector<std::string> problems;
+  for (const Oddity& oddity : findOddities(store.root()))
+    if (oddity.effect == Oddity::Effect::lost) problems.push_back(describe(oddity));
+  if (problems.empty()) return;
   throw CommandFailure(
       ExitCode::imageDamaged,
-      fmt::format("{}: {}{}; nothing was changed, since a save would lose it; "
-                  "account-settings validate --image {} lists all; mend it with account-settings "
-                  "convert",
-                  store.image().settingsFile(), problems,
-                  count > 1 ? fmt::format(" (and {} more)", count - 1) : "",
+      fmt::format("{}: {}{}; nothing was changed, since a save would lose it; account-settings "
+                  "validate --image {} lists all; mend the file with account-settings convert",
+                  store.image().settingsFile(), problems.front(),
+                  problems.size() > 1 ? fmt::format(" (and {} more)", problems.size() - 1) : "",
                   store.image().rootPath()));
 }
 
@@ -154,6 +147,9 @@ void report(const AccountStore& store, const std::vector<Difference>& difference
   } else if (options.dryRun) {
     for (const Difference& difference : differences) fmt::print("{}\n", describe(difference));
     if (differences.empty()) fmt::print("nothing would change\n");
+  } else {
+    for (const Difference& difference : differences)
+      if (difference.kind == Difference::Kind::added) fmt::print("{}\n", difference.account);
   }
 }
 

@@ -11,7 +11,16 @@ namespace tools {
 // CommandFailure. `outcome` outlives the parsing.
 void addListCommand(CLI::App& app, ExitCode& outcome);
 void addShowCommand(CLI::App& app, ExitCode& outcome);
+void addEnableCommand(CLI::App& app, ExitCode& outcome);
+void addDisableCommand(CLI::App& app, ExitCode& outcome);
 void addSetCommand(CLI::App& app, ExitCode& outcome);
 void addUnsetCommand(CLI::App& app, ExitCode& outcome);
+void addInsertCommand(CLI::App& app, ExitCode& outcome);
+void addDeleteCommand(CLI::App& app, ExitCode& outcome);
+void addAddChildCommand(CLI::App& app, ExitCode& outcome);
+void addRemoveChildCommand(CLI::App& app, ExitCode& outcome);
+void addValidateCommand(CLI::App& app, ExitCode& outcome);
+void addConvertCommand(CLI::App& app, ExitCode& outcome);
+void addExplainMergeCommand(CLI::App& app, ExitCode& outcome);
 
 }  // namespace tools

@@ -3,6 +3,7 @@
 #include <fmt/format.h>
 
 #include <map>
+#include <optional>
 #include <utility>
 
 #include "QuillnetAccountTypeRemoval/ASSAccountsManager.h"
@@ -35,6 +36,8 @@ bool isKnownType(const std::string& type) {
 
 class Search {
  public:
+  using Effect = Oddity::Effect;
+
   std::vector<Oddity> found;
 
   void lookAtRoot(const Dictionary& root) {
@@ -54,15 +57,15 @@ class Search {
       return _add({}, {}, kAccountsKey,
                   fmt::format("is no array but of the kind {}; the library sees no account",
                               kindName(*accounts)),
-                  true);
+                  Effect::lost);
     for (std::size_t i = 0; i < accounts->asArray()->size(); ++i)
       _lookAtAccount((*accounts->asArray())[i], fmt::format("{}[{}]", kAccountsKey, i));
   }
 
  private:
   void _add(const std::string& place, const std::string& identifier, std::string_view key,
-            std::string text, bool savingLoses = false) {
-    found.push_back({place, identifier, std::string(key), std::move(text), savingLoses});
+            std::string text, Effect effect = Effect::none) {
+    found.push_back({place, identifier, std::string(key), std::move(text), effect});
   }
 
   void _lookAtAccount(const Value& entry, const std::string& place) {
@@ -71,9 +74,9 @@ class Search {
       return _add(
           place, {}, {},
           fmt::format("is no dictionary but of the kind {}; the library drops it", kindName(entry)),
-          true);
+          Effect::lost);
     const std::string identifier = textUnder(*properties, accountsettings::kAccountIdentifier);
-    const bool isUsable = _lookAtTypeAndClass(*properties, place, identifier, true);
+    const bool isUsable = _lookAtTypeAndClass(*properties, place, identifier, Effect::lost);
     const auto store = ASSAccountsManager::initWithAccounsInfoArray(Array{entry});
     const AccountPtr account = store->count() == 1 ? store->allBasicAccounts()->front() : nullptr;
     if (isUsable) _lookAtMailClass(*properties, account, place, identifier);
@@ -89,7 +92,8 @@ class Search {
     if (children->asArray() == nullptr)
       return _add(parentPlace, parentIdentifier, accountsettings::kAccountChildAccounts,
                   fmt::format("is no array but of the kind {}; the library sees no children",
-                              kindName(*children)));
+                              kindName(*children)),
+                  Effect::passedOver);
     for (std::size_t i = 0; i < children->asArray()->size(); ++i) {
       const Value& entry = (*children->asArray())[i];
       const std::string place =
@@ -99,18 +103,19 @@ class Search {
       else
         _add(place, {}, {},
              fmt::format("is no dictionary but of the kind {}; the library ignores it",
-                         kindName(entry)));
+                         kindName(entry)),
+             Effect::passedOver);
     }
   }
 
   void _lookAtChild(const Dictionary& properties, const AccountPtr& parent,
                     const std::string& place) {
     const std::string identifier = textUnder(properties, accountsettings::kAccountIdentifier);
-    const bool isUsable = _lookAtTypeAndClass(properties, place, identifier, false);
+    const bool isUsable = _lookAtTypeAndClass(properties, place, identifier, Effect::passedOver);
     _lookAtIdentifier(properties, nullptr, place, false);
     if (properties.contains(accountsettings::kAccountChildAccounts))
       _add(place, identifier, accountsettings::kAccountChildAccounts,
-           "is ignored; a child account has no children");
+           "is ignored; a child account has no children", Effect::passedOver);
     if (!isUsable || !parent) return;
     const AccountPtr child = ASSBasicAccount::initWithProperties(properties);
     child->setParentAccount(parent);
@@ -119,9 +124,9 @@ class Search {
 
   // False when no record can be made of the properties.
   bool _lookAtTypeAndClass(const Dictionary& properties, const std::string& place,
-                           const std::string& identifier, bool isTopLevel) {
+                           const std::string& identifier, Effect effect) {
     const std::string then =
-        isTopLevel ? "the library drops the account" : "the library ignores it";
+        effect == Effect::lost ? "the library drops the account" : "the library ignores it";
     const Value* const type = properties.find(accountsettings::kAccountType);
     std::string typeProblem;
     if (type == nullptr)
@@ -132,10 +137,10 @@ class Search {
       typeProblem = fmt::format("\"{}\" is unknown", *type->asString());
     const bool hasClass = !textUnder(properties, accountsettings::kAccountClass).empty();
     if (!typeProblem.empty())
-      _add(place, identifier, accountsettings::kAccountType, typeProblem + "; " + then, isTopLevel);
+      _add(place, identifier, accountsettings::kAccountType, typeProblem + "; " + then, effect);
     if (!hasClass)
       _add(place, identifier, accountsettings::kAccountClass,
-           "is missing, empty or no string; " + then, isTopLevel);
+           "is missing, empty or no string; " + then, effect);
     return typeProblem.empty() && hasClass;
   }
 
@@ -148,32 +153,36 @@ class Search {
           fmt::format("\"{}\" is unknown to the mail engine, and \"AccountPath\" implies no other; "
                       "the library drops the account",
                       stored),
-          true);
+          Effect::lost);
     else if (const auto taken = account->accountClass(); taken != stored)
       _add(place, identifier, accountsettings::kAccountClass,
            fmt::format("\"{}\" is unknown to the mail engine; the library takes \"{}\" instead",
                        stored, taken.value_or("")));
   }
 
-  // `account` is null for a child.
+  // `account` is null for a child, and for what makes no account.
   void _lookAtIdentifier(const Dictionary& properties, const AccountPtr& account,
                          const std::string& place, bool isTopLevel) {
     const Value* const stored = properties.find(accountsettings::kAccountIdentifier);
-    if (stored == nullptr || stored->asString() == nullptr)
-      _add(place, {}, accountsettings::kAccountIdentifier,
-           stored != nullptr ? fmt::format("is no string but of the kind {}", kindName(*stored))
-           : isTopLevel      ? "is missing; the library makes one up at every reading"
-                             : "is missing; the library ignores the child");
-    else if (stored->asString()->empty())
-      _add(place, {}, accountsettings::kAccountIdentifier, "is empty");
-    std::string identifier = textUnder(properties, accountsettings::kAccountIdentifier);
+    std::optional<std::string> identifier;
+    if (stored != nullptr && stored->asString() != nullptr) identifier = *stored->asString();
     if (account && account->type() == accountsettings::kOnMyDeviceAccountType)
-      identifier = account->identifier().value_or("");
-    if (identifier.empty()) return;
-    const auto [first, isNew] = _places.try_emplace(identifier, place, isTopLevel);
+      identifier = account->identifier();  // whatever is stored
+    const std::string then =
+        isTopLevel ? "the library makes one up at every reading" : "the library ignores the child";
+    if (!identifier)
+      return _add(
+          place, {}, accountsettings::kAccountIdentifier,
+          (stored == nullptr ? "is missing"
+                             : fmt::format("is no string but of the kind {}", kindName(*stored))) +
+              "; " + then,
+          isTopLevel ? Effect::none : Effect::passedOver);
+    if (identifier->empty()) _add(place, {}, accountsettings::kAccountIdentifier, "is empty");
+    const auto [first, isNew] = _places.try_emplace(*identifier, place, isTopLevel);
     if (isNew) return;
-    _add(place, identifier, accountsettings::kAccountIdentifier,
-         "is that of " + first->second.first + " too", isTopLevel && first->second.second);
+    _add(place, *identifier, accountsettings::kAccountIdentifier,
+         "is that of " + first->second.first + " too",
+         isTopLevel && first->second.second ? Effect::lost : Effect::passedOver);
   }
 
   void _lookAtDataclasses(const ASSBasicAccount& account, const std::string& place,
@@ -201,6 +210,14 @@ class Search {
 };
 
 }  // namespace
+
+std::string describe(const Oddity& oddity) {
+  std::string text = oddity.place;
+  if (!oddity.identifier.empty()) text += fmt::format(" ({})", oddity.identifier);
+  for (const std::string& part : {oddity.key, oddity.text})
+    if (!part.empty()) text += (text.empty() ? "" : ": ") + part;
+  return text;
+}
 
 std::vector<Oddity> findOddities(const Dictionary& root) {
   Search search;

@@ -5,7 +5,7 @@
 namespace {
 
 constexpr const char* kFooter =
-    "Exit codes: 0 done; 1 unexpected failure; 2 wrong usage; 6 the settings file is damaged, or\n"
+    "Exit codes: 0 done; 1 unexpected failure; 2 wrong usage; 6 a settings file is damaged, or\n"
     "validate found something; 7 refused, nothing was written; 11 another run holds the image.\n\n"
     "Example:\n"
     "  account-settings list --image my-device\n"
@@ -23,7 +23,16 @@ int main(int argumentCount, char** arguments) {
   tools::ExitCode outcome = tools::ExitCode::done;
   tools::addListCommand(app, outcome);
   tools::addShowCommand(app, outcome);
+  tools::addEnableCommand(app, outcome);
+  tools::addDisableCommand(app, outcome);
   tools::addSetCommand(app, outcome);
   tools::addUnsetCommand(app, outcome);
+  tools::addInsertCommand(app, outcome);
+  tools::addDeleteCommand(app, outcome);
+  tools::addAddChildCommand(app, outcome);
+  tools::addRemoveChildCommand(app, outcome);
+  tools::addValidateCommand(app, outcome);
+  tools::addConvertCommand(app, outcome);
+  tools::addExplainMergeCommand(app, outcome);
   return tools::runProgram(app, outcome, argumentCount, arguments);
 }

@@ -1,0 +1,126 @@
+#include <fmt/format.h>
+
+#include <algorithm>
+#include <memory>
+
+#include "tools/account-settings/Change.h"
+#include "tools/account-settings/Commands.h"
+#include "tools/account-settings/Oddities.h"
+#include "tools/account-settings/PropertyListInput.h"
+
+namespace tools {
+namespace {
+
+using accountsettings::AccountPtr;
+using accountsettings::ASSAccountsManager;
+using accountsettings::ASSBasicAccount;
+using propertylist::Array;
+using propertylist::Dictionary;
+using propertylist::Value;
+
+struct Options : ChangeOptions {
+  std::string parent;
+  std::string file;
+};
+
+[[noreturn]] void refuse(const std::string& file, const std::string& why) {
+  throw CommandFailure(ExitCode::refused, fmt::format("{}: {}; nothing was changed", file, why));
+}
+
+// The account dictionaries in the file: one, or an array of them.
+Array accountsIn(const std::string& file) {
+  const Value value = readPropertyListOfAnyForm(file);
+  if (value.asArray() != nullptr) return *value.asArray();
+  if (value.asDictionary() == nullptr)
+    refuse(file, "it holds neither an account's dictionary nor an array of them");
+  if (propertylist::findArray(*value.asDictionary(), "Accounts") != nullptr)
+    refuse(file,
+           "it is a whole settings file; give one account's dictionary or the array \"Accounts\"");
+  return Array{value};
+}
+
+// Refuses what the library would drop or pass over.
+void requireUsable(const std::string& file, const Array& accounts) {
+  const Dictionary root{{"Accounts", accounts}, {"Version", ASSAccountsManager::currentVersion()}};
+  for (const Oddity& oddity : findOddities(root))
+    if (oddity.effect != Oddity::Effect::none) refuse(file, describe(oddity));
+}
+
+void requireNew(const std::string& file, const std::string& identifier, const AccountStore& store) {
+  const std::vector<std::string> known = store.identifiers();
+  if (std::find(known.begin(), known.end(), identifier) != known.end())
+    refuse(file, fmt::format("the identifier \"{}\" is taken in {}; give another, or delete that "
+                             "account first",
+                             identifier, store.image().settingsFile()));
+}
+
+ExitCode runInsert(const Options& options) {
+  const Array accounts = accountsIn(options.file);
+  return changeAccounts(options, [&](AccountStore& store) {
+    requireUsable(options.file, accounts);
+    const auto made = ASSAccountsManager::initWithAccounsInfoArray(accounts);
+    for (const AccountPtr& account : *made->allBasicAccounts()) {
+      requireNew(options.file, account->identifier().value_or(""), store);
+      for (const FoundAccount& child : AccountStore::childrenOf(account))
+        requireNew(options.file, child.account->identifier().value_or(""), store);
+    }
+    for (const AccountPtr& account : *made->allBasicAccounts())
+      store.manager().insertAccount(account);
+  });
+}
+
+ExitCode runAddChild(const Options& options) {
+  const Array children = accountsIn(options.file);
+  if (children.size() != 1) refuse(options.file, "it holds more than one account; give one child");
+  return changeAccounts(options, [&](AccountStore& store) {
+    const FoundAccount parent = store.find(options.parent);
+    if (parent.parent)
+      refuse(options.file,
+             fmt::format("\"{}\" is a child account itself, of \"{}\", and can have no children",
+                         options.parent, storedIdentifier(*parent.parent)));
+    const Dictionary* const properties = children[0].asDictionary();
+    const AccountPtr child =
+        properties != nullptr ? ASSBasicAccount::initWithProperties(*properties) : nullptr;
+    if (!child) return requireUsable(options.file, children);
+    if (properties->contains(accountsettings::kAccountChildAccounts))
+      refuse(options.file, "the child has \"ChildAccounts\"; a child account has no children");
+    requireNew(options.file, child->identifier().value_or(""), store);
+    store.manager().addChildToAccount(child, parent.account);
+  });
+}
+
+}  // namespace
+
+void addInsertCommand(CLI::App& app, ExitCode& outcome) {
+  const auto options = std::make_shared<Options>();
+  CLI::App* const command =
+      app.add_subcommand("insert", "Append accounts; their identifiers are printed");
+  command
+      ->add_option("FILE", options->file,
+                   "A property list, in the binary, XML or JSON form, with one account's "
+                   "dictionary or an array of them")
+      ->required();
+  addChangeOptions(*command, *options);
+  command->footer(
+      "All accounts are inserted or none. One without an \"Identifier\" gets a new one.\n\n"
+      "Example:\n"
+      "  echo '{\"Type\": \"CardDAV\", \"Class\": \"CardDAVAccount\"}' >account.json\n"
+      "  account-settings insert account.json --image my-device");
+  command->callback([options, &outcome] { outcome = runInsert(*options); });
+}
+
+void addAddChildCommand(CLI::App& app, ExitCode& outcome) {
+  const auto options = std::make_shared<Options>();
+  CLI::App* const command =
+      app.add_subcommand("add-child", "Add a child account; its identifier is printed");
+  command->add_option("PARENT", options->parent, "The top-level account")->required();
+  command
+      ->add_option("FILE", options->file,
+                   "A property list, in the binary, XML or JSON form, with the child's dictionary")
+      ->required();
+  addChangeOptions(*command, *options);
+  command->footer("Example:\n  account-settings add-child Q1 child.json --image my-device");
+  command->callback([options, &outcome] { outcome = runAddChild(*options); });
+}
+
+}  // namespace tools
