@@ -1,5 +1,6 @@
 #include "tests/accountservices/ServicesImage.h"
 
+#include <cstdlib>
 #include <filesystem>
 #include <fstream>
 #include <iterator>
@@ -14,6 +15,7 @@ using deviceimage::DeviceImage;
 
 namespace {
 
+constexpr const char* kTemporaryDirectoryVariable = "TMPDIR";
 constexpr std::string_view kTimeForm = R"({"time": "0000-00-00T00:00:00Z", )";
 
 std::string fileContent(const std::string& path) {
@@ -49,7 +51,16 @@ ServicesImage::ServicesImage() {
   _services = std::make_unique<deviceimage::DeviceImageServices>(_image, std::move(options));
   platform::install(_services->services());
   // A save makes its temporary file there.
-  ::setenv("TMPDIR", _image->temporaryDirectory().c_str(), 1);
+  if (const char* const earlier = ::getenv(kTemporaryDirectoryVariable))
+    _earlierTemporaryDirectory = earlier;
+  ::setenv(kTemporaryDirectoryVariable, _image->temporaryDirectory().c_str(), 1);
+}
+
+ServicesImage::~ServicesImage() {
+  if (_earlierTemporaryDirectory)
+    ::setenv(kTemporaryDirectoryVariable, _earlierTemporaryDirectory->c_str(), 1);
+  else
+    ::unsetenv(kTemporaryDirectoryVariable);
 }
 
 void ServicesImage::addBundle(const std::string& name, const std::string& builtFile) const {

@@ -4,6 +4,7 @@
 #include <gtest/gtest.h>
 
 #include <memory>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -31,6 +32,9 @@ inline constexpr const char* kNotes = "com.vantor.Dataclass.Notes";
 class ServicesImage {
  public:
   ServicesImage();
+  ~ServicesImage();
+  ServicesImage(const ServicesImage&) = delete;
+  ServicesImage& operator=(const ServicesImage&) = delete;
 
   // Puts a further bundle among the services.
   void addBundle(const std::string& name, const std::string& builtFile) const;
@@ -57,6 +61,7 @@ class ServicesImage {
   platform::TemporaryDirectory _directory;
   std::shared_ptr<const deviceimage::DeviceImage> _image;
   std::unique_ptr<deviceimage::DeviceImageServices> _services;
+  std::optional<std::string> _earlierTemporaryDirectory;
 };
 
 // An account with one enabled dataclass, or none.
