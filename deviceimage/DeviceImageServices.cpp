@@ -8,11 +8,12 @@
 #include "deviceimage/ImageLock.h"
 #include "deviceimage/ImageMessages.h"
 #include "deviceimage/ImagePreferences.h"
-#include "deviceimage/ImageProcesses.h"
 #include "deviceimage/ImageProperties.h"
 #include "deviceimage/ImageSyncDataSource.h"
 #include "platform/posix/DlAddrBundleResources.h"
+#include "platform/posix/LinuxProcessTable.h"
 #include "platform/posix/MonotonicClock.h"
+#include "platform/posix/PollRunLoop.h"
 #include "platform/posix/PosixFileServices.h"
 #include "platform/posix/ProcessClassRegistry.h"
 #include "platform/posix/RandomUUIDGenerator.h"
@@ -30,6 +31,7 @@ class DeviceImageServices::Implementation {
         _deviceInfo(image),
         _fileLocks(image),
         _preferences(image),
+        _processTable(image->rootPath()),
         _restrictions(image),
         _syncDataSource(_databases),
         _systemLog(image, std::move(options.processName), std::move(options.logSink),
@@ -56,9 +58,9 @@ class DeviceImageServices::Implementation {
   ImageFileLocks _fileLocks;
   platform::PosixFileServices _fileServices;
   ImagePreferences _preferences;
-  ImageProcessTable _processTable;
+  platform::LinuxProcessTable _processTable;
   ImageRestrictions _restrictions;
-  WaitingRunLoop _runLoop;
+  platform::PollRunLoop _runLoop;
   ImageSyncDataSource _syncDataSource;
   ImageSystemLog _systemLog;
   ImageNotifyCenter _notifyCenter;

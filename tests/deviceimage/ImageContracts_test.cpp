@@ -14,6 +14,7 @@
 #include "tests/contracts/ProcessTableContract.h"
 #include "tests/contracts/RestrictionsContract.h"
 #include "tests/contracts/RunLoopContract.h"
+#include "tests/contracts/StartedProcesses.h"
 #include "tests/contracts/SyncDataSourceContract.h"
 #include "tests/contracts/SystemLogContract.h"
 #include "tests/contracts/UserDatabaseContract.h"
@@ -267,11 +268,14 @@ INSTANTIATE_TEST_SUITE_P(DeviceImage, ExclusiveFileLockContract,
 class ImageProcesses : public OnAnImage<ProcessTableUnderTest> {
  public:
   platform::ProcessTable& service() override { return services().processTable; }
-  std::optional<pid_t> startProcess(const std::string& /*commandName*/) override {
-    return std::nullopt;
+  std::optional<pid_t> startProcess(const std::string& commandName) override {
+    return _started.start("/bin/sleep", image.path("usr/libexec"), commandName, {"1000"});
   }
-  bool hasEnded(pid_t /*process*/) override { return true; }
-  pid_t unusedIdentifier() override { return 4711; }
+  bool hasEnded(pid_t process) override { return _started.waitForEnd(process) == SIGKILL; }
+  pid_t unusedIdentifier() override { return 1 << 22; }  // the kernel's numbers are below
+
+ private:
+  StartedProcesses _started;
 };
 INSTANTIATE_TEST_SUITE_P(DeviceImage, ProcessTableContract,
                          Values(portOf<ImageProcesses>("DeviceImage")));

@@ -1,0 +1,47 @@
+// A daemon for the tests: does what its first argument says, all but the last after saying
+// "." to whoever started it.
+//   obeys FILE      ends once the file names the notification
+//   restarts FILE   leaves the work to a new process at that moment
+//   ignores         does nothing but stay, and lets no signal end it that can be kept from it
+//   lasts           does nothing but stay
+#include <signal.h>
+#include <unistd.h>
+
+#include <chrono>
+#include <fstream>
+#include <iterator>
+#include <string>
+#include <thread>
+
+namespace {
+
+bool wasAskedToExit(const char* file) {
+  std::ifstream stream(file);
+  const std::string content{std::istreambuf_iterator<char>(stream), {}};
+  return content.find("com.vantor.Orvette.BackupAgent.WillStart") != std::string::npos;
+}
+
+[[noreturn]] void stay() {
+  sigset_t all;
+  sigfillset(&all);
+  sigprocmask(SIG_BLOCK, &all, nullptr);
+  for (;;) ::pause();
+}
+
+}  // namespace
+
+int main(int count, char** arguments) {
+  if (count < 2) return 2;
+  const std::string behaviour = arguments[1];
+  if (behaviour == "lasts") ::pause();
+  if (::write(STDOUT_FILENO, ".", 1) != 1) return 1;
+  if (behaviour == "ignores") stay();
+  if (count < 3) return 2;
+  while (!wasAskedToExit(arguments[2])) std::this_thread::sleep_for(std::chrono::milliseconds(10));
+  if (behaviour == "restarts" && ::fork() == 0) {
+    ::alarm(60);  // in case that nobody kills it
+    ::execl("/proc/self/exe", arguments[0], "lasts", nullptr);
+    return 1;
+  }
+  return 0;
+}
