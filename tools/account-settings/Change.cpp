@@ -8,6 +8,7 @@
 #include <algorithm>
 #include <chrono>
 #include <cstdlib>
+#include <exception>
 #include <nlohmann/json.hpp>
 #include <optional>
 #include <thread>
@@ -110,26 +111,33 @@ std::optional<std::string> failureLine(const AccountStore& store) {
                   store.image().absolutePath(DeviceImage::kUsersFile)));
 }
 
+[[noreturn]] void failRaised(const AccountStore& store, bool saved, const std::string& what) {
+  throw CommandFailure(
+      ExitCode::unexpectedFailure,
+      fmt::format("{}: the accounts were {}: {}; the account services are listed in "
+                  "{}/AccountCreators.plist; install what it names into the image, or leave "
+                  "--notify out",
+                  store.image().settingsFile(),
+                  saved ? "saved, but not every notifier was told" : "not saved", what,
+                  installedAccountResources()));
+}
+
 void save(AccountStore& store, bool notify) {
   const FileIdentity before = settingsFileIdentity(store.image());
+  const auto isSaved = [&] { return settingsFileIdentity(store.image()) != before; };
   store.startLogging();
   ASSAccountsManager::_setShouldSkipNotifications(!notify);
   try {
     store.manager().saveAllAccounts();
   } catch (const platform::InternalConsistencyFailure& failure) {
-    const bool saved = settingsFileIdentity(store.image()) != before;
-    throw CommandFailure(
-        ExitCode::unexpectedFailure,
-        fmt::format("{}: the accounts were {}: {} ({}, line {}); the account services are "
-                    "listed in {}/AccountCreators.plist; install what it names into the image, or "
-                    "leave --notify out",
-                    store.image().settingsFile(),
-                    saved ? "saved, but not every notifier was told" : "not saved", failure.what(),
-                    failure.sourceFile(), failure.line(), installedAccountResources()));
+    failRaised(
+        store, isSaved(),
+        fmt::format("{} ({}, line {})", failure.what(), failure.sourceFile(), failure.line()));
+  } catch (const std::exception& failure) {  // of a notifier's own
+    failRaised(store, isSaved(), failure.what());
   }
   if (const auto line = failureLine(store)) failUnsaved(store, *line);
-  if (settingsFileIdentity(store.image()) == before)
-    failUnsaved(store, "The library said nothing.");
+  if (!isSaved()) failUnsaved(store, "The library said nothing.");
 }
 
 void report(const AccountStore& store, const std::vector<Difference>& differences,

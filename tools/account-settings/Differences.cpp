@@ -93,6 +93,11 @@ const char* nameOf(Difference::Kind kind) {
                                              : "modified";
 }
 
+// A string stands between quotes, so that it is told from a number.
+std::string quoted(const Value& value) {
+  return value.asString() != nullptr ? '"' + shownValue(value) + '"' : shownValue(value);
+}
+
 }  // namespace
 
 std::vector<Difference> differencesBetween(const std::vector<Dictionary>& before,
@@ -117,12 +122,11 @@ std::string describe(const Difference& difference) {
       break;
   }
   if (!difference.after)
-    return fmt::format("{}: {}: {} removed", account, difference.key,
-                       shownValue(*difference.before));
+    return fmt::format("{}: {}: {} removed", account, difference.key, quoted(*difference.before));
   if (!difference.before)
-    return fmt::format("{}: {}: {} added", account, difference.key, shownValue(*difference.after));
-  return fmt::format("{}: {}: {} -> {}", account, difference.key, shownValue(*difference.before),
-                     shownValue(*difference.after));
+    return fmt::format("{}: {}: {} added", account, difference.key, quoted(*difference.after));
+  return fmt::format("{}: {}: {} -> {}", account, difference.key, quoted(*difference.before),
+                     quoted(*difference.after));
 }
 
 nlohmann::ordered_json jsonOf(const Difference& difference) {

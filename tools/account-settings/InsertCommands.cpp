@@ -1,7 +1,7 @@
 #include <fmt/format.h>
 
-#include <algorithm>
 #include <memory>
+#include <set>
 
 #include "tools/account-settings/Change.h"
 #include "tools/account-settings/Commands.h"
@@ -46,12 +46,22 @@ void requireUsable(const std::string& file, const Array& accounts) {
     if (oddity.effect != Oddity::Effect::none) refuse(file, describe(oddity));
 }
 
-void requireNew(const std::string& file, const std::string& identifier, const AccountStore& store) {
+// Refuses an account whose identifier, or a child's, the store has already.
+void requireNew(const std::string& file, const AccountStore& store,
+                const std::vector<AccountPtr>& accounts) {
   const std::vector<std::string> known = store.identifiers();
-  if (std::find(known.begin(), known.end(), identifier) != known.end())
-    refuse(file, fmt::format("the identifier \"{}\" is taken in {}; give another, or delete that "
-                             "account first",
-                             identifier, store.image().settingsFile()));
+  const std::set<std::string> taken(known.begin(), known.end());
+  const auto requireFree = [&](const AccountPtr& account) {
+    const std::string identifier = account->identifier().value_or("");
+    if (taken.contains(identifier))
+      refuse(file, fmt::format("the identifier \"{}\" is taken in {}; give another, or delete that "
+                               "account first",
+                               identifier, store.image().settingsFile()));
+  };
+  for (const AccountPtr& account : accounts) {
+    requireFree(account);
+    for (const FoundAccount& child : AccountStore::childrenOf(account)) requireFree(child.account);
+  }
 }
 
 ExitCode runInsert(const Options& options) {
@@ -59,11 +69,7 @@ ExitCode runInsert(const Options& options) {
   return changeAccounts(options, [&](AccountStore& store) {
     requireUsable(options.file, accounts);
     const auto made = ASSAccountsManager::initWithAccounsInfoArray(accounts);
-    for (const AccountPtr& account : *made->allBasicAccounts()) {
-      requireNew(options.file, account->identifier().value_or(""), store);
-      for (const FoundAccount& child : AccountStore::childrenOf(account))
-        requireNew(options.file, child.account->identifier().value_or(""), store);
-    }
+    requireNew(options.file, store, *made->allBasicAccounts());
     for (const AccountPtr& account : *made->allBasicAccounts())
       store.manager().insertAccount(account);
   });
@@ -84,7 +90,7 @@ ExitCode runAddChild(const Options& options) {
     if (!child) return requireUsable(options.file, children);
     if (properties->contains(accountsettings::kAccountChildAccounts))
       refuse(options.file, "the child has \"ChildAccounts\"; a child account has no children");
-    requireNew(options.file, child->identifier().value_or(""), store);
+    requireNew(options.file, store, {child});
     store.manager().addChildToAccount(child, parent.account);
   });
 }

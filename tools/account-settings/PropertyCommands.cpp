@@ -4,6 +4,8 @@
 
 #include "tools/account-settings/Change.h"
 #include "tools/account-settings/Commands.h"
+#include "tools/account-settings/Shown.h"
+#include "tools/common/Program.h"
 #include "tools/common/Text.h"
 #include "tools/common/TypedProperty.h"
 
@@ -50,6 +52,11 @@ ExitCode runSet(const Options& options) {
     const FoundAccount found = store.find(options.identifier);
     const propertylist::Value* const current = found.account->properties().find(name);
     if (current != nullptr && *current == value) return;
+    if (current != nullptr && current->kind() != value.kind() && options.key == name)
+      printMessage(
+          fmt::format("note: \"{}\" was of the kind {} and is a string now; {}:{} keeps "
+                      "the kind",
+                      name, kindName(*current), name, kindName(*current)));
     found.account->setAccountPropertyForKey(value, name);
     store.update(found);
   });

@@ -66,6 +66,12 @@ std::string orDash(const std::optional<std::string>& text) {
   return text && !text->empty() ? *text : "-";
 }
 
+// A child follows its parent as long as that has dataclasses turned on.
+bool followsParent(const FoundAccount& found) {
+  const auto ofParent = found.parent ? found.parent->enabledDataclasses() : std::nullopt;
+  return ofParent && !ofParent->empty();
+}
+
 void printTables(const FoundAccount& found) {
   const ASSBasicAccount& account = *found.account;
   Table summary({"ACCOUNT", orDash(storedIdentifier(account))});
@@ -77,7 +83,8 @@ void printTables(const FoundAccount& found) {
   summary.addRow({"CHILDREN", joined(childIdentifiers(found))});
   summary.addRow({"SUPPORTED", joined(shownDataclasses(account.supportedDataclasses()))});
   summary.addRow({"PROVISIONED", joined(shownDataclasses(account.provisionedDataclasses()))});
-  summary.addRow({"ENABLED", joined(shownDataclasses(account.enabledDataclasses()))});
+  summary.addRow({"ENABLED", joined(shownDataclasses(account.enabledDataclasses())) +
+                                 (followsParent(found) ? " (as the parent)" : "")});
   Table properties({"PROPERTY", "KIND", "FROM", "VALUE"});
   for (const Dictionary::Entry& entry : account.properties())
     properties.addRow({entry.key(), kindName(entry.value()), "own", shownValue(entry.value())});

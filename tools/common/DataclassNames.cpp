@@ -20,7 +20,7 @@ std::string dataclassIdentifierOf(const std::string& name) {
   throw CommandFailure(
       ExitCode::wrongUsage,
       fmt::format("there is no dataclass \"{}\"; give mail, contacts, calendars, reminders, "
-                  "bookmarks, notes or a whole identifier ({}...)",
+                  "bookmarks, notes or a whole identifier such as {}Backup",
                   name, kPrefix));
 }
 

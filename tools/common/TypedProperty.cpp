@@ -2,6 +2,8 @@
 
 #include <fmt/format.h>
 
+#include <algorithm>
+#include <array>
 #include <charconv>
 #include <cmath>
 #include <optional>
@@ -65,16 +67,28 @@ std::optional<Value> valueOf(std::string_view kind, std::string_view text) {
   return std::nullopt;
 }
 
+std::string_view exampleOf(std::string_view kind) {
+  if (kind == "integer") return "a whole number of at most 64 bits";
+  if (kind == "real") return "a number such as 0.5";
+  if (kind == "boolean") return "true or false";
+  if (kind == "date") return "a date such as 2026-11-21T02:40:00Z";
+  if (kind == "data") return "hexadecimal digits, two for each byte";
+  return "UTF-8 text";
+}
+
 }  // namespace
 
 Value typedValue(std::string_view kind, std::string_view text, std::string_view shown) {
+  constexpr std::array kKinds = {"string", "integer", "real", "boolean", "date", "data"};
+  if (std::find(kKinds.begin(), kKinds.end(), kind) == kKinds.end())
+    throw CommandFailure(ExitCode::wrongUsage,
+                         fmt::format("\"{}\": there is no kind \"{}\"; what follows the last "
+                                     "\":\" of the key is one of {}",
+                                     shown, kind, fmt::join(kKinds, ", ")));
   std::optional<Value> value = valueOf(kind, text);
   if (!value)
-    throw CommandFailure(
-        ExitCode::wrongUsage,
-        fmt::format("the value of \"{}\" is no {}; the KIND of KEY:KIND is string, integer, real, "
-                    "boolean, date or data",
-                    shown, kind));
+    throw CommandFailure(ExitCode::wrongUsage, fmt::format("\"{}\": the value is no {}; write {}",
+                                                           shown, kind, exampleOf(kind)));
   return *std::move(value);
 }
 

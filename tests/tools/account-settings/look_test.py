@@ -104,6 +104,7 @@ class Show(SettingsTest):
         lines = self.succeed("show", "Q1C").splitlines()
         self.assertIn("PARENT       Q1", lines)
         self.assertIn("SUPPORTED    calendars reminders", lines)
+        self.assertIn("ENABLED      contacts (as the parent)", lines)
         rows = [line.split() for line in lines]
         self.assertIn(["Class", "string", "own", "MobileCalDAVAccount"], rows)
         self.assertIn(["Username", "string", "parent", "ada"], rows)

@@ -31,6 +31,13 @@ class Set(SettingsTest):
         self.assertEqual(self.account("Q1"), QUILLNET)
         self.assertEqual(self.settings()["Version"], 12)
 
+    def test_notes_that_a_value_changed_its_kind_unless_it_was_told_to(self):
+        ended = self.run_on_image("set", "M1", "PortNumber", "995")
+        self.assertEqual(ended.returncode, 0)
+        self.assertIn(b"PortNumber:integer keeps the kind", ended.stderr)
+        self.assertEqual(self.account("M1")["PortNumber"], "995")
+        self.succeed("set", "M1", "PortNumber:integer", "995")
+
     def test_takes_a_negative_number_behind_two_dashes(self):
         self.succeed("set", "M1", "Offset:integer", "--", "-5")
         self.assertEqual(self.account("M1")["Offset"], -5)
@@ -99,9 +106,9 @@ class EveryChange(SettingsTest):
         self.assertEqual(
             self.succeed("set", "M1", "PortNumber:integer", "995", "--dry-run"), "M1: PortNumber: 993 -> 995\n"
         )
-        self.assertEqual(self.succeed("set", "M1", "New", "x", "--dry-run"), "M1: New: x added\n")
+        self.assertEqual(self.succeed("set", "M1", "New", "x", "--dry-run"), 'M1: New: "x" added\n')
         self.assertEqual(self.succeed("unset", "Q1C", "DisplayName", "--dry-run"),
-                         "Q1/Q1C: DisplayName: Kalender removed\n")  # fmt: skip
+                         'Q1/Q1C: DisplayName: "Kalender" removed\n')  # fmt: skip
         self.assertEqual(self.succeed("unset", "M1", "Nothing", "--dry-run"), "nothing would change\n")
         answer = self.answer("set", "M1", "New", "x", "--dry-run")
         self.assertEqual((answer["dry_run"], answer["saved"]), (True, False))
