@@ -16,17 +16,24 @@ using deviceimage::DeviceImage;
 using deviceimage::JSONMembers;
 using propertylist::Dictionary;
 
+void logLostNote(std::string_view journal, std::string_view reason) {
+  platform::logToSystem("Could not note in %@ what an account service heard: %@", journal, reason);
+}
+
 // The image is opened anew for each call, so that nothing outlives what was installed.
 void append(std::string_view journal, const std::vector<JSONMembers>& lines) {
   const std::string root = platform::services().deviceInfo.systemRootDirectory();
   const deviceimage::OpenedImage opened = DeviceImage::open(root);
   if (!opened.image) {
-    platform::logToSystem("Could not note in %@ what an account service heard: %@", journal,
-                          opened.error);
+    logLostNote(journal, opened.error);
     return;
   }
   deviceimage::Journal file(opened.image, journal);
-  for (const JSONMembers& members : lines) file.append(deviceimage::jsonLine(members));
+  for (const JSONMembers& members : lines) {
+    if (file.append(deviceimage::jsonLine(members))) continue;
+    logLostNote(journal, "the file cannot be written");
+    return;
+  }
 }
 
 std::string_view nameOf(const Dictionary& change) {

@@ -73,19 +73,20 @@ void appendJSON(std::string& line, const std::vector<std::string>& texts) {
 
 }  // namespace
 
-void Journal::append(std::string_view line) {
+bool Journal::append(std::string_view line) {
   const std::scoped_lock lock(_mutex);
   if (!_file.isOpen())
     _file = Descriptor(_image->openFile(_name, O_WRONLY | O_APPEND | O_CREAT).descriptor);
-  if (!_file.isOpen()) return;
+  if (!_file.isOpen()) return false;
   const std::string whole = std::string(line) + "\n";
   std::string_view rest = whole;
   while (!rest.empty()) {
     const ssize_t written = ::write(_file.number(), rest.data(), rest.size());
     if (written < 0 && errno == EINTR) continue;
-    if (written <= 0) return;
+    if (written <= 0) return false;
     rest.remove_prefix(static_cast<std::size_t>(written));
   }
+  return true;
 }
 
 std::string timestamp() {

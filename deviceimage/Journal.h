@@ -22,8 +22,9 @@ class Journal {
   // `name` is one of DeviceImage's constants.
   Journal(std::shared_ptr<const DeviceImage> image, std::string_view name)
       : _image(std::move(image)), _name(name) {}
-  // Adds `line`, which has no line break, and a line end. What cannot be written is lost.
-  void append(std::string_view line);
+  // Adds `line`, which has no line break, and a line end. False when it could not be written, or
+  // not to its end.
+  bool append(std::string_view line);
 
  private:
   std::shared_ptr<const DeviceImage> _image;

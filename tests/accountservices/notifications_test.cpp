@@ -94,6 +94,19 @@ TEST_F(Notifications, LeaveTheJournalToItsOwner) {
   EXPECT_EQ(status.st_mode & 07777U, 0600U);
 }
 
+TEST_F(Notifications, ThatCannotBeNotedBecomeALineOfTheSystemLog) {
+  const std::string journal = image.root() + "/var/log/account-changes.jsonl";
+  std::filesystem::remove(journal);
+  std::filesystem::create_directory(journal);
+  ASSAccountsManager::accountDidChangeForDataclass(record(account("1", "CalDAV")), kCalendars);
+  const Lines lines = image.journal("var/log/system.log");
+  ASSERT_EQ(lines.size(), 1U);
+  EXPECT_THAT(
+      lines.front(),
+      testing::EndsWith("]: Could not note in var/log/account-changes.jsonl what an account "
+                        "service heard: the file cannot be written"));
+}
+
 TEST_F(Notifications, OfAServiceThatIsAbsentAreABrokenInstallationWithTheFileWritten) {
   image.removeBundle("CalendarService.so");
   const auto store = storeOf({account("1", "CalDAV", kCalendars)});
