@@ -1,8 +1,11 @@
 // Lists the accounts of a device image, or gives one of them another name and has the image's
-// notifiers told.
+// notifiers told. Notifiers and full accounts are code of the image, which runs in this process
+// with its rights: rename accounts only of an image that nobody else can write.
 
 #include <cstdlib>
 #include <iostream>
+#include <string>
+#include <string_view>
 
 #include "QuillnetAccountTypeRemoval/ASSAccountsManager.h"
 #include "deviceimage/DeviceImageServices.h"
@@ -24,9 +27,11 @@ void list(const ASSAccountsManager& store) {
               << "  " << account->displayName().value_or("-") << '\n';
 }
 
-bool rename(ASSAccountsManager& store, const char* identifier, const char* name) {
+// False when there is no such account.
+bool rename(ASSAccountsManager& store, const std::string& identifier, const char* name) {
   const AccountPtr account = store.accountWithIdentifier(identifier);
-  if (!account) return false;
+  // A child's identifier finds its parent.
+  if (!account || account->identifier() != identifier) return false;
   account->setDisplayName(name);
   ASSAccountsManager::_setShouldSkipNotifications(false);
   store.saveAllAccounts();
@@ -56,13 +61,18 @@ int main(int count, char** arguments) {
   deviceimage::ServiceOptions options;
   options.processName = "rename-account";
   options.resourceDirectory = arguments[2];
-  options.logSink = [](std::string_view line) { std::cerr << line << '\n'; };
+  bool isUnsaved = false;  // the log alone tells whether a save succeeded
+  options.logSink = [&isUnsaved](std::string_view line) {
+    std::cerr << line << '\n';
+    if (line.starts_with("Failed to save accounts to filesystem.")) isUnsaved = true;
+  };
   const deviceimage::DeviceImageServices services(opened.image, options);
   platform::install(services.services());
   try {
     const auto store = ASSAccountsManager::init();
     if (count == 5 && !rename(*store, arguments[3], arguments[4]))
       return fail(std::string("there is no account \"") + arguments[3] + "\"");
+    if (isUnsaved) return fail("the account was not renamed");
     list(*store);
   } catch (const platform::InternalConsistencyFailure& failure) {
     return fail(std::string("the installation is broken: ") + failure.what());

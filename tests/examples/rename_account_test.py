@@ -57,6 +57,23 @@ class RenameAccount(unittest.TestCase):
         self.assertEqual(self.run_program(1, self.image, RESOURCES, "nobody", "x"),
                          'rename-account: there is no account "nobody"\n')
 
+    def test_does_not_take_the_parent_for_its_child(self):
+        settings = plistlib.loads((self.image / SETTINGS).read_bytes())
+        settings["Accounts"][0]["ChildAccounts"] = [
+            {"Identifier": "child", "Type": "CalDAV", "Class": "C", "DisplayName": "Child"}]
+        (self.image / SETTINGS).write_bytes(plistlib.dumps(settings))
+        self.assertEqual(self.run_program(1, self.image, RESOURCES, "child", "x"),
+                         'rename-account: there is no account "child"\n')
+        self.assertEqual(self.names(), ["Verein", "Post"])
+
+    def test_says_that_the_account_could_not_be_saved(self):
+        users = self.image / "etc/passwd"
+        users.write_text(users.read_text().replace("mobile:", "nobody:"))
+        said = self.run_program(1, self.image, RESOURCES, "club", "Klub")
+        self.assertIn("Failed to save accounts to filesystem.", said)
+        self.assertTrue(said.endswith("\nrename-account: the account was not renamed\n"), said)
+        self.assertEqual(self.names(), ["Verein", "Post"])
+
     def test_says_that_there_is_no_image(self):
         self.assertIn("rename-account: cannot open the device image",
                       self.run_program(1, self.directory / "none", RESOURCES))
