@@ -1,6 +1,7 @@
 # What is installed besides the programs and bundles, which say so in their own folders: the two
 # libraries that a host, the plug-in and other bundles share, the account settings library and the device
-# image for programs that link them, and what compilers and build systems need for that.
+# image for programs that link them, and what compilers and build systems need for that. The component
+# runtime runs alone; development needs runtime, and documentation nothing.
 include(CMakePackageConfigHelpers)
 set(package_directory ${CMAKE_INSTALL_LIBDIR}/cmake/AccountRetirement)
 set(header_directory ${CMAKE_INSTALL_INCLUDEDIR}/account-retirement)
@@ -11,7 +12,7 @@ set(services_directory ${CMAKE_INSTALL_LIBDIR}/account-retirement/services)
 install(
   TARGETS propertylist platform
   EXPORT AccountRetirementTargets
-  LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR} COMPONENT runtime
+  LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR} COMPONENT runtime NAMELINK_COMPONENT development
   INCLUDES DESTINATION ${header_directory})
 install(TARGETS account_settings EXPORT AccountRetirementTargets
         ARCHIVE DESTINATION ${CMAKE_INSTALL_LIBDIR} COMPONENT development)
@@ -86,7 +87,7 @@ function(install_pkgconfig file package_name package_libraries package_requires)
 endfunction()
 set(package_description "Interfaces of the device, the class registry, and property lists")
 install_pkgconfig(account-retirement-platform "Account retirement, platform"
-                  "-lplatform -lpropertylist" "")
+                  "-laccount-retirement-platform -laccount-retirement-propertylist" "")
 set(package_description "The account settings library")
 install_pkgconfig(account-retirement "Account retirement" -laccount_settings
                   "account-retirement-platform = ${PROJECT_VERSION}")
@@ -95,11 +96,11 @@ install_pkgconfig(account-retirement-deviceimage "Account retirement, device ima
                   "account-retirement-platform = ${PROJECT_VERSION}, sqlite3")
 
 install(
-  FILES LICENSE README.md CHANGELOG.md
+  FILES LICENSE README.md CHANGELOG.md CONTRIBUTING.md
   DESTINATION ${CMAKE_INSTALL_DOCDIR}
   COMPONENT documentation)
 install(
-  DIRECTORY docs/
+  DIRECTORY docs
   DESTINATION ${CMAKE_INSTALL_DOCDIR}
   COMPONENT documentation
   FILES_MATCHING

@@ -39,6 +39,16 @@ set(PROJECT_MIGRATORS_DIRECTORY ${PROJECT_BINARY_DIR}/lib/account-retirement/mig
 set(PROJECT_SERVICES_DIRECTORY ${PROJECT_BINARY_DIR}/lib/account-retirement/services)
 set(CMAKE_INSTALL_RPATH $ORIGIN $ORIGIN/../${CMAKE_INSTALL_LIBDIR} $ORIGIN/../../..)
 
+# shared_library(<target>) names a library that stays loaded in other people's processes: its file says
+# whose it is, and what was built for another version of the package does not load with it.
+function(shared_library target)
+  set_target_properties(
+    ${target}
+    PROPERTIES OUTPUT_NAME account-retirement-${target}
+               VERSION ${PROJECT_VERSION}
+               SOVERSION ${PROJECT_VERSION_MAJOR}.${PROJECT_VERSION_MINOR})
+endfunction()
+
 # project_test(<name> <source>... LIBRARIES <target>...) builds one GoogleTest program. CTest runs each
 # of its cases in a process of its own, because much of the state under test is kept per process.
 function(project_test name)

@@ -54,8 +54,8 @@ class InstalledPackage(unittest.TestCase):
         lines = re.sub(r"^c\+\+", f"{CXX} {' '.join(FLAGS)}", lines)
         run("sh", "-e", "-c", lines, cwd=folder, env=self.environment)
 
-    def heard(self, notifier: Path, program: Path) -> list[str]:
-        """What the notifier logs when the program renames an account that it serves."""
+    def image_with(self, notifier: Path) -> tuple[Path, Path]:
+        """An image with the notifier and two accounts, and resources that name the notifier for one."""
         image, resources = notifier.parent / "image", notifier.parent / "resources"
         tool = self.prefix / "bin/device-image"
         run(tool, "create", image)
@@ -69,10 +69,15 @@ class InstalledPackage(unittest.TestCase):
         (entry,) = samples("xml")
         catalogue["CalDAV"].append(plistlib.loads(f"<plist version='1.0'>{entry}</plist>".encode()))
         (resources / "AccountCreators.plist").write_bytes(plistlib.dumps(catalogue))
+        return image, resources
+
+    def heard(self, notifier: Path, program: Path) -> list[str]:
+        """What the notifier logs when the program renames an account that it serves."""
+        image, resources = self.image_with(notifier)
         for identifier in ("club", "other"):
             self.assertIn(f"{identifier}  ", run(program, image, resources, identifier, "New name"))
         lines = (image / "var/log/system.log").read_text(encoding="utf-8").splitlines()
-        run(tool, "check", image)
+        run(self.prefix / "bin/device-image", "check", image)
         return [re.sub(r"^\S+ rename-account\[\d+\]: ", "", line) for line in lines]
 
     def check_examples(self, notifier: Path, program: Path):
@@ -86,9 +91,28 @@ class InstalledPackage(unittest.TestCase):
 
     def test_the_examples_are_built_with_cmake(self):
         notifier, program = self.copy_of("notifier"), self.copy_of("rename-account")
+        (build_file,) = samples("cmake")
+        (notifier / "CMakeLists.txt").write_text(build_file, encoding="utf-8")
         self.run_sample(samples("sh")[0], notifier)
         self.run_sample(samples("sh")[0], program)
         self.check_examples(notifier / "build/SampleNotifier.so", program / "build/rename-account")
+        self.check_other_version(notifier / "build/SampleNotifier.so", program / "build/rename-account")
+
+    def check_other_version(self, notifier: Path, program: Path):
+        """A bundle that was built for another version does not load, and the loader's text is told."""
+        code = notifier.read_bytes()
+        other = code.replace(b"libaccount-retirement-platform.so.0.1", b"libaccount-retirement-platform.so.9.9")
+        self.assertNotEqual(other, code)
+        (self.directory / "other").mkdir()
+        notifier = self.directory / "other/SampleNotifier.so"
+        notifier.write_bytes(other)
+        image, resources = self.image_with(notifier)
+        ended = subprocess.run([program, image, resources, "club", "New name"], capture_output=True, text=True,
+                               timeout=200)
+        self.assertEqual(ended.returncode, 1)
+        self.assertIn("rename-account: the installation is broken: Could not load the account creator "
+                      f"framework {image / PLACE}. Error libaccount-retirement-platform.so.9.9: "
+                      "cannot open shared object file", ended.stderr)
 
     def test_the_examples_are_built_with_pkg_config(self):
         notifier, program = self.copy_of("notifier"), self.copy_of("rename-account")
@@ -98,6 +122,47 @@ class InstalledPackage(unittest.TestCase):
             *self.pkg_config("--cflags", "--libs", "account-retirement",
                              "account-retirement-deviceimage"), f"-Wl,-rpath,{libraries}", cwd=program)
         self.check_examples(notifier / "SampleNotifier.so", program / "rename-account")
+
+    def configure(self, prefix: Path, found: str, *options: str) -> subprocess.CompletedProcess:
+        """Configures a project that links whatever there is of this find_package line."""
+        folder = Path(tempfile.mkdtemp(dir=self.directory))
+        (folder / "CMakeLists.txt").write_text(
+            "cmake_minimum_required(VERSION 3.25)\nproject(consumer LANGUAGES CXX)\n"
+            f"find_package(AccountRetirement 0.1 {found})\n"
+            'message(STATUS "found ${AccountRetirement_FOUND} ${AccountRetirement_deviceimage_FOUND}")\n'
+            "foreach(name IN ITEMS platform account_settings deviceimage)\n"
+            "  if(TARGET AccountRetirement::${name})\n    message(STATUS \"target ${name}\")\n  endif()\n"
+            "endforeach()\n", encoding="utf-8")
+        return subprocess.run([CMAKE, "-S", folder, "-B", folder / "build", f"-DCMAKE_PREFIX_PATH={prefix}",
+                               *options], stdout=subprocess.PIPE, stderr=subprocess.STDOUT, text=True,
+                              timeout=200, env=self.environment)
+
+    def test_the_components_runtime_and_development_are_all_that_cmake_needs(self):
+        prefix = self.directory / "components"
+        for component in ("runtime", "development"):
+            run(CMAKE, "--install", BUILD, "--prefix", prefix, "--component", component)
+        ended = self.configure(prefix, "REQUIRED COMPONENTS deviceimage")
+        self.assertEqual(ended.returncode, 0, ended.stdout)
+        self.assertIn("-- found 1 TRUE\n-- target platform\n-- target account_settings\n"
+                      "-- target deviceimage\n", ended.stdout)
+        self.assertFalse((prefix / "share/doc").exists())
+
+    def test_the_component_runtime_runs_alone(self):
+        prefix = self.directory / "runtime"
+        run(CMAKE, "--install", BUILD, "--prefix", prefix, "--component", "runtime")
+        run(prefix / "bin/device-image", "create", prefix / "image")
+        run(prefix / "bin/migration-host", "run", "--image", prefix / "image")
+        self.assertEqual([*prefix.rglob("*.h"), *prefix.rglob("*.a"), *prefix.rglob("*.cmake")], [])
+
+    def test_without_sqlite_only_the_device_image_is_missing(self):
+        without = "-DCMAKE_DISABLE_FIND_PACKAGE_SQLite3=ON"
+        ended = self.configure(self.prefix, "REQUIRED OPTIONAL_COMPONENTS deviceimage", without)
+        self.assertEqual(ended.returncode, 0, ended.stdout)
+        self.assertIn("-- found 1 FALSE\n-- target platform\n-- target account_settings\n", ended.stdout)
+        self.assertNotIn("target deviceimage", ended.stdout)
+        ended = self.configure(self.prefix, "REQUIRED COMPONENTS deviceimage", without)
+        self.assertNotEqual(ended.returncode, 0)
+        self.assertIn("needs SQLite3", ended.stdout)
 
     def test_every_installed_header_finds_those_it_includes(self):
         top = self.prefix / "include/account-retirement"

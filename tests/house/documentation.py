@@ -38,6 +38,17 @@ def link_problem(file: Path, target: str) -> str | None:
     return None
 
 
+def link_problems(folder: Path) -> tuple[list[str], int]:
+    """The links of the Markdown files below the folder that lead nowhere, and the number of links."""
+    problems, count = [], 0
+    for file in sorted(folder.rglob("*.md")):
+        for target in LINK.findall(file.read_text(encoding="utf-8")):
+            count += 1
+            if problem := link_problem(file, target):
+                problems.append(f"{file.relative_to(folder)}: {problem}")
+    return problems, count
+
+
 def path_problem(tree: Path, text: str) -> str | None:
     """A path into the tree must exist; one that begins elsewhere is none of this check's business."""
     top = text.split("/")[0]

@@ -11,6 +11,7 @@ import sys
 import tempfile
 from pathlib import Path
 
+from documentation import link_problems
 from report import finish
 
 BUNDLE = "account-retirement/migrators/QuillnetAccountRemoval.migrator"
@@ -21,11 +22,13 @@ EXPECTED = [
     "include/account-retirement/localdata/DataclassFunctions.h",
     "include/account-retirement/platform/Services.h",
     "include/account-retirement/propertylist/Value.h",
-    "share/doc/account-retirement/LICENSE", "share/doc/account-retirement/architecture.md",
+    "share/doc/account-retirement/LICENSE", "share/doc/account-retirement/docs/architecture.md",
     "share/man/man1/account-settings.1", "share/man/man1/device-image.1", "share/man/man1/migration-host.1",
 ]
 IN_LIBRARIES = [
-    "libplatform.so", "libpropertylist.so", "libaccount_settings.a", "libdeviceimage.a",
+    *(f"libaccount-retirement-{name}.so{version}" for name in ("platform", "propertylist")
+      for version in ("", ".0.1", ".0.1.0")),
+    "libaccount_settings.a", "libdeviceimage.a",
     *(f"account-retirement/services/{name}Service.so" for name in ("Calendar", "Contacts", "Mail")),
     *(f"cmake/AccountRetirement/AccountRetirement{name}.cmake"
       for name in ("Config", "ConfigVersion", "Targets", "DeviceImageTargets")),
@@ -66,17 +69,19 @@ def check(cmake: str, build: str) -> tuple[list[str], int]:
         done = run(cmake, "--install", build, "--prefix", prefix)
         if done.returncode:
             return [f"cmake --install: {done.returncode}: {done.stderr}"], 1
-        libraries = next(prefix.rglob("libplatform.so"), prefix / "lib/none").parent
+        libraries = next(prefix.rglob("libaccount-retirement-platform.so"), prefix / "lib/none").parent
         expected = [prefix / name for name in EXPECTED]
         expected += [libraries / name for name in IN_LIBRARIES]
         problems = [f"{path.relative_to(prefix)}: not installed" for path in expected if not path.exists()]
+        links, link_count = link_problems(prefix)
+        problems += links
         if not problems:
             problems = check_run(prefix, Path(folder) / "image")
             shutil.rmtree(libraries / BUNDLE)
             done = run(prefix / "bin/migration-host", "run", "--image", Path(folder) / "image")
             if done.returncode != 7:
                 problems.append(f"migration-host runs without its bundle: {done.returncode}")
-        return problems, len(expected) + 2
+        return problems, len(expected) + link_count + 2
 
 
 if __name__ == "__main__":

@@ -22,10 +22,15 @@ class Installation(unittest.TestCase):
         self.assertEqual(problem, "cmake --install: 1: disk full\n")
 
     def test_what_is_not_installed_is_found(self):
-        found = self.problems('mkdir -p "$4/lib" && : >"$4/lib/libplatform.so"')
-        self.assertNotIn("lib/libplatform.so: not installed", found)
-        self.assertIn("lib/libpropertylist.so: not installed", found)
+        found = self.problems('mkdir -p "$4/lib" && : >"$4/lib/libaccount-retirement-platform.so"')
+        self.assertNotIn("lib/libaccount-retirement-platform.so: not installed", found)
+        self.assertIn("lib/libaccount-retirement-propertylist.so: not installed", found)
         self.assertIn("bin/migration-host: not installed", found)
+
+    def test_a_link_of_a_document_to_one_that_is_not_installed_is_found(self):
+        found = self.problems('mkdir -p "$4" && echo "[a](docs/a.md) [b](b.md)" >"$4/b.md"')
+        self.assertIn("b.md: links to docs/a.md, which does not exist", found)
+        self.assertNotIn("b.md: links to b.md, which does not exist", found)
 
 
 if __name__ == "__main__":

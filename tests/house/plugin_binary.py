@@ -16,7 +16,7 @@ from report import finish
 
 NEEDED = re.compile(
     r"(libstdc\+\+\.so\.6|libm\.so\.6|libgcc_s\.so\.1|libc\.so\.6|ld-linux-[\w-]+\.so\.\d"
-    r"|libpropertylist\.so(\.[\d.]+)?|libplatform\.so(\.[\d.]+)?)"
+    r"|libaccount-retirement-(propertylist|platform)\.so\.\d+\.\d+)"
 )
 SANITIZERS = re.compile(r"lib(asan|ubsan|tsan)\.so\.\d+|lib(pthread|dl|rt|resolv)\.so\.\d")
 # Templates of the standard library, and what describes the shared libraries' classes, are emitted by
