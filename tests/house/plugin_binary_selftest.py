@@ -59,8 +59,8 @@ class PluginBinary(unittest.TestCase):
         struct __attribute__((visibility("default"))) AStore { virtual ~AStore() {} };
         }
         namespace { struct : accountsettings::ANotifier {} notifier; accountsettings::AStore store; }"""
-        one = "object.so: shows the symbol vtable for accountsettings::ANotifier (V)"
-        other = "object.so: shows the symbol vtable for accountsettings::AStore (V)"
+        one = "object.so: shows the symbol typeinfo for accountsettings::ANotifier (V)"
+        other = "object.so: shows the symbol typeinfo for accountsettings::AStore (V)"
         found = self.problems(source)
         self.assertIn(one, found)
         self.assertIn(other, found)
