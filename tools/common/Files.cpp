@@ -6,6 +6,7 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <filesystem>
 #include <system_error>
 #include <utility>
 
@@ -34,6 +35,19 @@ class Descriptor {
  private:
   int _number;
 };
+
+// A file that root replaces in somebody's own folder stays that user's. Where others may write, as
+// in /tmp, anybody could have put a file to be given the new one.
+bool handToOwner(const std::string& path, int descriptor) {
+  const std::filesystem::path folder = std::filesystem::path(path).parent_path();
+  struct stat above {};
+  struct stat status {};
+  if (::geteuid() != 0 || ::lstat(path.c_str(), &status) != 0 || !S_ISREG(status.st_mode))
+    return true;
+  if (::stat(folder.empty() ? "." : folder.c_str(), &above) != 0) return false;
+  if ((above.st_mode & (S_IWGRP | S_IWOTH)) != 0) return true;
+  return ::fchown(descriptor, status.st_uid, status.st_gid) == 0;
+}
 
 }  // namespace
 
@@ -88,6 +102,7 @@ void Output::write(std::string_view bytes) {
 void Output::finish() {
   if (std::fflush(_file) != 0) _fail(errno);
   if (_file == stdout) return;
+  if (!handToOwner(_path, ::fileno(_file))) _fail(errno);
   if (::fsync(::fileno(_file)) != 0) _fail(errno);
   if (std::fclose(std::exchange(_file, nullptr)) != 0) _fail(errno);
   if (::rename(_temporaryPath.c_str(), _path.c_str()) != 0) _fail(errno);

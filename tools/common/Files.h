@@ -12,7 +12,8 @@ namespace tools {
 std::string readWholeFile(const std::string& path, std::size_t limit);
 
 // Where a command writes records: standard output, or a file that takes its name only when it is
-// complete, readable by its owner only.
+// complete, readable by its owner only. When root replaces a file, its owner stays, except in a
+// folder that users other than its owner may write.
 class Output {
  public:
   // An empty path is standard output. Ends the command when the file cannot be made.

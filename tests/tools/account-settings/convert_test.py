@@ -164,6 +164,25 @@ class Convert(SettingsTest):
                     ended = run("convert", path, "--to", "json")
                     self.assertEqual((ended.returncode, ended.stdout), (6, b""), ended.stderr)
 
+    def test_of_root_leaves_a_file_to_its_owner_but_for_folders_that_others_may_write(self):
+        if os.geteuid() != 0:
+            self.skipTest("only root replaces files of others")
+        given = self.file("given.json", "{}")
+        for mode, owner in ((0o755, (12345, 12346)), (0o777, (0, 0)), (0o775, (0, 0))):
+            with self.subTest(oct(mode)):
+                folder = self.directory / oct(mode)
+                folder.mkdir()
+                folder.chmod(mode)
+                output = folder / "accounts.plist"
+                output.write_bytes(b"earlier")
+                os.chown(output, 12345, 12346)
+                ended = run("convert", given, "--to", "binary", "--output", output)
+                self.assertEqual((ended.returncode, ended.stderr), (0, b""))
+                status = output.stat()
+                self.assertEqual((status.st_uid, status.st_gid), owner)
+                self.assertEqual(stat.S_IMODE(status.st_mode), 0o600)
+                self.assertEqual([path.name for path in folder.iterdir()], ["accounts.plist"])
+
     def test_writes_a_private_file(self):
         given = self.file("given", "{}")
         self.assertEqual(stat.S_IMODE(self.convert(given, "binary").stat().st_mode), 0o600)
