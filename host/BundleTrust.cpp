@@ -36,39 +36,42 @@ bool holdsThisProgram(const std::filesystem::path& folder) {
   return end == folder.end();
 }
 
-std::optional<std::string> whyFolderAboveIsNotTrusted(const std::string& path) {
+// The second half of the reasons for what belongs to somebody else.
+std::string giveItBack(const TrustWords& words) {
+  return "; give it to " + std::string(words.caller) + " or to root with chown.";
+}
+
+std::optional<std::string> whyFolderAboveIsNotTrusted(const std::string& path,
+                                                      const TrustWords& words) {
   struct stat status = {};
   if (lstat(path.c_str(), &status) != 0)
-    return path + " cannot be looked at: " + errorText(errno) + ".";
-  if (!S_ISDIR(status.st_mode)) return path + " is no folder.";
+    return path + " cannot be looked at: " + errorText(errno) + "; " + std::string(words.remedy) +
+           ".";
+  if (!S_ISDIR(status.st_mode)) return path + " is no folder; put a folder, not a link, there.";
   if (othersMayWrite(status) && (status.st_mode & S_ISVTX) == 0)
-    return path +
-           " may be written by others, who could replace the migrator in it; take the right " +
-           "from them with chmod go-w.";
+    return path + " may be written by others, who could replace " + std::string(words.code) +
+           " in it; take the right from them with chmod go-w.";
   if (!ownerIsTrusted(status))
-    return path +
-           " belongs to another user, who could replace the migrator in it; give it to the " +
-           "user who runs the host or to root with chown.";
+    return path + " belongs to another user, who could replace " + std::string(words.code) +
+           " in it" + giveItBack(words);
   return std::nullopt;
 }
 
 }  // namespace
 
-std::optional<std::string> whyNotTrusted(const std::string& path) {
+std::optional<std::string> whyNotTrusted(const std::string& path, const TrustWords& words) {
   struct stat status = {};
   if (lstat(path.c_str(), &status) != 0)
-    return path + " cannot be looked at: " + errorText(errno) + "; install the migrator again.";
+    return path + " cannot be looked at: " + errorText(errno) + "; " + std::string(words.remedy) +
+           ".";
   if (!S_ISREG(status.st_mode) && !S_ISDIR(status.st_mode))
-    return path + " is neither a file nor a folder; install the migrator again.";
+    return path + " is neither a file nor a folder; " + std::string(words.remedy) + ".";
   if (othersMayWrite(status))
     return path + " may be written by others; take the right from them with chmod go-w.";
-  if (!ownerIsTrusted(status))
-    return path +
-           " belongs to another user; give it to the user who runs the host or to root with " +
-           "chown.";
+  if (!ownerIsTrusted(status)) return path + " belongs to another user" + giveItBack(words);
   for (std::filesystem::path above = std::filesystem::path(path).parent_path();
        !holdsThisProgram(above); above = above.parent_path())
-    if (auto reason = whyFolderAboveIsNotTrusted(above.string())) return reason;
+    if (auto reason = whyFolderAboveIsNotTrusted(above.string(), words)) return reason;
   return std::nullopt;
 }
 

@@ -18,6 +18,8 @@ using propertylist::Dictionary;
 constexpr std::string_view kKind = "DataClassMigrator";
 constexpr std::string_view kSuffix = ".migrator";
 constexpr std::string_view kAgain = "; install the migrator again.";
+constexpr TrustWords kTrustWords = {"the migrator", "the user who runs the host",
+                                    "install the migrator again"};
 
 bool isPlainName(const std::string& name) {
   return !name.empty() && name != "." && name != ".." && name.find('/') == std::string::npos &&
@@ -58,7 +60,7 @@ class Reader {
   std::string _file(const std::string& name) const { return _folder + "/" + name; }
 
   bool _isTrusted(const std::string& path) {
-    auto reason = whyNotTrusted(path);
+    auto reason = whyNotTrusted(path, kTrustWords);
     if (reason) _problems.push_back(std::move(*reason));
     return !reason;
   }

@@ -6,35 +6,57 @@
 #include <system_error>
 
 #include "host/BundleTrust.h"
+#include "platform/DeviceInfo.h"
+#include "tools/common/AccountCreators.h"
 #include "tools/common/ExitCode.h"
 
 namespace tools {
 namespace {
 
+namespace fs = std::filesystem;
+
+constexpr host::TrustWords kTrustWords = {
+    "the account service", "the user who runs account-settings",
+    "put the account service itself there, with the rights to look at it"};
+
+// With every folder above it.
 void requireTrust(const std::string& path) {
-  if (const auto reason = host::whyNotTrusted(path))
+  if (const auto reason = host::whyNotTrusted(path, kTrustWords))
     throw CommandFailure(ExitCode::refused,
                          fmt::format("--notify runs the code of the image's account services, and "
                                      "{} Nothing was changed; leave --notify out otherwise",
                                      *reason));
 }
 
-}  // namespace
-
-void requireTrustedServices(const deviceimage::DeviceImage& image) {
-  namespace fs = std::filesystem;
-  const std::string services =
-      image.absolutePath(deviceimage::DeviceImage::kAccountServicesDirectory);
+bool isMissing(const fs::path& path) {
   std::error_code error;
-  if (fs::symlink_status(services, error).type() == fs::file_type::not_found) return;
-  requireTrust(services);  // and every folder above it
-  fs::recursive_directory_iterator entry(services, error);
+  return fs::symlink_status(path, error).type() == fs::file_type::not_found;
+}
+
+// Bundles may bring libraries of their own, so everything in the folder counts.
+void requireTrustedFolder(const std::string& folder) {
+  if (isMissing(folder)) return;
+  requireTrust(folder);
+  std::error_code error;
+  fs::recursive_directory_iterator entry(folder, error);
   for (const fs::recursive_directory_iterator end; !error && entry != end; entry.increment(error))
     requireTrust(entry->path().string());
   if (error)
     throw CommandFailure(
         ExitCode::refused,
-        fmt::format("{}: {}; nothing was changed; check its rights", services, error.message()));
+        fmt::format("{}: {}; nothing was changed; check its rights", folder, error.message()));
+}
+
+}  // namespace
+
+void requireTrustedServices(const deviceimage::DeviceImage& image) {
+  requireTrustedFolder(image.absolutePath(deviceimage::DeviceImage::kAccountServicesDirectory));
+  for (const std::string& bundle : namedBundles()) {
+    fs::path path = platform::joinedPath(image.rootPath(), bundle);
+    // Where a bundle is missing, nobody else may be able to put one.
+    while (isMissing(path)) path = path.parent_path();
+    requireTrust(path.string());
+  }
 }
 
 }  // namespace tools

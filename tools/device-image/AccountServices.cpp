@@ -13,7 +13,7 @@
 #include <string_view>
 
 #include "deviceimage/Descriptor.h"
-#include "propertylist/Reading.h"
+#include "tools/common/AccountCreators.h"
 #include "tools/common/ExitCode.h"
 #include "tools/common/Files.h"
 #include "tools/common/Installation.h"
@@ -22,43 +22,17 @@ namespace tools {
 namespace {
 
 using deviceimage::DeviceImage;
-using propertylist::Array;
-using propertylist::Dictionary;
-using propertylist::Value;
 
 constexpr std::size_t kLargestBundle = std::size_t{64} << 20U;
 
-// The file's name when the entry names a bundle of the services' directory, else empty.
-std::string_view serviceOf(const Value& entry) {
-  const Dictionary* const creator = entry.asDictionary();
-  const Dictionary* const description =
-      creator == nullptr ? nullptr : propertylist::findDictionary(*creator, "Description");
-  const std::string* const framework =
-      description == nullptr ? nullptr : propertylist::findString(*description, "Framework");
-  const std::string directory = std::string(DeviceImage::kAccountServicesDirectory) + "/";
-  if (framework == nullptr || !framework->starts_with(directory)) return {};
-  const std::string_view name = std::string_view(*framework).substr(directory.size());
-  return name.find('/') == std::string_view::npos ? name : std::string_view();
-}
-
-// The names that the installed catalogue knows.
+// The file names of the bundles in the services' directory that the installed catalogue knows.
 std::set<std::string> namedServices() {
-  const std::string file = installedAccountResources() + "/AccountCreators.plist";
-  const propertylist::FileReadResult read = propertylist::readPropertyListFile(file);
-  const Dictionary* const catalogue = read.value ? read.value->asDictionary() : nullptr;
-  if (catalogue == nullptr)
-    throw CommandFailure(
-        ExitCode::refused,
-        fmt::format(
-            "cannot read the catalogue of account creators {}: {}; install the programs anew", file,
-            read.value ? "it holds no dictionary" : read.error));
+  const std::string directory = std::string(DeviceImage::kAccountServicesDirectory) + "/";
   std::set<std::string> names;
-  for (const Dictionary::Entry& type : *catalogue) {
-    const Array* const entries = type.value().asArray();
-    if (entries == nullptr) continue;
-    for (const Value& entry : *entries)
-      if (const std::string_view name = serviceOf(entry); !name.empty()) names.emplace(name);
-  }
+  for (const std::string& bundle : namedBundles())
+    if (bundle.starts_with(directory) && bundle.size() > directory.size() &&
+        bundle.find('/', directory.size()) == std::string::npos)
+      names.insert(bundle.substr(directory.size()));
   return names;
 }
 
