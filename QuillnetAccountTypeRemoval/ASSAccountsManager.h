@@ -158,15 +158,15 @@ class ASSAccountsManager {
 
   // --- Migration support: keeping other processes out, and what older systems left behind ---
   //
-  // Class operations for clients that migrate, back up or restore account data. The store itself
-  // calls none of them. They work on the calling thread and may take long.
+  // Class operations for clients that migrate, back up or restore account data. Making, changing
+  // and saving a store calls none of them. They work on the calling thread and may take long.
 
   // Waits, however long, until this process holds the system's migration lock; null when the lock
   // cannot be made. The holder gives it back through releaseMigrationLock; the system frees it when
   // the process ends. The file behind it, kAccountMigrationLockFilename, is never removed.
   static platform::HeldFileLockPtr createAndLockMigrationLock();
   static void releaseMigrationLock(const platform::HeldFileLockPtr& lock);
-  // Returns when nobody holds the migration lock; holds nothing afterwards.
+  // Returns when nobody holds the migration lock, or it cannot be made; holds nothing afterwards.
   static void waitForMigrationToFinish();
   // Has the data-access daemon leave: asks it, waits for five seconds, kills it, waits for five
   // more, and goes on in any case; the log tells how far it came. The calling thread's run loop
@@ -192,7 +192,10 @@ class ASSAccountsManager {
   static void removeNewAccountSettingsToMigrateOldAccountInformation();
   // Runs the device's accounts data migrator, under the migration lock, when there is something to
   // migrate: once per process, whatever comes of it. Without that migrator's bundle nothing is
-  // said, and a removed settings file stays removed. The legacy files are not touched.
+  // said, and a removed settings file stays removed. The legacy files are not touched, so each
+  // process that calls this while they are there has the settings built anew from them, and what
+  // was changed since is gone: a device calls it once, after an upgrade, or its migrator moves the
+  // files away.
   static void _migrateAccountsIfNeeded();
 
  protected:

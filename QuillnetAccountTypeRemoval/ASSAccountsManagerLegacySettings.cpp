@@ -36,24 +36,29 @@ std::int32_t loggedAddress(const bool* flag) {
       static_cast<std::uint32_t>(reinterpret_cast<std::uintptr_t>(flag)));
 }
 
-// Runs the migrator of the bundle; false when there is none in it or it failed.
-bool runMigrator() {
+void logFailure() {
+  platform::logToSystem("[%s] Accounts migration failed",
+                        "+[ASSAccountsManager _migrateAccountsIfNeeded]");
+}
+
+// Runs the migrator whose bundle is loaded.
+void runMigrator() {
   platform::RuntimeClass* const found =
       platform::services().classRegistry.classNamed(kMigratorClass);
   auto* const migratorClass = dynamic_cast<AccountsDataMigratorClass*>(found);
-  if (migratorClass == nullptr) return false;
-  const std::unique_ptr<AccountsDataMigrator> migrator = migratorClass->init();
-  return migrator != nullptr && migrator->executeMigrationSteps();
+  const std::unique_ptr<AccountsDataMigrator> migrator =
+      migratorClass != nullptr ? migratorClass->init() : nullptr;
+  if (migrator == nullptr || !migrator->executeMigrationSteps()) logFailure();
 }
 
 void runMigratorOfDevice() {
   const platform::Services& services = platform::services();
   const std::string path =
       platform::joinedPath(services.deviceInfo.systemRootDirectory(), kMigratorBundle);
-  if (services.classRegistry.loadCodeBundle(path) == nullptr) return;
-  if (!runMigrator())
-    platform::logToSystem("[%s] Accounts migration failed",
-                          "+[ASSAccountsManager _migrateAccountsIfNeeded]");
+  if (services.classRegistry.loadCodeBundle(path) != nullptr)
+    runMigrator();
+  else if (services.fileServices.fileExists(path))
+    logFailure();  // a bundle that cannot be loaded is not a device without one
 }
 
 // The migration lock, given back when the block ends, also by an exception.

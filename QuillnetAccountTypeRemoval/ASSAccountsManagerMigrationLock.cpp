@@ -50,6 +50,23 @@ void haveDaemonLeave(pid_t daemon) {
       kDaemonName);
 }
 
+// Takes the web engine's lock again at its end if the thread holds it at its beginning: while the
+// run loop runs, the web engine's thread may take it.
+class KeptWebEngineLock {
+ public:
+  KeptWebEngineLock() : _lock(platform::services().webEngineThreadLock) {
+    if (_lock != nullptr && !_lock->isHeld()) _lock = nullptr;
+  }
+  ~KeptWebEngineLock() {
+    if (_lock != nullptr) _lock->acquire();
+  }
+  KeptWebEngineLock(const KeptWebEngineLock&) = delete;
+  KeptWebEngineLock& operator=(const KeptWebEngineLock&) = delete;
+
+ private:
+  platform::WebEngineThreadLock* _lock;
+};
+
 }  // namespace
 
 platform::HeldFileLockPtr ASSAccountsManager::createAndLockMigrationLock() {
@@ -71,11 +88,8 @@ void ASSAccountsManager::killDataAccessIfNecessary() {
   if (daemon < 0 || daemon == own) return;
   platform::logToSystem("Performing account migration. Asking tallowd to exit");
   services.notifyCenter.postSystemNotification(kExitNotification);
-  platform::WebEngineThreadLock* const webLock = services.webEngineThreadLock;
-  const bool heldWebLock = webLock != nullptr && webLock->isHeld();
+  const KeptWebEngineLock kept;
   haveDaemonLeave(daemon);
-  // The run loop may have let the web engine's thread take it meanwhile.
-  if (heldWebLock) webLock->acquire();
 }
 
 }  // namespace accountsettings

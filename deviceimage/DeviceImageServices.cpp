@@ -13,7 +13,6 @@
 #include "platform/posix/DlAddrBundleResources.h"
 #include "platform/posix/LinuxProcessTable.h"
 #include "platform/posix/MonotonicClock.h"
-#include "platform/posix/PollRunLoop.h"
 #include "platform/posix/PosixFileServices.h"
 #include "platform/posix/ProcessClassRegistry.h"
 #include "platform/posix/RandomUUIDGenerator.h"
@@ -45,6 +44,7 @@ class DeviceImageServices::Implementation {
             _notifyCenter,     _uuidGenerator,   _userDatabase} {}
 
   const platform::Services& services() const { return _services; }
+  platform::PollRunLoop& runLoop() { return _runLoop; }
 
  private:
   DatabaseSet _databases;
@@ -78,5 +78,7 @@ DeviceImageServices::~DeviceImageServices() = default;
 const platform::Services& DeviceImageServices::services() const {
   return _implementation->services();
 }
+
+platform::PollRunLoop& DeviceImageServices::runLoop() { return _implementation->runLoop(); }
 
 }  // namespace deviceimage

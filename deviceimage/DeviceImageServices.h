@@ -9,6 +9,7 @@
 
 #include "deviceimage/DeviceImage.h"
 #include "platform/Services.h"
+#include "platform/posix/PollRunLoop.h"
 
 namespace deviceimage {
 
@@ -40,6 +41,8 @@ class DeviceImageServices {
 
   // References into this object, to be given to platform::install.
   const platform::Services& services() const;
+  // The run loop among them, for a program that has timers or descriptors served while it runs.
+  platform::PollRunLoop& runLoop();
 
  private:
   class Implementation;

@@ -14,7 +14,11 @@ namespace {
 class HeldLock : public platform::HeldFileLock {
  public:
   explicit HeldLock(Descriptor file) : _file(std::move(file)) {}
-  void free() { _file.reset(); }
+  // Also when a child process that was forked meanwhile has the open file too.
+  void free() {
+    if (_file.isOpen()) ::flock(_file.number(), LOCK_UN);
+    _file.reset();
+  }
 
  private:
   Descriptor _file;

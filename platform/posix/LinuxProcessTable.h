@@ -4,6 +4,7 @@
 #include <map>
 #include <mutex>
 #include <string>
+#include <utility>
 
 #include "platform/ProcessTable.h"
 
@@ -27,7 +28,8 @@ class PLATFORM_EXPORT LinuxProcessTable : public ProcessTable {
   Filled fillTable(std::size_t capacity) override;
   pid_t ownProcessIdentifier() override;
   // Signals the process that had the identifier when the table was last filled. One that has taken
-  // the number since then is not hit, nor is one that was not listed (ESRCH).
+  // the number since then is not hit, nor is one that was not listed (ESRCH). Two
+  // threads that look up and signal have a table each, or the one's listing counts for the other.
   Status sendSignal(pid_t process, int signal) override;
 
  private:

@@ -3,7 +3,7 @@
 #include <poll.h>
 
 #include <algorithm>
-#include <cerrno>
+#include <cstdint>
 
 namespace platform {
 namespace {
@@ -36,11 +36,17 @@ PollRunLoop::Source PollRunLoop::addDescriptor(int descriptor, Handler handler) 
 }
 
 void PollRunLoop::remove(Source source) {
+  std::vector<Entry> removed;  // goes after the lock, since a handler's end may use this loop
   const std::lock_guard guard(_mutex);
   const auto own = _entries.find(std::this_thread::get_id());
   if (own == _entries.end()) return;
-  std::erase_if(own->second, [&](const Entry& entry) { return entry.source == source; });
-  if (own->second.empty()) _entries.erase(own);
+  std::vector<Entry>& entries = own->second;
+  const auto found = std::find_if(entries.begin(), entries.end(),
+                                  [&](const Entry& entry) { return entry.source == source; });
+  if (found == entries.end()) return;
+  removed.push_back(std::move(*found));
+  entries.erase(found);
+  if (entries.empty()) _entries.erase(own);
 }
 
 std::vector<PollRunLoop::Entry> PollRunLoop::_ownEntries() {

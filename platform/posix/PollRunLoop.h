@@ -25,7 +25,8 @@ class PLATFORM_EXPORT PollRunLoop : public RunLoop {
   // Calls `handler` while the descriptor, which stays open until the source is removed, can be read
   // without waiting, is at its end or has failed.
   Source addDescriptor(int descriptor, Handler handler);
-  // Nothing happens to a source that is not there. For the thread that added it.
+  // For the thread that added it, which does so before it ends: a later thread may have its name.
+  // Nothing happens to a source that is not there.
   void remove(Source source);
 
   // Returns after the first source that was served. Sources take turns. A signal does not end the

@@ -1,7 +1,9 @@
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <cerrno>
-#include <cmath>
+#include <functional>
+#include <stdexcept>
 
 #include "QuillnetAccountTypeRemoval/ProcessLookup.h"
 #include "tests/QuillnetAccountTypeRemoval/AccountsDevice.h"
@@ -175,11 +177,11 @@ TEST_F(DaemonShutdown, ADaemonThatGoesInTheLastSliceIsStillSaidNotToWantToQuit) 
   afterSlice(21, [&] { device.processTable.processes.clear(); });
   ASSAccountsManager::killDataAccessIfNecessary();
   EXPECT_EQ(device.logLines(), (Lines{kAsked, kKilled}));
-  EXPECT_EQ(countOf("sendSignal(77, 9)"), 0U);
-  EXPECT_EQ(countOf(kForcedSlice), 0U);
+  EXPECT_EQ(acts().back(), kPoliteSlice);  // no signal, to no number
 }
 
 TEST_F(DaemonShutdown, TheSignalGoesToWhoeverHasTheNameWhenTheTimeIsUp) {
+  device.processTable.unkillable = {78};
   afterSlice(21, [&] { device.processTable.processes = {{78, "tallowd"}}; });
   ASSAccountsManager::killDataAccessIfNecessary();
   EXPECT_EQ(countOf("sendSignal(78, 9)"), 1U);
@@ -210,6 +212,26 @@ TEST_F(DaemonShutdown, LooksBeforeEverySlice) {
   EXPECT_EQ(device.journal, (CallJournal{"ownProcessIdentifier()", "sizeOfTable()", "fillTable(3)",
                                          kNotification, "isHeld()", "sizeOfTable()", "fillTable(3)",
                                          kPoliteSlice, "sizeOfTable()", "fillTable(0)"}));
+}
+
+TEST_F(DaemonShutdown, SaysWhatItIsAboutToDo) {
+  Lines whenAsked;
+  Lines whenKilled;
+  device.notifyCenter.listener = [&](std::string_view) { whenAsked = device.logLines(); };
+  device.processTable.decideBy([&](const std::string& call) {
+    if (call.starts_with("sendSignal(")) whenKilled = device.logLines();
+    return std::nullopt;
+  });
+  ASSAccountsManager::killDataAccessIfNecessary();
+  EXPECT_EQ(whenAsked, (Lines{kAsked}));
+  EXPECT_EQ(whenKilled, (Lines{kAsked, kKilled}));
+}
+
+TEST_F(DaemonShutdown, AWebLockThatWasHeldIsTakenAgainAlsoWhenASourceOfTheLoopThrows) {
+  device.webEngineThreadLock.held = true;
+  afterSlice(1, [] { throw std::runtime_error("a source of the caller"); });
+  EXPECT_THROW(ASSAccountsManager::killDataAccessIfNecessary(), std::runtime_error);
+  EXPECT_EQ(device.webEngineThreadLock.calls(), (CallJournal{"isHeld()", "acquire()"}));
 }
 
 TEST_F(DaemonShutdown, AWebLockThatWasHeldIsTakenAgainOnceAtTheEnd) {

@@ -1,10 +1,11 @@
 #include <gtest/gtest.h>
-#include <sys/stat.h>
 
 #include <cerrno>
 #include <cstdint>
 #include <filesystem>
 #include <fstream>
+#include <functional>
+#include <iterator>
 
 #include "QuillnetAccountTypeRemoval/AccountsDataMigrator.h"
 #include "platform/testing/ForwardingFileServices.h"
@@ -68,6 +69,10 @@ class LegacySettings : public ::testing::Test {
   void makeFile(const std::string& path) {
     std::filesystem::create_directories(std::filesystem::path(path).parent_path());
     std::ofstream(path) << "legacy";
+  }
+  static std::string contentOf(const std::string& path) {
+    std::ifstream file(path);
+    return {std::istreambuf_iterator<char>(file), {}};
   }
   void writeVersion(const Value& version) {
     device.writeSettings({{"Version", version}, {"Accounts", Array{}}});
@@ -270,7 +275,7 @@ TEST_F(LegacySettings, WithALegacyFileTheSettingsFileGoesBeforeTheMigratorComes)
   ASSAccountsManager::_migrateAccountsIfNeeded();
   EXPECT_FALSE(wasThere);
   EXPECT_EQ(migrator.ran, 1);
-  EXPECT_TRUE(std::filesystem::exists(mailAccountsPath()));
+  EXPECT_EQ(contentOf(mailAccountsPath()), "legacy");
   EXPECT_EQ(linesWithoutAddresses(), (Lines{found("1", "0"), found("1", "0")}));
 }
 
@@ -280,7 +285,7 @@ TEST_F(LegacySettings, WithADataAccessFileToo) {
   ASSAccountsManager::_migrateAccountsIfNeeded();
   EXPECT_EQ(device.readSettingsBytes(), std::nullopt);
   EXPECT_EQ(migrator.ran, 1);
-  EXPECT_TRUE(std::filesystem::exists(daAccountPath()));
+  EXPECT_EQ(contentOf(daAccountPath()), "legacy");
   EXPECT_EQ(linesWithoutAddresses(), (Lines{found("0", "1"), found("0", "1")}));
 }
 
@@ -312,6 +317,46 @@ TEST_F(LegacySettings, WithoutALockNothingFurtherHappens) {
   EXPECT_NE(device.readSettingsBytes(), std::nullopt);
   EXPECT_EQ(device.fileLock.calls(), (CallJournal{"lockByName(AccountMigrationInProgress)"}));
   EXPECT_EQ(linesWithoutAddresses(), (Lines{found("1", "0")}));
+  ASSAccountsManager::_migrateAccountsIfNeeded();  // this was the process's one attempt
+  EXPECT_EQ(linesWithoutAddresses(), (Lines{found("1", "0")}));
+}
+
+TEST_F(LegacySettings, TheOneAttemptCountsFromItsBeginning) {
+  writeVersion(11);
+  migrator.work = [] { ASSAccountsManager::_migrateAccountsIfNeeded(); };
+  ASSAccountsManager::_migrateAccountsIfNeeded();
+  EXPECT_EQ(migrator.ran, 1);
+}
+
+TEST_F(LegacySettings, EachProcessMigratesAgainWhileALegacyFileIsThere) {
+  makeFile(mailAccountsPath());
+  writeVersion(12);
+  device.fileLock.decideBy([&](const std::string& call) {
+    if (call.starts_with("lockByName")) writeVersion(12);  // another process has just built it
+    return std::nullopt;
+  });
+  ASSAccountsManager::_migrateAccountsIfNeeded();
+  EXPECT_EQ(device.readSettingsBytes(), std::nullopt);
+  EXPECT_EQ(migrator.ran, 1);
+}
+
+TEST_F(LegacySettings, ABundleThatCannotBeLoadedIsLogged) {
+  writeVersion(11);
+  device.classRegistry.bundles.clear();
+  std::filesystem::create_directories(_bundlePath());
+  ASSAccountsManager::_migrateAccountsIfNeeded();
+  EXPECT_EQ(linesWithoutAddresses(),
+            (Lines{kElevenIsOld, found("0", "0"), kElevenIsOld, found("0", "0"), kFailed}));
+}
+
+TEST_F(LegacySettings, AClassOfTheNameThatIsNoMigratorIsLogged) {
+  class Stranger : public platform::RuntimeClass {
+    std::string className() const override { return "AccountsDataMigrator"; }
+  } stranger;
+  writeVersion(11);
+  device.classRegistry.bundles[_bundlePath()] = {{&stranger}, std::nullopt};
+  ASSAccountsManager::_migrateAccountsIfNeeded();
+  EXPECT_EQ(linesWithoutAddresses().back(), kFailed);
 }
 
 TEST_F(LegacySettings, WhatAnotherProcessMigratedMeanwhileIsNotMigratedAgain) {
@@ -363,6 +408,8 @@ TEST_F(LegacySettings, TheLockIsReleasedWhenTheMigratorRaises) {
                platform::InternalConsistencyFailure);
   EXPECT_FALSE(device.fileLock.isHeld("AccountMigrationInProgress"));
   EXPECT_EQ(migrator.dropped, 1);
+  ASSAccountsManager::_migrateAccountsIfNeeded();
+  EXPECT_EQ(migrator.made, 1);
 }
 
 TEST_F(LegacySettings, AreNotAskedForByAStoreThatIsMade) {

@@ -66,3 +66,8 @@ TEST_P(ProcessTableContract, KnowsItsOwnProcess) {
 TEST_P(ProcessTableContract, FailsToSignalAProcessThatIsNotThere) {
   EXPECT_FALSE(service().sendSignal(device->unusedIdentifier(), 9).isSuccess());
 }
+
+TEST_P(ProcessTableContract, NeverSignalsAGroup) {
+  EXPECT_FALSE(service().sendSignal(0, 0).isSuccess());
+  EXPECT_FALSE(service().sendSignal(-1, 0).isSuccess());
+}

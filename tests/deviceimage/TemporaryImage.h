@@ -1,5 +1,6 @@
 #pragma once
 
+#include <sys/statvfs.h>
 #include <unistd.h>
 
 #include <cstdlib>
@@ -15,11 +16,15 @@
 namespace deviceimage {
 
 // A directory of its own for one test, which goes with the object. In memory where the machine has
-// such a file system, because an image waits for the disk with every change.
+// such a file system that programs can be run from, because an image waits for the disk with every
+// change.
 class TemporaryDirectory {
  public:
   TemporaryDirectory() {
-    std::string name = ::access("/dev/shm", W_OK) == 0 ? "/dev/shm" : "/tmp";
+    struct statvfs memory = {};
+    const bool inMemory = ::statvfs("/dev/shm", &memory) == 0 && (memory.f_flag & ST_NOEXEC) == 0 &&
+                          ::access("/dev/shm", W_OK) == 0;
+    std::string name = inMemory ? "/dev/shm" : "/tmp";
     name += "/deviceimage-test-XXXXXX";
     if (::mkdtemp(name.data()) == nullptr) throw std::runtime_error("mkdtemp");
     path = name;

@@ -1,5 +1,7 @@
 // One run over several accounts: its store, its order, its answer.
 
+#include <filesystem>
+#include <fstream>
 #include <stdexcept>
 #include <thread>
 #include <type_traits>
@@ -43,6 +45,24 @@ TEST_F(Migrator, HasOneNameBeforeBetweenAndAfterRuns) {
   migrator.performMigration();
   EXPECT_EQ(migrator.dataClassName(), "Quillnet Account Removal");
   EXPECT_EQ(settingsReads(), 2U);
+}
+
+TEST_F(Migrator, LeavesLegacySettingsAndOtherProcessesAlone) {
+  device.userDatabase.home = device.root() + "/var/mobile";
+  const std::string legacy = accountsettings::mailAccountsPath();
+  std::filesystem::create_directories(std::filesystem::path(legacy).parent_path());
+  std::ofstream(legacy) << "legacy";
+  device.writeSettings({{"Version", 7}, {"Accounts", Array{selectedInfo("Q", {})}}});
+  EXPECT_TRUE(migrator.performMigration());
+  EXPECT_EQ(device.readSettings().find("Version")->asInteger(), 12);
+  EXPECT_EQ(savedIdentifiers(), Lines{});
+  EXPECT_EQ(device.fileLock.calls(), Journal{});
+  EXPECT_EQ(device.processTable.calls(), Journal{});
+  EXPECT_TRUE(std::filesystem::exists(legacy));
+  for (const std::string& line : device.logLines()) {
+    EXPECT_EQ(line.find("migration!"), std::string::npos) << line;
+    EXPECT_EQ(line.find("out of date"), std::string::npos) << line;
+  }
 }
 
 TEST_F(Migrator, HoldsNoStoreBeforeItsFirstRun) {

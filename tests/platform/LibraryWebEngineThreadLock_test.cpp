@@ -1,7 +1,12 @@
 #include "platform/posix/LibraryWebEngineThreadLock.h"
 
 #include <dlfcn.h>
+#include <gmock/gmock.h>
 
+#include <filesystem>
+#include <string>
+
+#include "platform/testing/TemporaryDirectory.h"
 #include "tests/contracts/WebEngineThreadLockContract.h"
 
 namespace {
@@ -42,6 +47,17 @@ TEST(WebEngineLibrary, StaysLoadedWithoutTheLock) {
 TEST(WebEngineLibrary, AFunctionThatIsNotNeededMayBeMissing) {
   LibraryWebEngineThreadLock lock(WEB_ENGINE_LIBRARY, kIsHeld, "noSuchFunction");
   EXPECT_FALSE(lock.isHeld());
+}
+
+TEST(WebEngineLibrary, IsOpenedOnceAndItsFunctionsFoundOnce) {
+  const platform::TemporaryDirectory directory;
+  const std::string copy = directory.path() + "/engine.so";
+  std::filesystem::copy_file(WEB_ENGINE_LIBRARY, copy);
+  LibraryWebEngineThreadLock lock(copy, kIsHeld, kAcquire);
+  EXPECT_FALSE(lock.isHeld());
+  std::filesystem::remove(copy);
+  lock.acquire();
+  EXPECT_TRUE(lock.isHeld());
 }
 
 // Each of the two dies with the loader's text, and nothing else, on standard error.

@@ -1,6 +1,12 @@
 #include "platform/posix/PollRunLoop.h"
 
+#include <sys/time.h>
 #include <unistd.h>
+
+#include <csignal>
+#include <memory>
+#include <string>
+#include <thread>
 
 #include "platform/posix/MonotonicClock.h"
 #include "tests/contracts/RunLoopContract.h"
@@ -104,6 +110,35 @@ TEST_F(RunLoopSources, AHandlerMayRemoveItself) {
   loop.runForAtMost(kForever);
   loop.runForAtMost(milliseconds(1));
   EXPECT_EQ(served, 1);
+}
+
+TEST_F(RunLoopSources, WithoutAnyTheSliceLastsItsWholeLength) {
+  platform::MonotonicClock clock;
+  const double start = clock.absoluteTime();
+  loop.runForAtMost(milliseconds(30));
+  EXPECT_GE(clock.absoluteTime() - start, 0.03);
+}
+
+TEST_F(RunLoopSources, ASignalDoesNotEndTheSlice) {
+  struct sigaction action = {};
+  action.sa_handler = [](int) {};
+  ASSERT_EQ(::sigaction(SIGALRM, &action, nullptr), 0);
+  const itimerval often = {{0, 1000}, {0, 1000}};
+  ASSERT_EQ(::setitimer(ITIMER_REAL, &often, nullptr), 0);
+  platform::MonotonicClock clock;
+  const double start = clock.absoluteTime();
+  loop.runForAtMost(milliseconds(30));
+  EXPECT_GE(clock.absoluteTime() - start, 0.03);
+}
+
+TEST_F(RunLoopSources, AHandlersEndMayRemoveAnotherSource) {
+  const PollRunLoop::Source other = loop.addDescriptor(descriptor(), [] {});
+  std::shared_ptr<void> atItsEnd(nullptr, [&](void*) { loop.remove(other); });
+  const PollRunLoop::Source source = loop.addDescriptor(descriptor(), [atItsEnd] {});
+  atItsEnd.reset();
+  loop.remove(source);
+  write();
+  loop.runForAtMost(milliseconds(1));  // nobody is left to be served
 }
 
 TEST_F(RunLoopSources, AnotherThreadsSourcesAreNotServed) {

@@ -5,6 +5,7 @@
 //   ignores         does nothing but stay, and lets no signal end it that can be kept from it
 //   lasts           does nothing but stay
 #include <signal.h>
+#include <sys/prctl.h>
 #include <unistd.h>
 
 #include <chrono>
@@ -32,6 +33,8 @@ bool wasAskedToExit(const char* file) {
 
 int main(int count, char** arguments) {
   if (count < 2) return 2;
+  // Not longer than the test, which may be killed.
+  ::prctl(PR_SET_PDEATHSIG, SIGKILL);
   const std::string behaviour = arguments[1];
   if (behaviour == "lasts") ::pause();
   if (::write(STDOUT_FILENO, ".", 1) != 1) return 1;

@@ -1,6 +1,7 @@
 // Shutting the data-access daemon down, with daemons that run from the image.
 #include <gtest/gtest.h>
 
+#include <chrono>
 #include <csignal>
 #include <fstream>
 #include <string>
@@ -25,7 +26,8 @@ constexpr const char* kKilled = "tallowd does not seem to want to quit. Sending 
 class FastClock : public platform::Clock {
  public:
   explicit FastClock(platform::Clock& clock) : _clock(clock) {}
-  double absoluteTime() override { return _clock.absoluteTime() * 4; }
+  double absoluteTime() override { return _clock.absoluteTime() * factor; }
+  double factor = 1;
 
  private:
   platform::Clock& _clock;
@@ -56,6 +58,8 @@ class DaemonOfAnImage : public testing::Test {
   deviceimage::TemporaryImage image;
   StartedProcesses started;
   Lines logLines;
+  FastClock& clock() { return _clock; }
+  platform::PollRunLoop& runLoop() { return _services.runLoop(); }
 
  private:
   deviceimage::ServiceOptions _options() {
@@ -78,7 +82,9 @@ TEST_F(DaemonOfAnImage, ThatRunsElsewhereIsLeftAlone) {
   const pid_t other = started.start(DAEMON, elsewhere.path, "tallowd", {"ignores"}, true);
   ASSAccountsManager::killDataAccessIfNecessary();
   EXPECT_EQ(logLines, Lines());
-  EXPECT_EQ(::kill(other, 0), 0);
+  siginfo_t state = {};
+  EXPECT_EQ(::waitid(P_PID, static_cast<id_t>(other), &state, WEXITED | WNOHANG | WNOWAIT), 0);
+  EXPECT_EQ(state.si_pid, 0) << "it has ended";
 }
 
 TEST_F(DaemonOfAnImage, ThatObeysIsAskedAndNotKilled) {
@@ -91,6 +97,7 @@ TEST_F(DaemonOfAnImage, ThatObeysIsAskedAndNotKilled) {
 
 TEST_F(DaemonOfAnImage, ThatIgnoresAllItCanIsKilled) {
   const pid_t daemon = startDaemon("ignores");
+  clock().factor = 4;
   ASSAccountsManager::killDataAccessIfNecessary();
   EXPECT_EQ(started.waitForEnd(daemon), SIGKILL);
   EXPECT_EQ(logLines, (Lines{kAsked, kKilled}));
@@ -101,10 +108,19 @@ TEST_F(DaemonOfAnImage, ThatRestartedIsGone) {
   ASSAccountsManager::killDataAccessIfNecessary();
   EXPECT_EQ(started.waitForEnd(daemon), 0);
   EXPECT_EQ(logLines, (Lines{kAsked}));
-  pid_t restarted = -1;
-  while (restarted < 0) restarted = findProcessIDByName("tallowd");  // it is only about to run
+  const pid_t restarted = findProcessIDByName("tallowd");
+  ASSERT_GT(restarted, 0);
   EXPECT_NE(restarted, daemon);
   EXPECT_EQ(::kill(restarted, SIGKILL), 0);
+}
+
+TEST_F(DaemonOfAnImage, IsWaitedForWhileTheCallersSourcesAreServed) {
+  startDaemon("ignores");
+  clock().factor = 4;
+  int beats = 0;
+  runLoop().addTimer(std::chrono::milliseconds(1), [&] { ++beats; });
+  ASSAccountsManager::killDataAccessIfNecessary();
+  EXPECT_GT(beats, 1);
 }
 
 TEST_F(DaemonOfAnImage, IsFoundByTheFirstSixteenBytesOfALongName) {

@@ -1,9 +1,16 @@
 // The migration lock between processes.
+#include <fcntl.h>
 #include <gtest/gtest.h>
+#include <poll.h>
+#include <sys/file.h>
+#include <sys/prctl.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <csignal>
+#include <filesystem>
+#include <fstream>
 #include <functional>
 #include <stdexcept>
 #include <string>
@@ -28,6 +35,7 @@ class Child {
     if (::pipe(toTest) != 0 || ::pipe(toChild) != 0) throw std::runtime_error("pipe");
     _process = ::fork();
     if (_process == 0) {
+      ::prctl(PR_SET_PDEATHSIG, SIGKILL);  // not longer than the test
       ::close(toTest[0]);
       ::close(toChild[1]);
       const deviceimage::DeviceImageServices services(
@@ -56,11 +64,14 @@ class Child {
   Child(const Child&) = delete;
   Child& operator=(const Child&) = delete;
 
-  // The next letter that the child says; '-' when it has ended.
-  char hear() const {
+  // The next letter that the child says; '-' when it has ended, or says nothing for `seconds`.
+  char hear(int seconds = 60) const {
+    pollfd descriptor = {_from, POLLIN, 0};
+    if (::poll(&descriptor, 1, seconds * 1000) != 1) return '-';
     char letter = 0;
     return ::read(_from, &letter, 1) == 1 ? letter : '-';
   }
+  pid_t process() const { return _process; }
   void go() const { EXPECT_EQ(::write(_to, "g", 1), 1); }
   void kill() {
     if (_process <= 0) return;
@@ -85,6 +96,23 @@ class MigrationLockOfAnImage : public testing::Test {
     say('r');
     ASSAccountsManager::releaseMigrationLock(lock);
   }
+  // Whether somebody holds the lock, asked of the file itself.
+  bool isHeld() const {
+    const int file = ::open(image.path("tmp/AccountMigrationInProgress").c_str(), O_RDWR);
+    const bool held = ::flock(file, LOCK_EX | LOCK_NB) != 0 && errno == EWOULDBLOCK;
+    ::close(file);
+    return held;
+  }
+  // Waits until a process waits for a lock of this machine's files.
+  static void waitForAWaiter(pid_t process) {
+    const std::string mark = " " + std::to_string(process) + " ";
+    for (bool waits = false; !waits;) {
+      std::ifstream locks("/proc/locks");
+      for (std::string line; std::getline(locks, line);)
+        waits =
+            waits || (line.find("->") != std::string::npos && line.find(mark) != std::string::npos);
+    }
+  }
   bool lockFileExists() const {
     return std::filesystem::exists(image.path("tmp/AccountMigrationInProgress"));
   }
@@ -106,6 +134,8 @@ TEST_F(MigrationLockOfAnImage, ASecondProcessWaitsForTheFirst) {
     ASSAccountsManager::releaseMigrationLock(lock);
   });
   ASSERT_EQ(second.hear(), 'b');
+  EXPECT_TRUE(isHeld());
+  waitForAWaiter(second.process());
   ASSERT_EQ(::write(said[1], "f", 1), 1);
   first.go();
   EXPECT_EQ(first.hear(), 'r');
@@ -124,10 +154,9 @@ TEST_F(MigrationLockOfAnImage, AKilledHolderHoldsNothing) {
     say(ASSAccountsManager::createAndLockMigrationLock() == nullptr ? 'n' : 'h');
   });
   ASSERT_EQ(waiter.hear(), 'b');
+  waitForAWaiter(waiter.process());
   holder.kill();
-  ::alarm(1);  // the waiter has it within a second, or this test dies
-  EXPECT_EQ(waiter.hear(), 'h');
-  ::alarm(0);
+  EXPECT_EQ(waiter.hear(1), 'h');
   EXPECT_TRUE(lockFileExists());
 }
 
@@ -139,8 +168,10 @@ TEST_F(MigrationLockOfAnImage, AWaitEndsWithTheMigrationAndHoldsNothing) {
     say('w');
     wait();
   });
+  waitForAWaiter(reader.process());
   migration.go();
   EXPECT_EQ(reader.hear(), 'w');
+  EXPECT_EQ(migration.hear(), 'r');
   const Child next(root(), holdLock);
   EXPECT_EQ(next.hear(), 'h');  // although the reader is still there
 }
@@ -151,6 +182,28 @@ TEST_F(MigrationLockOfAnImage, AWaitWithoutAMigrationEndsAtOnce) {
     say('w');
   });
   EXPECT_EQ(reader.hear(), 'w');
+}
+
+TEST_F(MigrationLockOfAnImage, AReleaseFreesItAlsoWhenAChildHasTheOpenFile) {
+  const Child holder(root(), [](const Child::Say& say, const Child::Wait& wait) {
+    const platform::HeldFileLockPtr lock = ASSAccountsManager::createAndLockMigrationLock();
+    const pid_t child = ::fork();
+    if (child == 0) {
+      ::prctl(PR_SET_PDEATHSIG, SIGKILL);
+      say('c');
+      ::pause();
+      ::_exit(0);
+    }
+    wait();
+    ASSAccountsManager::releaseMigrationLock(lock);
+    say('r');
+    wait();
+  });
+  ASSERT_EQ(holder.hear(), 'c');
+  EXPECT_TRUE(isHeld());
+  holder.go();
+  ASSERT_EQ(holder.hear(), 'r');
+  EXPECT_FALSE(isHeld());
 }
 
 TEST_F(MigrationLockOfAnImage, ALinkInItsPlaceGivesNoLock) {
