@@ -149,7 +149,9 @@ class ASSAccountsManager {
   // class that does not listen is passed over.
   static void accountWillChangeForDataclass(const AccountPtr& account, std::string_view dataclass);
   static void accountDidChangeForDataclass(const AccountPtr& account, std::string_view dataclass);
-  // Whether saves of this process tell the notifiers nothing; true until somebody says otherwise.
+  // Whether saves of this copy of the library tell the notifiers nothing; true until somebody says
+  // otherwise. A program and each plug-in in its process that holds the library has a copy, and a
+  // flag, of its own.
   // What is skipped is told by the first save after the flag is cleared.
   static void _setShouldSkipNotifications(bool skip);
   // How a list of accounts of the type is headed; empty but for subscribed calendars.

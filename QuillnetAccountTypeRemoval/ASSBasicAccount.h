@@ -17,7 +17,8 @@ namespace accountsettings {
 // The record of one account: its properties, the properties it was made from (the base of the
 // three-way merge at a save), the link to its parent, and its companions, the full and sync
 // account. What its type can do comes from the catalogues, two resources that are read once per
-// process.
+// process. "Per process" is by this copy of the library, here and below: a program and each plug-in
+// in its process that holds the library read their own catalogues.
 //
 // Records are shared by reference and compared by identity; two records with equal properties are
 // two accounts. A child holds its parent. A record is used from one thread at a time; the class

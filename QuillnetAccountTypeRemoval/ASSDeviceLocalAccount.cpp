@@ -19,7 +19,8 @@ class DeviceLocalAccountClass final : public platform::RuntimeClass, public Full
   }
 };
 
-DeviceLocalAccountClass deviceLocalAccountClass;
+// Never destroyed: the registry answers it until the process is gone.
+auto& deviceLocalAccountClass = *new DeviceLocalAccountClass;
 
 }  // namespace
 

@@ -16,7 +16,9 @@ namespace accountsettings {
 class ASSBasicAccount;
 using AccountPtr = std::shared_ptr<ASSBasicAccount>;
 
-// A full account: the object that speaks to an account's service. The record holds it.
+// A full account: the object that speaks to an account's service. The record holds it, so an
+// account that holds the record in turn keeps both for ever: it keeps what it needs of it, or a
+// weak pointer. The parent may be held.
 class PLATFORM_EXPORT AccountFullAccountProtocol {
  public:
   virtual ~AccountFullAccountProtocol() = default;
@@ -25,8 +27,9 @@ class PLATFORM_EXPORT AccountFullAccountProtocol {
 };
 using FullAccountPtr = std::shared_ptr<AccountFullAccountProtocol>;
 
-// A sync account: the object that refreshes an account's sync containers. The record holds it. The
-// answers are passed on to whoever asked the record.
+// A sync account: the object that refreshes an account's sync containers. The record holds it, and
+// as with a full account it does not hold the record. The answers are passed on to whoever asked
+// the record.
 class PLATFORM_EXPORT AccountSyncAccountProtocol {
  public:
   virtual ~AccountSyncAccountProtocol() = default;

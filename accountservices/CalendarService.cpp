@@ -7,15 +7,17 @@
 namespace accountservices {
 namespace {
 
-ServiceAccountClass accountClass("CalendarServiceAccount");
-NamingAccountCreator accountCreator("CalendarServiceAccountCreator", accountClass,
-                                    {accountsettings::kCalDAVAccountType});
-MakingAccountCreator subscriptionCreator("SubscribedCalendarCreator",
-                                         "SubscribedCalendarServiceAccount");
-ServiceSyncAccountCreator syncAccountCreator("CalendarServiceSyncAccountCreator", "CalendarService",
-                                             {accountsettings::kAccountDataclassCalendars,
-                                              accountsettings::kAccountDataclassReminders});
-ServiceNotifier notifier("CalendarServiceNotifier");
+auto& accountClass = kept<ServiceAccountClass>("CalendarServiceAccount");
+auto& accountCreator =
+    kept<NamingAccountCreator>("CalendarServiceAccountCreator", accountClass,
+                               std::vector<std::string_view>{accountsettings::kCalDAVAccountType});
+auto& subscriptionCreator =
+    kept<MakingAccountCreator>("SubscribedCalendarCreator", "SubscribedCalendarServiceAccount");
+auto& syncAccountCreator = kept<ServiceSyncAccountCreator>(
+    "CalendarServiceSyncAccountCreator", "CalendarService",
+    std::vector<std::string_view>{accountsettings::kAccountDataclassCalendars,
+                                  accountsettings::kAccountDataclassReminders});
+auto& notifier = kept<ServiceNotifier>("CalendarServiceNotifier");
 
 }  // namespace
 }  // namespace accountservices

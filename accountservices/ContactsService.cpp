@@ -6,13 +6,15 @@
 namespace accountservices {
 namespace {
 
-ServiceAccountClass accountClass("ContactsServiceAccount");
-NamingAccountCreator accountCreator("ContactsServiceAccountCreator", accountClass,
-                                    {accountsettings::kCardDAVAccountType});
-MakingAccountCreator directoryCreator("DirectoryCreator", "DirectoryServiceAccount");
-ServiceSyncAccountCreator syncAccountCreator("ContactsServiceSyncAccountCreator", "ContactsService",
-                                             {accountsettings::kAccountDataclassContacts});
-ServiceNotifier notifier("ContactsServiceNotifier");
+auto& accountClass = kept<ServiceAccountClass>("ContactsServiceAccount");
+auto& accountCreator =
+    kept<NamingAccountCreator>("ContactsServiceAccountCreator", accountClass,
+                               std::vector<std::string_view>{accountsettings::kCardDAVAccountType});
+auto& directoryCreator = kept<MakingAccountCreator>("DirectoryCreator", "DirectoryServiceAccount");
+auto& syncAccountCreator = kept<ServiceSyncAccountCreator>(
+    "ContactsServiceSyncAccountCreator", "ContactsService",
+    std::vector<std::string_view>{accountsettings::kAccountDataclassContacts});
+auto& notifier = kept<ServiceNotifier>("ContactsServiceNotifier");
 
 }  // namespace
 }  // namespace accountservices

@@ -7,24 +7,25 @@
 namespace accountservices {
 namespace {
 
-ServiceAccountClass accountClass("MailServiceAccount");
-NamingAccountCreator accountCreator("MailServiceAccountCreator", accountClass,
-                                    {accountsettings::kMailAccountType,
-                                     accountsettings::kBriskIMAPAccountType,
-                                     accountsettings::kIMAPNotesAccountType,
-                                     accountsettings::kSMTPAccountType});
-MakingAccountCreator groupCreator("GroupAccountCreator", "GroupServiceAccount");
-ServiceSyncAccountCreator syncAccountCreator("MailServiceSyncAccountCreator", "MailService",
-                                             {accountsettings::kAccountDataclassMail,
-                                              accountsettings::kAccountDataclassNotes});
+auto& accountClass = kept<ServiceAccountClass>("MailServiceAccount");
+auto& accountCreator = kept<NamingAccountCreator>(
+    "MailServiceAccountCreator", accountClass,
+    std::vector<std::string_view>{
+        accountsettings::kMailAccountType, accountsettings::kBriskIMAPAccountType,
+        accountsettings::kIMAPNotesAccountType, accountsettings::kSMTPAccountType});
+auto& groupCreator = kept<MakingAccountCreator>("GroupAccountCreator", "GroupServiceAccount");
+auto& syncAccountCreator = kept<ServiceSyncAccountCreator>(
+    "MailServiceSyncAccountCreator", "MailService",
+    std::vector<std::string_view>{accountsettings::kAccountDataclassMail,
+                                  accountsettings::kAccountDataclassNotes});
 // One connection refreshes everything that such an account carries.
-ServiceSyncAccountCreator groupSyncCreator("GroupSyncAccountCreator", "MailService",
-                                           {accountsettings::kAccountDataclassMail,
-                                            accountsettings::kAccountDataclassContacts,
-                                            accountsettings::kAccountDataclassCalendars,
-                                            accountsettings::kAccountDataclassReminders,
-                                            accountsettings::kAccountDataclassNotes});
-ServiceNotifier notifier("MailServiceNotifier");
+auto& groupSyncCreator = kept<ServiceSyncAccountCreator>(
+    "GroupSyncAccountCreator", "MailService",
+    std::vector<std::string_view>{
+        accountsettings::kAccountDataclassMail, accountsettings::kAccountDataclassContacts,
+        accountsettings::kAccountDataclassCalendars, accountsettings::kAccountDataclassReminders,
+        accountsettings::kAccountDataclassNotes});
+auto& notifier = kept<ServiceNotifier>("MailServiceNotifier");
 
 }  // namespace
 }  // namespace accountservices

@@ -8,8 +8,15 @@
 #include "QuillnetAccountTypeRemoval/AccountCreatorClasses.h"
 
 // The kinds of class object that the sample services register. Each registers itself when it is
-// made, and so while the bundle that holds it is loaded; it stays until the process ends.
+// made, and so while the bundle that holds it is loaded.
 namespace accountservices {
+
+// A class object that is never destroyed: the registry answers it until the process is gone, also
+// to what runs at its exit.
+template <typename Class, typename... Arguments>
+Class& kept(Arguments&&... arguments) {
+  return *new Class(std::forward<Arguments>(arguments)...);
+}
 
 // A class object with a name.
 class NamedClass : public platform::RuntimeClass {

@@ -17,8 +17,9 @@ class PrincipalClass final : public platform::DataClassMigratorClass {
   }
 };
 
-// A bundle stays loaded, and so does the class.
-PrincipalClass principalClass;
+// A bundle stays loaded, and so does the class, which is never destroyed either: the registry
+// answers it until the process is gone.
+auto& principalClass = *new PrincipalClass;
 
 }  // namespace
 }  // namespace migrator

@@ -43,7 +43,9 @@ class PLATFORM_EXPORT ClassRegistry {
 };
 
 // Registers `registered` for the whole process; the name must be new, else the first one stays.
-// Code bundles call it while they are loaded, so it works before any service is installed.
+// `registered` is never destroyed: it is answered until the process is gone, also to what runs at
+// its exit. So make it with new; an object of static storage is destroyed before that. Code bundles
+// call it while they are loaded, so it works before any service is installed.
 PLATFORM_EXPORT void registerClass(RuntimeClass& registered);
 // The class registered under `name` in this process, or null.
 PLATFORM_EXPORT RuntimeClass* registeredClass(std::string_view name);

@@ -16,7 +16,8 @@ class SampleNotifier : public platform::RuntimeClass,
   }
 };
 
-// Made, and thereby registered, while the bundle is loaded.
-SampleNotifier notifier;
+// Made, and thereby registered, while the bundle is loaded; never destroyed, because the registry
+// answers it until the process is gone.
+SampleNotifier& notifier = *new SampleNotifier;
 
 }  // namespace

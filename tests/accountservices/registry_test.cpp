@@ -1,6 +1,9 @@
 // One registry of classes for everybody in the process, whose bundles stay loaded.
 
 #include <dlfcn.h>
+#include <unistd.h>
+
+#include <cstdlib>
 
 #include "tests/accountservices/ServicesImage.h"
 #include "tests/accountservices/bundles/StorePlugin.h"
@@ -14,6 +17,17 @@ bool isLoaded(const std::string& path) {
   void* const handle = ::dlopen(path.c_str(), RTLD_NOW | RTLD_NOLOAD);
   if (handle != nullptr) ::dlclose(handle);
   return handle != nullptr;
+}
+
+constexpr const char* kMailNotifier = "MailServiceNotifier";
+
+// Runs when the objects of the bundles that were loaded after it was registered have been
+// destroyed.
+void useTheMailNotifierAtExit() {
+  platform::RuntimeClass* const found = platform::registeredClass(kMailNotifier);
+  const bool works = found != nullptr && found->className() == kMailNotifier &&
+                     dynamic_cast<accountsettings::AccountChangesNotifier*>(found) != nullptr;
+  ::_exit(works ? 17 : 1);
 }
 
 void tellOfNothing(std::string_view className) {
@@ -47,13 +61,42 @@ TEST_F(Registry, IsOneForAPluginAndTheProcessThatLoadedIt) {
   EXPECT_EQ(image.refreshes().size(), 2U);
 }
 
+TEST_F(Registry, IsAllThatCopiesOfTheLibraryShare) {
+  StorePlugin& plugin = loadedPlugin(image);
+  const auto store = storeOf({account("1", "CalDAV", kCalendars)});
+  // This copy has read its catalogue; the plug-in's finds another one.
+  EXPECT_TRUE(store->accountWithIdentifier("1")->refreshContainersForDataclass(kCalendars));
+  image.addNotifier("Absent.so", "Absent");
+  const std::string path = image.bundlePath("Absent.so");
+  expectFailure("Could not load the account creator framework " + path + ". Error " + path +
+                    ": cannot open shared object file: No such file or directory",
+                [&] { plugin.renameAndNotify("1", "by the plug-in"); });
+  // The plug-in cleared a flag of its own.
+  rename(*store, "1");
+  store->saveAllAccounts();
+  EXPECT_EQ(image.changes(), Lines{});
+  speak();
+  store->saveAllAccounts();
+  EXPECT_EQ(image.changes().size(), 1U);
+}
+
+TEST_F(Registry, AnswersAClassThatWorksUntilTheProcessIsGone) {
+  EXPECT_EXIT(
+      {
+        std::atexit(useTheMailNotifierAtExit);
+        image.services().classRegistry.loadLibrary(image.bundlePath("MailService.so"));
+        std::exit(0);
+      },
+      testing::ExitedWithCode(17), "");
+}
+
 TEST_F(Registry, KeepsTheServicesLoadedWhoeverClosesThem) {
   const std::string path = image.bundlePath("MailService.so");
   void* const handle = ::dlopen(path.c_str(), RTLD_NOW | RTLD_LOCAL);
   ASSERT_NE(handle, nullptr) << ::dlerror();
   ::dlclose(handle);
   EXPECT_TRUE(isLoaded(path));
-  tellOfNothing("MailServiceNotifier");
+  tellOfNothing(kMailNotifier);
   EXPECT_EQ(
       image.changes(),
       Lines{R"({"notifier": "MailServiceNotifier", "record": 1, "of": 1, "change": "added"})"});

@@ -2,7 +2,8 @@
 usage: plugin_binary.py SHARED_OBJECT [--sanitized] [--account-classes]
 
 It may need the C and the C++ run time and the two libraries it shares with its host, nothing else; and
-since it is loaded into somebody else's process, none of its own symbols may be seen there.
+since it is loaded into somebody else's process, none of its own symbols may be seen there. It registers
+classes there, so no dlclose may unload it.
 --sanitized allows the sanitizers' own run time, --account-classes what describes the interfaces of
 account creators and notifiers.
 """
@@ -41,6 +42,12 @@ def needed(binary: Path) -> list[str]:
     return [row[1] for row in rows if row]
 
 
+def stays_loaded(binary: Path) -> bool:
+    """Whether the loader keeps `binary` until the process ends, whoever closes it."""
+    rows = lines_of("readelf", "-dW", str(binary))
+    return any("(FLAGS_1)" in row and "NODELETE" in row.split() for row in rows)
+
+
 def exported(binary: Path) -> list[tuple[str, str]]:
     """Kind letter and readable name of each symbol that `binary` defines for others."""
     rows = (line.split(maxsplit=2) for line in lines_of("nm", "-DC", "--defined-only", str(binary)))
@@ -54,6 +61,8 @@ def check(binary: Path, sanitized: bool, account_classes: bool = False) -> tuple
     for name in libraries:
         if not NEEDED.fullmatch(name) and not (sanitized and SANITIZERS.fullmatch(name)):
             problems.append(f"{binary}: needs {name}")
+    if not stays_loaded(binary):
+        problems.append(f"{binary}: can be unloaded")
     symbols = exported(binary)
     for kind, name in symbols:
         shared = SHARED_WEAK.match(name) or account_classes and ACCOUNT_CLASSES.match(name)
@@ -61,7 +70,7 @@ def check(binary: Path, sanitized: bool, account_classes: bool = False) -> tuple
         from_compiler = sanitized and re.match(r"_*(asan|ubsan|tsan|odr)_", name)
         if not weak and not from_compiler:
             problems.append(f"{binary}: shows the symbol {name} ({kind})")
-    return problems, len(libraries) + len(symbols)
+    return problems, len(libraries) + 1 + len(symbols)
 
 
 if __name__ == "__main__":

@@ -30,7 +30,7 @@ class PluginBinary(unittest.TestCase):
         with tempfile.TemporaryDirectory() as folder:
             file = Path(folder) / "object.cpp"
             file.write_text(source, encoding="utf-8")
-            command = [COMPILER, "-shared", "-fPIC", "-fvisibility=hidden", str(file)]
+            command = [COMPILER, "-shared", "-fPIC", "-fvisibility=hidden", "-Wl,-z,nodelete", str(file)]
             subprocess.run([*command, "-o", f"{folder}/object.so", *options], check=True)
             found, _ = plugin_binary.check(Path(folder) / "object.so", False, account_classes)
             return [problem.removeprefix(f"{folder}/") for problem in found]
@@ -41,6 +41,15 @@ class PluginBinary(unittest.TestCase):
     def test_a_library_besides_the_run_time_is_found(self):
         found = self.problems(MODEST, "-Wl,--no-as-needed", "-lresolv")
         self.assertEqual(found, ["object.so: needs libresolv.so.2"])
+
+    def test_an_object_that_can_be_unloaded_is_found(self):
+        with tempfile.TemporaryDirectory() as folder:
+            file = Path(folder) / "object.cpp"
+            file.write_text(MODEST, encoding="utf-8")
+            binary = Path(folder) / "object.so"
+            subprocess.run([COMPILER, "-shared", "-fPIC", "-fvisibility=hidden", file, "-o", binary], check=True)
+            found, _ = plugin_binary.check(binary, False)
+        self.assertEqual(found, [f"{binary}: can be unloaded"])
 
     def test_a_function_that_is_shown_is_found(self):
         shown = '__attribute__((visibility("default"))) int shown() { return 1; }'
