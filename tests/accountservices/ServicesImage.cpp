@@ -41,7 +41,8 @@ ServicesImage::ServicesImage() {
   deviceimage::OpenedImage made = DeviceImage::create(_directory.path() + "/image");
   if (!made.image) throw std::runtime_error(made.error);
   _image = std::move(made.image);
-  for (const std::string name : {"CalendarService.so", "ContactsService.so", "MailService.so"})
+  for (const std::string name :
+       {"CalendarService.so", "ContactsService.so", "DeviceService.so", "MailService.so"})
     addBundle(name, std::string(BUILT_SERVICES) + "/" + name);
   const std::string resources = _directory.path() + "/resources";
   files::copy(SHIPPED_RESOURCES, resources, files::copy_options::recursive);

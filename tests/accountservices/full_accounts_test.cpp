@@ -35,6 +35,10 @@ TEST_F(FullAccounts, AreMadeByTheServiceOfTheirType) {
       {"Gmail", "<GroupServiceAccount: 1>"},
       {"Yahoo", "<GroupServiceAccount: 1>"},
       {"Exchange", "<GroupServiceAccount: 1>"},
+      {"Quillnet", "<GroupServiceAccount: 1>"},
+      {"VantorAccount", "<GroupServiceAccount: 1>"},
+      // Made by the library that asks.
+      {"OnMyDevice", "<ASSDeviceLocalAccount: DeviceLocalAccount>"},
   };
   for (const auto& c : kCases) {
     SCOPED_TRACE(c.type);
@@ -42,12 +46,18 @@ TEST_F(FullAccounts, AreMadeByTheServiceOfTheirType) {
   }
 }
 
-TEST_F(FullAccounts, OfTypesThatNobodyServesAreABrokenInstallation) {
-  for (const char* type : {"Quillnet", "VantorAccount", "BookmarkDAV"}) {
-    SCOPED_TRACE(type);
-    expectFailure("The framework/bundle where (null) is defined has not been loaded",
-                  [&] { fullAccountOf(account("1", type)); });
-  }
+TEST_F(FullAccounts, OfATypeThatNobodyServesAreABrokenInstallation) {
+  expectFailure("The framework/bundle where (null) is defined has not been loaded",
+                [] { fullAccountOf(account("1", "BookmarkDAV")); });
+}
+
+TEST_F(FullAccounts, OfMailIncludeThoseOfAccountsThatAreToBeRetired) {
+  const auto store =
+      storeOf({account("q", "Quillnet", {}, {{"Class", "QuillnetAccount"}}), account("c", "CalDAV"),
+               account("m", "Mail", {}, {{"Class", "IMAPAccount"}})});
+  Lines found;
+  for (const auto& full : store->allMailAccounts()) found.push_back(descriptionOf(full));
+  EXPECT_EQ(found, (Lines{"<GroupServiceAccount: q>", "<MailServiceAccount: m>"}));
 }
 
 TEST_F(FullAccounts, AreMadeOnceAndKept) {

@@ -67,7 +67,8 @@ TEST_F(Refreshes, AreAnsweredForTheDataclassesThatTheServiceCarries) {
 }
 
 TEST_F(Refreshes, AreNotAnsweredWithoutASyncAccount) {
-  for (const char* type : {"LDAP", "SMTP", "OnMyDevice", "Quillnet"}) {
+  for (const char* type :
+       {"LDAP", "SMTP", "OnMyDevice", "Quillnet", "VantorAccount", "BookmarkDAV"}) {
     SCOPED_TRACE(type);
     EXPECT_FALSE(record("1", type)->refreshContainersForDataclass(kContacts));
   }

@@ -29,7 +29,7 @@ IN_LIBRARIES = [
     *(f"libaccount-retirement-{name}.so{version}" for name in ("platform", "propertylist")
       for version in ("", ".0.1", ".0.1.0")),
     "libaccount_settings.a", "libdeviceimage.a",
-    *(f"account-retirement/services/{name}Service.so" for name in ("Calendar", "Contacts", "Mail")),
+    *(f"account-retirement/services/{name}Service.so" for name in ("Calendar", "Contacts", "Device", "Mail")),
     *(f"cmake/AccountRetirement/AccountRetirement{name}.cmake"
       for name in ("Config", "ConfigVersion", "Targets", "DeviceImageTargets")),
     *(f"pkgconfig/account-retirement{name}.pc" for name in ("", "-platform", "-deviceimage")),

@@ -103,7 +103,8 @@ def dataclasses(path: Path) -> list[str]:
     return problems
 
 
-def creators(path: Path) -> list[str]:
+def creators(path: Path, services: set[str]) -> list[str]:
+    """`services` are the paths of the bundles that an image holds."""
     problems: list[str] = []
     catalogue = read(path, problems)
     problems += unequal(str(path), set(catalogue), TYPES)
@@ -123,11 +124,17 @@ def creators(path: Path) -> list[str]:
                 problems += unequal(where, heard, DATACLASSES & heard)
                 if not heard:
                     problems.append(f"{where}: Supported Dataclasses: missing or empty")
-            if ".." in Path(description.get("Framework", "")).parts:
-                problems.append(f"{where}: Framework: leads out of its root")
+            framework = description.get("Framework")
+            if framework and framework not in services:
+                problems.append(f"{where}: {framework}: no image holds this bundle")
     if not any(entry.get("Type") == "FullAccount" for entry in catalogue.get("OnMyDevice", [])):
         problems.append(f"{path}: OnMyDevice: nothing makes its full account")
     return problems
+
+
+def service_bundles(tree: Path) -> set[str]:
+    sources = (tree / "accountservices").glob("*Service.cpp")
+    return {f"System/Library/AccountServices/{path.stem}.so" for path in sources}
 
 
 def string_tables(folder: Path) -> list[str]:
@@ -151,7 +158,7 @@ def check(tree: Path) -> list[str]:
     return (
         account_types(folder / "AccountTypesProperties.plist")
         + dataclasses(folder / "DataclassesProperties.plist")
-        + creators(folder / "AccountCreators.plist")
+        + creators(folder / "AccountCreators.plist", service_bundles(tree))
         + string_tables(folder)
     )
 

@@ -15,7 +15,8 @@ class Resources(unittest.TestCase):
         folder = tempfile.TemporaryDirectory()
         self.addCleanup(folder.cleanup)
         self.tree = Path(folder.name)
-        shutil.copytree(TREE / "resources", self.tree / "resources")
+        for name in ("resources", "accountservices"):
+            shutil.copytree(TREE / name, self.tree / name)
 
     def replaced(self, name: str, old: str, new: str) -> str:
         """What the check says once the first `old` of the file `name` has become `new`."""
@@ -39,8 +40,8 @@ class Resources(unittest.TestCase):
         self.assertIn("LDAQ: unknown", said)
 
     def test_a_type_without_creators_list_is_found(self):
-        said = self.replaced("AccountCreators.plist", "  <key>Quillnet</key>\n  <array/>\n", "")
-        self.assertIn("Quillnet: missing", said)
+        said = self.replaced("AccountCreators.plist", "  <key>BookmarkDAV</key>\n  <array/>\n", "")
+        self.assertIn("BookmarkDAV: missing", said)
 
     def test_a_type_that_stands_twice_is_found(self):
         said = self.replaced("AccountCreators.plist", "<key>SMTP</key>", "<key>Mail</key>")
@@ -76,9 +77,12 @@ class Resources(unittest.TestCase):
         said = self.replaced("AccountCreators.plist", "<key>Supported Dataclasses<", "<key>Dataclasses<")
         self.assertIn("Supported Dataclasses: missing or empty", said)
 
-    def test_a_bundle_path_that_leads_out_is_found(self):
+    def test_a_bundle_that_no_image_holds_is_found(self):
         said = self.replaced("AccountCreators.plist", "System/Library", "../System/Library")
-        self.assertIn("leads out of its root", said)
+        self.assertIn("MailService.so: no image holds this bundle", said)
+        (self.tree / "accountservices/DeviceService.cpp").unlink()
+        said = "\n".join(resources.check(self.tree))
+        self.assertIn("OnMyDevice: System/Library/AccountServices/DeviceService.so: no image holds", said)
 
     def test_a_missing_language_is_found(self):
         shutil.rmtree(self.tree / "resources" / "ja.lproj")

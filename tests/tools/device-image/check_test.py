@@ -76,7 +76,7 @@ class Check(ImageTest):
     def test_a_new_image_has_private_copies_of_the_account_services(self):
         files = sorted((self.image / SERVICES).iterdir())
         self.assertEqual([path.name for path in files],
-                         ["CalendarService.so", "ContactsService.so", "MailService.so"])
+                         ["CalendarService.so", "ContactsService.so", "DeviceService.so", "MailService.so"])
         installed = Path(os.environ["INSTALLED_SERVICES"])
         for path in files:
             self.assertEqual(path.stat().st_mode & 0o7777, 0o600)
