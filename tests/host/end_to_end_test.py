@@ -2,6 +2,7 @@
 import hashlib
 import json
 import os
+import pathlib
 import plistlib
 import shutil
 import subprocess
@@ -47,6 +48,7 @@ LOG = [
 
 
 SERVICES = "System/Library/AccountServices"
+ALL_SERVICES = ("CalendarService.so", "ContactsService.so", "DeviceService.so", "MailService.so")
 
 
 class AccountServices(hosttest.HostTestCase):
@@ -64,21 +66,50 @@ class AccountServices(hosttest.HostTestCase):
         return [{key: value for key, value in json.loads(line).items() if key != "time"}
                 for line in lines]
 
-    def test_a_migration_loads_none_of_them(self):
+    def copied_migrator(self):
+        """A copy of the installed migrator, to be changed by the test."""
+        installed = next(hosttest.MIGRATORS.glob("*.migrator"))
+        return pathlib.Path(shutil.copytree(installed, self.directory / installed.name))
+
+    def migrate_with(self, bundle):
         self.write_agent_name("ada")
         self.write_settings(OTHERS[0], RETIRED, *OTHERS[1:])
         self.make_image(RECORDS)
+        run = self.run_host("--json", "--quiet", "--bundle", bundle)
+        self.assertEqual((0, "done"), (run.code, run.report["outcome"]), run.output)
+        self.assertEqual(["retired"], [entry["outcome"] for entry in run.report["accounts"]
+                                       if entry["identifier"] == RETIRED["Identifier"]])
+        self.assertEqual(LOG, run.report["log"])
+
+    def test_a_migration_loads_none_of_them(self):
+        bundle = self.copied_migrator()
+        creators = bundle / "AccountCreators.plist"
+        # Every service makes and hears of the accounts that the migration retires and creates.
+        catalogue = plistlib.loads(creators.read_bytes())
+        for name in ("Quillnet", "OnMyDevice"):
+            for kind in ("FullAccount", "SyncAccount", "NotifierAccount"):
+                for service in ALL_SERVICES:
+                    catalogue[name].append({"Type": kind, "Description": {
+                        "Supported Dataclasses": [CONTACTS, BOOKMARKS],
+                        "Framework": f"{SERVICES}/{service}", "Class": "Crashing"}})
+        creators.write_bytes(plistlib.dumps(catalogue))
         # Whoever loaded one of these would be killed.
         self.place(hosttest.BUNDLES / "CrashesWhenLoaded.migrator/CrashesWhenLoaded.so",
-                   "CalendarService.so", "ContactsService.so", "MailService.so")
-        run = self.run_host("--json", "--quiet")
-        self.assertEqual((0, "done"), (run.code, run.report["outcome"]))
+                   *ALL_SERVICES)
+        self.migrate_with(bundle)
         self.assertEqual([], self.journal("account-changes.jsonl"))
+
+    def test_a_migration_needs_no_catalogue_of_them(self):
+        bundle = self.copied_migrator()
+        (bundle / "AccountCreators.plist").unlink()
+        for table in bundle.glob("*.lproj/AccountsManager.strings"):
+            table.unlink()
+        self.migrate_with(bundle)
 
     def test_a_plugin_in_the_host_loads_asks_and_notifies_them(self):
         self.write_settings(account("cal", "CalDAV", ("Calendars",)),
                             account("group", "Gmail", ("Calendars",)))
-        self.place(None, "CalendarService.so", "ContactsService.so", "MailService.so")
+        self.place(None, *ALL_SERVICES)
         run = self.run_bundle("AsksAccountServices")
         self.assertEqual((0, "done"), (run.code, run.report["outcome"]), run.output)
         self.assertEqual(["<CalendarServiceAccount: cal>", "<GroupServiceAccount: group>"],

@@ -252,7 +252,7 @@ class BundleChecks(hosttest.HostTestCase):
     def test_the_installed_migrator_without_one_of_its_resources(self):
         installed = next(hosttest.MIGRATORS.glob("*.migrator"))
         for name in ("AccountTypesProperties.plist", "DataclassesProperties.plist",
-                     "AccountCreators.plist", "en.lproj/DeviceLocalAccount.strings"):
+                     "en.lproj/DeviceLocalAccount.strings"):
             with self.subTest(name):
                 self.bundle = self.directory / installed.name
                 shutil.copytree(installed, self.bundle)
