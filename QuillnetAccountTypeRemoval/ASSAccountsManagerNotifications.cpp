@@ -73,13 +73,17 @@ std::set<std::string> affectedDataclasses(AccountChangeType change,
 
 // Ends at the first value that is missing.
 AccountChangeRecord changeRecord(AccountChangeType change, const std::string* identifier,
-                                 const std::string* type, const StringList& originallyEnabled) {
+                                 const std::string* type,
+                                 const std::optional<Dictionary>& original) {
   AccountChangeRecord record{{kASChangeAccountChangeTypeKey, static_cast<int>(change)}};
   if (identifier == nullptr) return record;
   record.set(kASChangeAccountIdentifierKey, *identifier);
   if (type == nullptr) return record;
   record.set(kASChangeAccountTypeKey, *type);
-  record.set(kASChangeAccountOriginallyEnabledDataclassesKey, arrayOfStrings(originallyEnabled));
+  const Array* enabled =
+      original ? propertylist::findArray(*original, kAccountEnabledDataclasses) : nullptr;
+  record.set(kASChangeAccountOriginallyEnabledDataclassesKey,
+             enabled != nullptr ? *enabled : Array());
   return record;
 }
 
@@ -177,7 +181,7 @@ void ASSAccountsManager::
       names.insert(std::move(name));
   }
   for (const std::string& name : names)
-    table[name].append(changeRecord(change, identifier, type, enabledOf(original)));
+    table[name].append(changeRecord(change, identifier, type, original));
 }
 
 void ASSAccountsManager::_sendNotificationsForChangedAccounts() const {
@@ -205,7 +209,7 @@ void ASSAccountsManager::_sendNotificationsForChangedAccounts() const {
     auto* const notifier = dynamic_cast<AccountChangesNotifier*>(&found);
     // Every notifier must hear of changes: one that cannot is a broken installation.
     if (notifier == nullptr)
-      raiseAssertionFailure(kSourceFile, kSendingLine, "%@ does not take account changes", name);
+      raiseAssertionFailure(kSourceFile, __LINE__, "%@ does not take account changes", name);
     notifier->noteAccountChanges(changes);
   }
 }

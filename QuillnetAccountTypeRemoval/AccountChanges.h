@@ -16,7 +16,8 @@ using AccountChangeRecord = propertylist::Dictionary;
 inline constexpr std::string_view kASChangeAccountChangeTypeKey = "ChangeType";
 inline constexpr std::string_view kASChangeAccountIdentifierKey = "AccountID";
 inline constexpr std::string_view kASChangeAccountTypeKey = "AccountType";
-// The dataclasses that were enabled before the change; an empty array for an account without any.
+// The account's list of enabled dataclasses before the change, as it was; an empty array for an
+// account without one.
 inline constexpr std::string_view kASChangeAccountOriginallyEnabledDataclassesKey =
     "OriginalDataclasses";
 

@@ -100,6 +100,18 @@ TEST_F(ChangeRecords, AModifiedAccountConcernsEachDataclassByItsChange) {
   }
 }
 
+TEST_F(ChangeRecords, AnAccountWithNothingEnabledAnyMoreConcernsOnlyWhatItLost) {
+  const Dictionary original = enabled({kContacts}, {{"DisplayName", "before"}, {"Port", 1}});
+  const Dictionary current = enabled({}, {{"DisplayName", "after"}, {"Host", "h"}});
+  EXPECT_EQ(
+      recordsOf(Change::modified, original, current),
+      (TellingStore::NotificationTable{{"ForContacts", {change(1, "1", "CalDAV", {kContacts})}}}));
+  // With one left on, the other properties concern that one.
+  EXPECT_EQ(toldOf(Change::modified, with(original, "Enabled Dataclasses", Array{kContacts, kMail}),
+                   with(current, "Enabled Dataclasses", Array{kMail})),
+            (Lines{"ForBoth", "ForContacts", "ForMail"}));
+}
+
 TEST_F(ChangeRecords, CompareWhatIsStoredNotWhatIsProvisionedOrForbidden) {
   // CalDAV supports none of these dataclasses, and the service granted none.
   const Dictionary grantsNothing{{"Provisioned Dataclasses", Array{}}};
@@ -116,6 +128,15 @@ TEST_F(ChangeRecords, HoldTheOriginalListAndOneRecordForANotifierOfSeveralDatacl
   EXPECT_EQ(
       recordsOf(Change::modified, accountInfo("1"), enabled({kContacts})),
       (TellingStore::NotificationTable{{"ForContacts", {change(1, "1", "CalDAV", Array{})}}}));
+}
+
+TEST_F(ChangeRecords, HoldTheOriginalListAsItIs) {
+  const Array odd{kContacts, 5, kContacts};
+  for (const Properties& current : {Properties(enabled({})), Properties()}) {
+    const Change kind = current ? Change::modified : Change::deleted;
+    EXPECT_EQ(recordsOf(kind, enabled(odd), current).at("ForContacts"),
+              Array{change(static_cast<int>(kind), "1", "CalDAV", odd)});
+  }
 }
 
 TEST_F(ChangeRecords, TakeIdentifierAndTypeFromTheCurrentPropertiesElseFromTheOriginal) {

@@ -35,9 +35,13 @@ Dictionary mailInfo(std::string_view identifier, std::string_view type = "Mail",
 Dictionary withChildren(const Array& children) { return {{"ChildAccounts", children}}; }
 
 TEST_F(FullAccountQueries, FindNothingForAnEmptyOrUnknownIdentifier) {
-  const auto store = OpenStore::ofAccounts({accountInfo("1")});
-  EXPECT_EQ(store->fullAccountWithIdentifierLoader("", nullptr), nullptr);
-  EXPECT_EQ(store->fullAccountWithIdentifierLoader("unknown", nullptr), nullptr);
+  // An account with the empty identifier does not count either.
+  const auto store = OpenStore::ofAccounts({accountInfo("1"), accountInfo("")});
+  ASSERT_NE(store->accountWithIdentifier(""), nullptr);
+  NotingLoader loader(false);
+  EXPECT_EQ(store->fullAccountWithIdentifierLoader("", &loader), nullptr);
+  EXPECT_EQ(store->fullAccountWithIdentifierLoader("unknown", &loader), nullptr);
+  EXPECT_EQ(loader.asked, Lines{});
   EXPECT_FALSE(fullAccountsAreLoaded());
 }
 
@@ -83,6 +87,29 @@ TEST_F(FullAccountQueries, CountAChildOnlyUnderTheVeryObjectThatIsItsParent) {
   EXPECT_EQ(store->accountsWithTypes({"SMTP"}).size(), 0U);
   child->setParentAccount(store->accountWithIdentifier("p"));
   EXPECT_EQ(store->accountsWithTypes({"SMTP"}).size(), 1U);
+}
+
+TEST_F(FullAccountQueries, LeaveOutAMatchingChildThatHasNone) {
+  const auto store = OpenStore::ofAccounts({accountInfo(
+      "p", "CalDAV", withChildren({accountInfo("", "SMTP"), accountInfo("c", "SMTP")}))});
+  ASSERT_EQ(store->children(), (Lines{" of p", "c of p"}));
+  const std::vector<FullAccountPtr> accounts = store->accountsWithTypes({"SMTP"});
+  ASSERT_EQ(accounts.size(), 1U);
+  EXPECT_EQ(accounts[0], store->fullAccountWithIdentifierLoader("c", nullptr));
+  EXPECT_EQ(made(), Lines{"c"});
+}
+
+TEST_F(FullAccountQueries, AnswerTheStoresOwnRecordAsTheDeviceLocalAccount) {
+  device.setCreators(
+      {{"OnMyDevice", Array{creator("FullAccount", kFullAccounts, "MakingCreator")}}});
+  const auto store = OpenStore::ofAccounts({accountInfo("1", "OnMyDevice")});
+  const AccountPtr local = store->fullDeviceLocalAccount();
+  EXPECT_EQ(local, (*store->allBasicAccounts())[0]);
+  EXPECT_EQ(made(), Lines{});
+  EXPECT_FALSE(fullAccountsAreLoaded());
+  EXPECT_EQ(
+      device.countOfFileCalls("readPropertyListFile(" + device.resourcePath("AccountCreators")),
+      0U);
 }
 
 TEST_F(FullAccountQueries, RaiseForAListedAccountThatCannotBeFoundByItsIdentifier) {

@@ -42,11 +42,26 @@ TEST_F(FullAccounts, AreNamedByACreatorThatOffersBothWays) {
 }
 
 TEST_F(FullAccounts, AreNotMadeTheSecondWayAfterTheFirstGaveNothing) {
-  createBy("BothWaysCreator");
+  const Array bothWays{creator("FullAccount", kFullAccounts, "BothWaysCreator")};
+  device.setCreators({{"CalDAV", bothWays}, {"Mail", bothWays}});
+  // No class is named.
+  const auto mail = ASSBasicAccount::initWithProperties(accountInfo("2", "Mail"));
+  expectAssertionFailure("Could not create the account with class BothWaysCreator and id 2",
+                         kSourceFile, [&] { mail->fullAccountUsingLoader(nullptr); });
+  EXPECT_EQ(diaryLines(), Lines{});
+  // The class that is named makes none.
   letCreationFail(true);
   expectAssertionFailure("Could not create the account with class BothWaysCreator and id 1",
                          kSourceFile, [&] { calendarAccount()->fullAccountUsingLoader(nullptr); });
-  EXPECT_EQ(diaryLines(), Lines{});
+  EXPECT_EQ(diaryLines(), Lines{"initWithProperties(1)"});
+}
+
+TEST_F(FullAccounts, AreMissingWhereTheNamedClassMakesNone) {
+  createBy("NamingCreator");
+  letCreationFail(true);
+  expectAssertionFailure("Could not create the account with class NamingCreator and id 1",
+                         kSourceFile, [&] { calendarAccount()->fullAccountUsingLoader(nullptr); });
+  EXPECT_EQ(diaryLines(), (Lines{"classForAccountType(CalDAV)", "initWithProperties(1)"}));
 }
 
 TEST_F(FullAccounts, MustComeFromAClassThatCanMakeThem) {

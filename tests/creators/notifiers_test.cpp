@@ -1,3 +1,4 @@
+#include "platform/testing/ForwardingClassRegistry.h"
 #include "tests/creators/CreatorsDevice.h"
 
 namespace accountsettings {
@@ -46,6 +47,25 @@ TEST_F(Notifiers, AreAllTakenInOrderWithDuplicatesKept) {
   EXPECT_EQ(namesFor("CalDAV", kContacts), (StringList{"Z", "M", "Z"}));
   EXPECT_TRUE(notifiersAreLoaded());
   EXPECT_FALSE(fullAccountsAreLoaded());
+}
+
+TEST_F(Notifiers, HaveTheirBundlesLoadedAtEachLookup) {
+  class NotingRegistry : public platform::ForwardingClassRegistry {
+   public:
+    using ForwardingClassRegistry::ForwardingClassRegistry;
+    std::optional<std::string> loadLibrary(const std::string& path) override {
+      loaded.push_back(path);
+      return ForwardingClassRegistry::loadLibrary(path);
+    }
+    Lines loaded;
+  };
+  platform::ProcessClassRegistry real;
+  NotingRegistry registry(real);
+  device.use<platform::ClassRegistry>(registry);
+  device.setCreators({{"CalDAV", Array{notifier("A", {kContacts}), notifier("B", {kContacts})}}});
+  namesFor("CalDAV", kContacts);
+  namesFor("CalDAV", kContacts);
+  EXPECT_EQ(registry.loaded, Lines(4, device.bundlePath(kNotifiers)));
 }
 
 TEST_F(Notifiers, AreSkippedInSilenceWithoutADescriptionOrTheDataclass) {
@@ -126,6 +146,16 @@ TEST_F(Notifiers, OnlySubscribedCalendarsHaveAGroupName) {
   // Without a table of texts the keys come out.
   EXPECT_EQ(name("Subscribed Calendar", true), "SUBSCRIBED_CALENDAR_GROUP_TITLE");
   EXPECT_EQ(name("Subscribed Calendar", false), "SUBSCRIBED_CALENDAR_GROUP_MID_SENTENCE_TITLE");
+  // These texts are of one table alone.
+  device.bundleResources.texts["AccountsManager"] = {
+      {"SUBSCRIBED_CALENDAR_GROUP_TITLE", "At the beginning"},
+      {"SUBSCRIBED_CALENDAR_GROUP_MID_SENTENCE_TITLE", "in the middle"}};
+  EXPECT_EQ(name("Subscribed Calendar", true), "At the beginning");
+  EXPECT_EQ(name("Subscribed Calendar", false), "in the middle");
+  device.bundleResources.texts.clear();
+  device.setResourcesDirectory(SHIPPED_RESOURCES);
+  EXPECT_EQ(name("Subscribed Calendar", true), "Subscribed Calendars");
+  EXPECT_EQ(name("Subscribed Calendar", false), "subscribed calendars");
 }
 
 }  // namespace

@@ -96,14 +96,49 @@ TEST_F(SavingNotifies, AfterTheFileIsWrittenAndKeepsTheSnapshotWhenANotifierIsMi
   EXPECT_EQ(store->originalAccountsByID().at("1"), enabledInfo("1", {kContacts}));
 }
 
+TEST_F(SavingNotifies, AfterTheRecordsCountAsSaved) {
+  notifiersAre({notifier("Missing", {kContacts})});
+  device.writeAccounts({enabledInfo("1", {kContacts})});
+  const auto store = TellingStore::ofFile();
+  rename(*store, "1", "new");
+  speak();
+  expectStoreFailure("Could not find a class for class name Missing", 992,
+                     [&] { store->saveAllAccounts(); });
+  EXPECT_EQ(store->accountWithIdentifier("1")->originalProperties(),
+            enabledInfo("1", {kContacts}, {{"DisplayName", "new"}}));
+}
+
+TEST_F(SavingNotifies, AfterTheFixersWereTold) {
+  notifiersAre({notifier("ChangesNotifier", {kContacts})});
+  device.writeAccounts({enabledInfo("1", {kContacts})});
+  FixVerdict verdict = FixVerdict::nothingToDo;
+  StoreWithFixers store({std::make_shared<ChosenFixer>(
+      "fixer", diaryLines(), [&](const AccountPtr&) { return verdict; })});
+  store.loadFile();
+  rename(store, "1", "new");
+  verdict = FixVerdict::fixed;
+  speak();
+  diaryLines().clear();
+  store.saveAllAccounts();
+  EXPECT_EQ(diaryLines(),
+            (Lines{"fixer: saving accounts 1", "fixer: saved",
+                   told("ChangesNotifier", {change(1, "1", "CalDAV", {kContacts})})}));
+}
+
 TEST_F(SavingNotifies, ANotifierThatTakesNoChangesIsABrokenInstallation) {
   notifiersAre({notifier("DeafClass", {kContacts})});
   device.writeAccounts({enabledInfo("1", {kContacts})});
   const auto store = TellingStore::ofFile();
   rename(*store, "1", "new");
   speak();
-  expectStoreFailure("DeafClass does not take account changes", 992,
-                     [&] { store->saveAllAccounts(); });
+  try {
+    store->saveAllAccounts();
+    ADD_FAILURE() << "nothing was raised";
+  } catch (const platform::InternalConsistencyFailure& failure) {
+    EXPECT_EQ(failure.what(), std::string("DeafClass does not take account changes"));
+    EXPECT_EQ(failure.sourceFile(), "ASSAccountsManager");
+    EXPECT_NE(failure.line(), 992);  // which stands for a missing class
+  }
   EXPECT_EQ(store->originalAccountsByID().at("1"), enabledInfo("1", {kContacts}));
 }
 

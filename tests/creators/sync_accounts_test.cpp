@@ -50,6 +50,15 @@ TEST_F(SyncAccounts, AreMissingWithALogLineWithoutTheirCreatorsClass) {
                   "Identifier = 1; Type = CalDAV}"});
 }
 
+TEST_F(SyncAccounts, AreMissingWithALogLineWhereTheClassMakesNoSyncAccounts) {
+  device.setCreators({{"CalDAV", Array{creator("SyncAccount", kFullAccounts, "NoCreator")}}});
+  const auto account = calendarAccount();
+  EXPECT_EQ(account->_cachedSyncAccount(), nullptr);
+  EXPECT_EQ(device.logLines(),
+            Lines{"ERROR: Could not create the account with class NoCreator and id 1"});
+  EXPECT_FALSE(account->refreshContainersForDataclass(kContacts));
+}
+
 TEST_F(SyncAccounts, AreTriedAgainAfterAFailureThatIsLogged) {
   createBy("SyncCreator");
   letCreationFail(true);
