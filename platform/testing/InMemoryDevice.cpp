@@ -55,7 +55,7 @@ void InMemoryDevice::writeSettings(const propertylist::Dictionary& settings) {
 }
 
 void InMemoryDevice::writeSettingsBytes(std::string_view bytes) {
-  std::ofstream file(settingsPath(), std::ios::binary | std::ios::trunc);
+  std::ofstream file(settingsPath(), std::fstream::binary | std::fstream::trunc);
   file.write(bytes.data(), static_cast<std::streamsize>(bytes.size()));
   file.close();
   if (!file) throw std::runtime_error("cannot write " + settingsPath());
@@ -72,7 +72,7 @@ propertylist::Dictionary InMemoryDevice::readSettings() const {
 }
 
 std::optional<std::string> InMemoryDevice::readSettingsBytes() const {
-  std::ifstream file(settingsPath(), std::ios::binary);
+  std::ifstream file(settingsPath(), std::fstream::binary);
   if (!file) return std::nullopt;
   return std::string(std::istreambuf_iterator<char>(file), {});
 }

@@ -65,7 +65,7 @@ void AccountsDevice::setResource(const std::string& name, const Value& content) 
 }
 
 void AccountsDevice::setResourceBytes(const std::string& name, std::string_view bytes) {
-  std::ofstream file(resourcePath(name), std::ios::binary | std::ios::trunc);
+  std::ofstream file(resourcePath(name), std::fstream::binary | std::fstream::trunc);
   file << bytes;
   file.close();
   if (!file) throw std::runtime_error("cannot write " + resourcePath(name));

@@ -34,7 +34,7 @@ class MalformedSettings : public ::testing::Test {
     EXPECT_EQ(device.temporaryFiles(), Lines());
   }
   AccountsManagerPtr load(const std::string& sample) {
-    std::ifstream file(std::string(TEST_DATA_DIR) + "/malformed/" + sample, std::ios::binary);
+    std::ifstream file(std::string(TEST_DATA_DIR) + "/malformed/" + sample, std::fstream::binary);
     EXPECT_TRUE(file.is_open()) << sample;
     device.writeSettingsBytes(std::string(std::istreambuf_iterator<char>(file), {}));
     return ASSAccountsManager::init();

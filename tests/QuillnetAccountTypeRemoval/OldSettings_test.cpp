@@ -12,7 +12,7 @@ namespace {
 class OldSettings : public ::testing::Test {
  protected:
   std::shared_ptr<OpenStore> load(const std::string& name) {
-    std::ifstream file(std::string(TEST_DATA_DIR) + "/settings/" + name, std::ios::binary);
+    std::ifstream file(std::string(TEST_DATA_DIR) + "/settings/" + name, std::fstream::binary);
     EXPECT_TRUE(file.is_open()) << name;
     device.writeSettingsBytes(std::string(std::istreambuf_iterator<char>(file), {}));
     accountsBefore = device.savedAccounts();

@@ -25,12 +25,12 @@ mode_t modeOf(const std::string& path) {
 }
 
 std::string contentOf(const std::string& path) {
-  std::ifstream file(path, std::ios::binary);
+  std::ifstream file(path, std::fstream::binary);
   return {std::istreambuf_iterator<char>(file), {}};
 }
 
 void writeFile(const std::string& path, std::string_view content) {
-  std::ofstream(path, std::ios::binary) << content;
+  std::ofstream(path, std::fstream::binary) << content;
 }
 
 // File services whose temporary names a test chooses; after these, tempnam's.

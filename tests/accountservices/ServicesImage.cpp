@@ -19,7 +19,7 @@ constexpr const char* kTemporaryDirectoryVariable = "TMPDIR";
 constexpr std::string_view kTimeForm = R"({"time": "0000-00-00T00:00:00Z", )";
 
 std::string fileContent(const std::string& path) {
-  std::ifstream file(path, std::ios::binary);
+  std::ifstream file(path, std::fstream::binary);
   if (!file) throw std::runtime_error("cannot read " + path);
   return {std::istreambuf_iterator<char>(file), {}};
 }
@@ -85,7 +85,7 @@ void ServicesImage::addEntry(const std::string& type, const Dictionary& entry) c
   entries.append(entry);
   catalogue.set(type, entries);
   const propertylist::Bytes bytes = *propertylist::writeBinaryPropertyList(catalogue);
-  std::ofstream(file, std::ios::binary)
+  std::ofstream(file, std::fstream::binary)
       .write(reinterpret_cast<const char*>(bytes.data()),
              static_cast<std::streamsize>(bytes.size()));
 }

@@ -29,10 +29,10 @@ class FileServicesContract : public Contract<FileServicesUnderTest> {
   std::string path(const std::string& name) { return device->directory() + "/" + name; }
 
   static void write(const std::string& path, const std::string& text) {
-    std::ofstream(path, std::ios::binary) << text;
+    std::ofstream(path, std::fstream::binary) << text;
   }
   static std::string read(const std::string& path) {
-    std::ifstream file(path, std::ios::binary);
+    std::ifstream file(path, std::fstream::binary);
     return {std::istreambuf_iterator<char>(file), {}};
   }
   static unsigned modeOf(const std::string& path) {

@@ -19,7 +19,7 @@ using testing::HasSubstr;
 using testing::IsEmpty;
 
 std::string textOf(const std::filesystem::path& path) {
-  std::ifstream file(path, std::ios::binary);
+  std::ifstream file(path, std::fstream::binary);
   return {std::istreambuf_iterator<char>(file), {}};
 }
 

@@ -69,7 +69,7 @@ class LocalDataTest : public ::testing::Test {
     const std::string directory = device.root() + "/resources";
     std::filesystem::create_directory(directory);
     const propertylist::Bytes bytes = propertylist::writeBinaryPropertyList(content).value();
-    std::ofstream(directory + "/" + name + ".plist", std::ios::binary)
+    std::ofstream(directory + "/" + name + ".plist", std::fstream::binary)
         .write(reinterpret_cast<const char*>(bytes.data()),
                static_cast<std::streamsize>(bytes.size()));
     device.setResourcesDirectory(directory);

@@ -50,7 +50,7 @@ INSTANTIATE_TEST_SUITE_P(Posix, ClassRegistryContract, Values(portOf<ProcessClas
 class ResourcesInAFolder : public BundleResourcesUnderTest {
  public:
   void addFile(const std::string& fileName, const std::string& content) override {
-    std::ofstream(folder() + "/" + fileName, std::ios::binary) << content;
+    std::ofstream(folder() + "/" + fileName, std::fstream::binary) << content;
   }
   void addText(const std::string& language, const std::string& table, const std::string& key,
                const std::string& text) override {
@@ -61,7 +61,7 @@ class ResourcesInAFolder : public BundleResourcesUnderTest {
                 "</key><string>" + text + "</string></dict></plist>");
   }
   std::string contentOf(const std::string& path) override {
-    std::ifstream file(path, std::ios::binary);
+    std::ifstream file(path, std::fstream::binary);
     return {std::istreambuf_iterator<char>(file), {}};
   }
 

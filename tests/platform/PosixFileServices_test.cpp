@@ -24,10 +24,10 @@ class PosixFileServicesTest : public testing::Test {
  protected:
   std::string path(const std::string& name) { return directory.path() + "/" + name; }
   static void write(const std::string& path, const std::string& text) {
-    std::ofstream(path, std::ios::binary) << text;
+    std::ofstream(path, std::fstream::binary) << text;
   }
   static std::string read(const std::string& path) {
-    std::ifstream file(path, std::ios::binary);
+    std::ifstream file(path, std::fstream::binary);
     return {std::istreambuf_iterator<char>(file), {}};
   }
   static struct stat statusOf(const std::string& path) {

@@ -18,7 +18,8 @@ SampleBundle::SampleBundle() : SampleBundle(goodInformation()) {}
 SampleBundle::SampleBundle(const propertylist::Dictionary& information) {
   std::filesystem::copy_file(SAMPLE_BUNDLE_CODE, path() + "/" + kExecutable);
   const propertylist::Bytes list = propertylist::writeBinaryPropertyList(information).value();
-  std::ofstream(path() + "/Info.plist", std::ios::binary) << std::string(list.begin(), list.end());
+  std::ofstream(path() + "/Info.plist", std::fstream::binary)
+      << std::string(list.begin(), list.end());
 }
 
 propertylist::Dictionary SampleBundle::goodInformation() {

@@ -53,11 +53,11 @@ class SetAsideFaults : public testing::Test {
  protected:
   std::string path(const std::string& name) { return directory.path() + "/" + name; }
   void write(const std::string& name, const std::string& text) {
-    std::ofstream(path(name), std::ios::binary) << text;
+    std::ofstream(path(name), std::fstream::binary) << text;
     std::filesystem::permissions(path(name), std::filesystem::perms(0600));
   }
   std::string read(const std::string& name) {
-    std::ifstream file(path(name), std::ios::binary);
+    std::ifstream file(path(name), std::fstream::binary);
     return {std::istreambuf_iterator<char>(file), {}};
   }
   Names names() {

@@ -23,7 +23,7 @@ class FileReading : public testing::Test {
   ~FileReading() override { std::filesystem::remove_all(folder); }
 
   std::string put(const std::string& name, const Bytes& bytes) {
-    std::ofstream(folder / name, std::ios::binary)
+    std::ofstream(folder / name, std::fstream::binary)
         .write(reinterpret_cast<const char*>(bytes.data()),
                static_cast<std::streamsize>(bytes.size()));
     return (folder / name).string();

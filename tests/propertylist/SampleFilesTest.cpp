@@ -19,7 +19,7 @@ using nlohmann::json;
 const std::filesystem::path kData = TEST_DATA_DIR;
 
 std::string contentsOf(const std::filesystem::path& path) {
-  std::ifstream file(path, std::ios::binary);
+  std::ifstream file(path, std::fstream::binary);
   if (!file) throw std::runtime_error("cannot open " + path.string());
   return {std::istreambuf_iterator<char>(file), std::istreambuf_iterator<char>()};
 }

@@ -65,7 +65,7 @@ bool migrate() {
   if (change == "version") root.set("Version", 11);
   propertylist::Bytes bytes = *propertylist::writeBinaryPropertyList(root);
   if (change == "destroy") bytes.resize(bytes.size() / 2);
-  std::ofstream file(path, std::ios::binary | std::ios::trunc);
+  std::ofstream file(path, std::fstream::binary | std::fstream::trunc);
   file.write(reinterpret_cast<const char*>(bytes.data()),
              static_cast<std::streamsize>(bytes.size()));
   if (change == "mode" && chmod(path.c_str(), 0644) != 0) return false;
