@@ -93,7 +93,7 @@ void addCommand(CLI::App& app, ExitCode& outcome, bool enabled) {
   CLI::App* const command =
       enabled ? app.add_subcommand("enable", "Turn dataclasses of an account on")
               : app.add_subcommand("disable", "Turn dataclasses of an account off");
-  command->add_option("ID", options->identifier, "The account, or child account")->required();
+  addIdentifier(*command, "ID", options->identifier, "The account, or child account");
   command
       ->add_option("DATACLASS", options->dataclasses,
                    "mail, contacts, calendars, reminders, bookmarks, notes, or a whole identifier "

@@ -43,7 +43,7 @@ void addDeleteCommand(CLI::App& app, ExitCode& outcome) {
   const auto options = std::make_shared<Options>();
   CLI::App* const command =
       app.add_subcommand("delete", "Delete an account with its child accounts");
-  command->add_option("ID", options->identifier, "The top-level account")->required();
+  addIdentifier(*command, "ID", options->identifier, "The top-level account");
   addChangeOptions(*command, *options);
   command->footer(
       "The account's records stay in their stores.\n\n"
@@ -55,7 +55,7 @@ void addRemoveChildCommand(CLI::App& app, ExitCode& outcome) {
   const auto options = std::make_shared<Options>();
   CLI::App* const command =
       app.add_subcommand("remove-child", "Remove a child account from its parent");
-  command->add_option("ID", options->identifier, "The child account")->required();
+  addIdentifier(*command, "ID", options->identifier, "The child account");
   addChangeOptions(*command, *options);
   command->footer("Example:\n  account-settings remove-child Q1C --image my-device");
   command->callback([options, &outcome] { outcome = runRemoveChild(*options); });

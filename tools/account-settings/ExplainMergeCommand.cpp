@@ -23,6 +23,31 @@ struct Options {
   bool json = false;
 };
 
+// An unknown key beside the accounts is left out of every save, and no matter of the merge.
+bool hindersMerge(const Oddity& oddity) {
+  return oddity.effect == Oddity::Effect::lost &&
+         (!oddity.place.empty() || oddity.key == "Accounts");
+}
+
+// The library makes a new identifier up at each reading for an account that has none, so that the
+// versions of it are no longer known as one account.
+void requireIdentifiers(const std::string& file, const Dictionary& settings) {
+  const propertylist::Array* const accounts = propertylist::findArray(settings, "Accounts");
+  for (std::size_t i = 0; accounts != nullptr && i < accounts->size(); ++i) {
+    const Dictionary& account = *(*accounts)[i].asDictionary();
+    const std::string* const type =
+        propertylist::findString(account, accountsettings::kAccountType);
+    if (*type == accountsettings::kOnMyDeviceAccountType ||
+        propertylist::findString(account, accountsettings::kAccountIdentifier) != nullptr)
+      continue;
+    throw CommandFailure(
+        ExitCode::imageDamaged,
+        fmt::format("{}: Accounts[{}]: Identifier: is missing or no string, so that nothing tells "
+                    "which account this is in the other files; write one into all three",
+                    file, i));
+  }
+}
+
 // A settings file that the library can read as a whole.
 Dictionary settingsIn(const std::string& file) {
   const propertylist::Value value = readPropertyListOfAnyForm(file);
@@ -32,9 +57,10 @@ Dictionary settingsIn(const std::string& file) {
                                      "\"Accounts\"; give the whole file",
                                      file));
   for (const Oddity& oddity : findOddities(*value.asDictionary()))
-    if (oddity.effect == Oddity::Effect::lost)
+    if (hindersMerge(oddity))
       throw CommandFailure(ExitCode::imageDamaged,
                            fmt::format("{}: {}; correct the file", file, describe(oddity)));
+  requireIdentifiers(file, *value.asDictionary());
   return *value.asDictionary();
 }
 

@@ -50,7 +50,8 @@ class Search {
                        kindName(*version), ASSAccountsManager::currentVersion()));
     for (const Dictionary::Entry& entry : root)
       if (entry.key() != kAccountsKey && entry.key() != kVersionKey)
-        _add({}, {}, entry.key(), "is unknown at the top of the file; a save leaves it out");
+        _add({}, {}, entry.key(), "is unknown at the top of the file; a save leaves it out",
+             Effect::lost);
     const Value* const accounts = root.find(kAccountsKey);
     if (accounts == nullptr) return;
     if (accounts->asArray() == nullptr)

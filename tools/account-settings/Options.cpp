@@ -1,10 +1,20 @@
 #include "tools/account-settings/Options.h"
 
+#include <cmath>
+#include <cstdlib>
+
 namespace tools {
 
 void addLookOptions(CLI::App& command, LookOptions& options) {
   command.add_option("--image", options.image, "The device image")->required()->type_name("DIR");
   command.add_flag("--json", options.json, "For programs");
+}
+
+void addIdentifier(CLI::App& command, const std::string& name, std::string& identifier,
+                   const std::string& help) {
+  command.add_option(name, identifier, help)->required()->check([](const std::string& text) {
+    return text.empty() ? std::string("an identifier is not empty") : std::string();
+  });
 }
 
 void addChangeOptions(CLI::App& command, ChangeOptions& options) {
@@ -15,7 +25,11 @@ void addChangeOptions(CLI::App& command, ChangeOptions& options) {
   command
       .add_option("--wait", options.wait, "How long to wait for a lock that another run holds (10)")
       ->type_name("SECONDS")
-      ->check(CLI::Range(0.0, 86'400.0));
+      ->check(CLI::Range(0.0, 86'400.0))
+      ->check([](const std::string& text) {  // which lets "nan" pass
+        return std::isfinite(std::strtod(text.c_str(), nullptr)) ? std::string()
+                                                                 : text + " is no number";
+      });
   command.add_flag("--notify", options.notify,
                    "Tell the notifiers of the image's account services; runs their code");
   command.add_flag("--dry-run", options.dryRun, "Print what would change, and change nothing");

@@ -12,6 +12,10 @@ struct LookOptions {
 };
 void addLookOptions(CLI::App& command, LookOptions& options);
 
+// The account that a command is about, with a help text of its own; an empty one is wrong usage.
+void addIdentifier(CLI::App& command, const std::string& name, std::string& identifier,
+                   const std::string& help);
+
 // What every command that changes a settings file is told.
 struct ChangeOptions : LookOptions {
   bool lock = true;     // hold the image's lock from the reading to the writing

@@ -83,7 +83,7 @@ ExitCode runUnset(const Options& options) {
 void addSetCommand(CLI::App& app, ExitCode& outcome) {
   const auto options = std::make_shared<Options>();
   CLI::App* const command = app.add_subcommand("set", "Set a property of an account");
-  command->add_option("ID", options->identifier, "The account, or child account")->required();
+  addIdentifier(*command, "ID", options->identifier, "The account, or child account");
   command
       ->add_option("KEY", options->key,
                    "KEY for a string, or KEY:KIND, where KIND is string, integer, real, boolean, "
@@ -103,7 +103,7 @@ void addSetCommand(CLI::App& app, ExitCode& outcome) {
 void addUnsetCommand(CLI::App& app, ExitCode& outcome) {
   const auto options = std::make_shared<Options>();
   CLI::App* const command = app.add_subcommand("unset", "Remove a property of an account");
-  command->add_option("ID", options->identifier, "The account, or child account")->required();
+  addIdentifier(*command, "ID", options->identifier, "The account, or child account");
   command->add_option("KEY", options->key, "The property; one that is not there is no failure")
       ->required();
   addChangeOptions(*command, *options);

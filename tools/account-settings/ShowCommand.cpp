@@ -109,7 +109,7 @@ void addShowCommand(CLI::App& app, ExitCode& outcome) {
   const auto options = std::make_shared<Options>();
   CLI::App* const command = app.add_subcommand(
       "show", "Show one account: its properties, its dataclasses, its parent and children");
-  command->add_option("ID", options->identifier, "The account, or child account")->required();
+  addIdentifier(*command, "ID", options->identifier, "The account, or child account");
   addLookOptions(*command, *options);
   command->footer(
       "SUPPORTED is what the account's type can do, PROVISIONED what the service and the\n"

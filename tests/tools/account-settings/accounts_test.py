@@ -104,6 +104,11 @@ class Insert(FileTest):
             ("unknown type", [LDAP, dict(LDAP, Type="Nope")], 'Accounts[1] (L1): Type: "Nope" is unknown'),
             ("no class", [{"Type": "LDAP"}], "Accounts[0]: Class"),
             ("unknown mail class", [{"Type": "Mail", "Class": "Toad"}], "mail engine"),
+            ("nothing", [], "holds no account"),
+            ("an empty identifier", dict(LDAP, Identifier=""), '"Identifier" is empty or no string'),
+            ("an identifier that is a number", dict(LDAP, Identifier=7), '"Identifier" is empty or no string'),
+            ("another name for the device", dict(LOCAL, Identifier="other"), '"DeviceLocalAccount" and no other'),
+            ("the device as a child", dict(LDAP, ChildAccounts=[LOCAL]), "is nobody's child"),
             ("a number", [LDAP, 7], "Accounts[1]"),
             ("no account", "text", "neither"),
             ("a settings file", {"Accounts": [LDAP]}, "whole settings file"),
@@ -149,12 +154,23 @@ class Children(FileTest):
             ("Q1", dict(SMTP, Type="Nope"), '"Nope" is unknown'),
             ("Q1", [SMTP, LDAP], "more than one"),
             ("Q1", [7], "no dictionary"),
+            ("Q1", [], "holds no account"),
+            ("Q1", dict(SMTP, Identifier=7), '"Identifier" is empty or no string'),
+            ("Q1", dict(SMTP, Identifier=""), '"Identifier" is empty or no string'),
+            ("Q1", LOCAL, "is nobody's child"),
             ("nobody", SMTP, "there is no account"),
         ]
         for parent, value, text in cases:
             with self.subTest(text):
                 self.assertIn(text, self.fail_with(7, "add-child", parent, self.file(value)))
                 self.assertEqual(self.state(), before)
+
+    def test_are_refused_by_a_parent_whose_children_are_no_array(self):
+        self.write({"Version": 12, "Accounts": [dict(MAIL, ChildAccounts={"kept": 1})]})
+        before = self.state()
+        said = self.fail_with(7, "add-child", "M1", self.file(SMTP))
+        self.assertIn('"M1" has "ChildAccounts" that are no array', said)
+        self.assertEqual(self.state(), before)
 
     def test_are_removed_from_their_parent(self):
         self.assertEqual(self.succeed("remove-child", "Q1C"), "")
@@ -169,6 +185,18 @@ class Delete(SettingsTest):
         self.assertEqual(self.settings(), {"Version": 12, "Accounts": [MAIL]})
         self.succeed("delete", "M1")
         self.assertEqual(self.settings(), {"Version": 12, "Accounts": []})
+
+    def test_of_no_identifier_is_wrong_usage(self):
+        self.write({"Version": 12, "Accounts": [LDAP, {"Type": "SMTP", "Class": "SMTPAccount"}]})
+        before = self.state()
+        commands = [
+            ("delete", ""), ("remove-child", ""), ("show", ""), ("set", "", "A", "b"), ("unset", "", "A"),
+            ("enable", "", "mail"), ("disable", "", "mail"), ("add-child", "", "/dev/null"),
+        ]  # fmt: skip
+        for command in commands:
+            with self.subTest(command[0]):
+                self.assertIn("an identifier is not empty", self.fail_with(2, *command))
+        self.assertEqual(self.state(), before)
 
     def test_of_a_child_is_refused(self):
         self.assertIn("account-settings remove-child", self.fail_with(7, "delete", "Q1C"))

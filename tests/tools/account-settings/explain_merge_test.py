@@ -45,6 +45,19 @@ class ExplainMerge(SettingsTest):
             for line in json.loads(ended.stdout)["lines"]
         }
 
+    def test_refuses_an_account_without_identifier(self):
+        for name, nameless in [("none", {"Type": "LDAP", "Class": "C"}), ("a number", dict(BASE, Identifier=7))]:
+            with self.subTest(name):
+                ended = self.explain([BASE], [BASE], [BASE, nameless])
+                self.assertEqual((ended.returncode, ended.stdout), (6, b""))
+                self.assertIn(b"on-disk: Accounts[1]: Identifier: is missing or no string", ended.stderr)
+
+    def test_passes_unknown_keys_beside_the_accounts_over(self):
+        path = self.directory / "settings"
+        path.write_bytes(plistlib.dumps({"Version": 12, "Other": 1, "Accounts": [BASE]}))
+        ended = run("explain-merge", "--in-memory", path, "--original", path, "--on-disk", path)
+        self.assertEqual((ended.returncode, ended.stderr), (0, b""))
+
     def test_tells_for_each_key_which_side_won_and_why(self):
         cases = {
             # key: (in memory, original, on disk), (winner, why, value)

@@ -123,6 +123,7 @@ class EveryChange(SettingsTest):
         cases = [
             ("rubbish", b"bplist00 and rubbish"),
             ("no dictionary", plistlib.dumps("x")),
+            ("an unknown key at the top", plistlib.dumps({"Version": 12, "Accounts": [MAIL], "Other": 1})),
             ("no array", plistlib.dumps({"Accounts": {"a": MAIL}})),
             ("a stray entry", plistlib.dumps({"Accounts": [MAIL, 7]})),
             ("an unknown type", plistlib.dumps({"Accounts": [MAIL, {"Type": "Nope", "Class": "C"}]})),
@@ -149,6 +150,11 @@ class EveryChange(SettingsTest):
             self.succeed("set", "M1", "A", "b", "--dry-run")
             self.succeed("set", "M1", "A", "b", "--no-lock")
         self.assertEqual(self.account("M1")["A"], "b")
+
+    def test_takes_only_numbers_as_time_to_wait(self):
+        for text in ("nan", "inf", "-1", "long"):
+            with self.subTest(text):
+                self.fail_with(2, "set", "M1", "A", "b", f"--wait={text}")
 
     def test_says_that_the_save_failed_and_why(self):
         before = self.settings_file.read_bytes()
