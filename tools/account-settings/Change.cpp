@@ -7,6 +7,7 @@
 
 #include <algorithm>
 #include <chrono>
+#include <cstdio>
 #include <cstdlib>
 #include <exception>
 #include <nlohmann/json.hpp>
@@ -22,6 +23,7 @@
 #include "tools/account-settings/Shown.h"
 #include "tools/common/Images.h"
 #include "tools/common/Installation.h"
+#include "tools/common/Program.h"
 
 namespace tools {
 namespace {
@@ -111,71 +113,117 @@ std::optional<std::string> failureLine(const AccountStore& store) {
                   store.image().absolutePath(DeviceImage::kUsersFile)));
 }
 
-[[noreturn]] void failRaised(const AccountStore& store, bool saved, const std::string& what) {
-  throw CommandFailure(
-      ExitCode::unexpectedFailure,
-      fmt::format("{}: the accounts were {}: {}; the account services are listed in "
-                  "{}/AccountCreators.plist; install what it names into the image, or leave "
-                  "--notify out",
-                  store.image().settingsFile(),
-                  saved ? "saved, but not every notifier was told" : "not saved", what,
-                  installedAccountResources()));
-}
-
-void save(AccountStore& store, bool notify) {
-  const FileIdentity before = settingsFileIdentity(store.image());
-  const auto isSaved = [&] { return settingsFileIdentity(store.image()) != before; };
-  store.startLogging();
-  ASSAccountsManager::_setShouldSkipNotifications(!notify);
+// What a notifier, or the library on its way to one, raised.
+std::optional<std::string> raisedBySaving(AccountStore& store) {
   try {
     store.manager().saveAllAccounts();
   } catch (const platform::InternalConsistencyFailure& failure) {
-    failRaised(
-        store, isSaved(),
-        fmt::format("{} ({}, line {})", failure.what(), failure.sourceFile(), failure.line()));
+    return fmt::format("{} ({}, line {})", failure.what(), failure.sourceFile(), failure.line());
   } catch (const std::exception& failure) {  // of a notifier's own
-    failRaised(store, isSaved(), failure.what());
+    return failure.what();
   }
-  if (const auto line = failureLine(store)) failUnsaved(store, *line);
-  if (!isSaved()) failUnsaved(store, "The library said nothing.");
+  return std::nullopt;
 }
 
-void report(const AccountStore& store, const std::vector<Difference>& differences,
-            const ChangeOptions& options) {
-  const bool saved = !differences.empty() && !options.dryRun;
+// Returns what there is to say of a save that succeeded when a notifier was not told; ends the
+// command when nothing was saved.
+std::optional<CommandFailure> save(AccountStore& store, bool notify) {
+  const FileIdentity before = settingsFileIdentity(store.image());
+  store.startLogging();
+  ASSAccountsManager::_setShouldSkipNotifications(!notify);
+  const std::optional<std::string> raised = raisedBySaving(store);
+  const bool isSaved = settingsFileIdentity(store.image()) != before;
+  if (raised) {
+    CommandFailure failure(
+        ExitCode::unexpectedFailure,
+        fmt::format("{}: the accounts were {}: {}; the account services are listed in "
+                    "{}/AccountCreators.plist; install what it names into the image, or leave "
+                    "--notify out",
+                    store.image().settingsFile(),
+                    isSaved ? "saved, but not every notifier was told" : "not saved", *raised,
+                    installedAccountResources()));
+    if (!isSaved) throw failure;
+    return failure;
+  }
+  if (const auto line = failureLine(store)) failUnsaved(store, *line);
+  if (!isSaved) failUnsaved(store, "The library said nothing.");
+  return std::nullopt;
+}
+
+// What became of a change.
+struct Result {
+  std::vector<Difference> differences;
+  bool saved = false;
+  std::optional<CommandFailure> untold;  // why a notifier was not told of what was saved
+};
+
+std::string reportText(const AccountStore& store, const Result& result,
+                       const ChangeOptions& options) {
+  std::string text;
   if (options.json) {
     nlohmann::ordered_json json;
     json["image"] = store.image().rootPath();
     json["dry_run"] = options.dryRun;
-    json["saved"] = saved;
-    json["notified"] = saved && options.notify;
+    json["saved"] = result.saved;
+    json["notified"] = result.saved && options.notify && !result.untold;
     json["changes"] = nlohmann::ordered_json::array();
-    for (const Difference& difference : differences) json["changes"].push_back(jsonOf(difference));
-    printJson(json);
+    for (const Difference& difference : result.differences)
+      json["changes"].push_back(jsonOf(difference));
+    text = jsonText(json);
   } else if (options.dryRun) {
-    for (const Difference& difference : differences) fmt::print("{}\n", describe(difference));
-    if (differences.empty()) fmt::print("nothing would change\n");
+    for (const Difference& difference : result.differences) text += describe(difference) + '\n';
+    if (result.differences.empty()) text = "nothing would change\n";
   } else {
-    for (const Difference& difference : differences)
-      if (difference.kind == Difference::Kind::added) fmt::print("{}\n", difference.account);
+    for (const Difference& difference : result.differences)
+      if (difference.kind == Difference::Kind::added) text += difference.account + '\n';
   }
+  return text;
+}
+
+void report(const AccountStore& store, const Result& result, const ChangeOptions& options) {
+  const std::string text = reportText(store, result, options);
+  if (text.empty()) return;  // fwrite takes no null pointer
+  if (std::fwrite(text.data(), 1, text.size(), stdout) == text.size() && std::fflush(stdout) == 0)
+    return;
+  if (result.untold) printMessage(result.untold->what());
+  throw CommandFailure(
+      ExitCode::unexpectedFailure,
+      fmt::format("cannot write standard output, and what was printed is incomplete; {}",
+                  result.saved ? fmt::format("the accounts were saved; account-settings list "
+                                             "--image {} shows them",
+                                             store.image().rootPath())
+                               : "nothing was changed"));
+}
+
+// The edit in memory, and the save.
+Result change(AccountStore& store, const ChangeOptions& options, const Edit& edit) {
+  Result result;
+  const auto before = store.snapshot();
+  edit(store);
+  result.differences = differencesBetween(before, store.snapshot());
+  if (result.differences.empty() || options.dryRun) return result;
+  result.untold = save(store, options.notify);
+  result.saved = true;
+  return result;
 }
 
 }  // namespace
 
-ExitCode changeAccounts(const ChangeOptions& options,
-                        const std::function<void(AccountStore&)>& edit) {
+ExitCode changeAccounts(const ChangeOptions& options, const Edit& edit, const TakeBack& takeBack) {
   ImagePtr image = openImage(options.image);
   if (options.notify) requireTrustedServices(*image);
   const std::unique_ptr<ImageLock> lock = takeLock(*image, options);
   useTemporaryDirectory(*image);
   AccountStore store(std::move(image));
   refuseLossySave(store);
-  const auto before = store.snapshot();
-  edit(store);
-  const std::vector<Difference> differences = differencesBetween(before, store.snapshot());
-  if (!differences.empty() && !options.dryRun) save(store, options.notify);
-  report(store, differences, options);
+  Result result;
+  try {
+    result = change(store, options, edit);
+  } catch (const CommandFailure& failure) {
+    throw CommandFailure(failure.code(), failure.what() + (takeBack ? takeBack() : std::string()));
+  }
+  report(store, result, options);
+  if (result.untold) throw CommandFailure(*result.untold);
   return ExitCode::done;
 }
 

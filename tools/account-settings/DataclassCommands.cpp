@@ -42,7 +42,6 @@ bool isStoredAsEnabled(const ASSBasicAccount& account, const std::string& datacl
 // off, which a dry run leaves alone.
 void toggle(AccountStore& store, ASSBasicAccount& account, const std::string& dataclass,
             bool enabled, bool dryRun) {
-  if (isStoredAsEnabled(account, dataclass) == enabled) return;
   if (dryRun && dynamic_cast<ASSDeviceLocalAccount*>(&account) != nullptr)
     account.ASSBasicAccount::setEnabledForDataclass(enabled, dataclass);
   else
@@ -55,6 +54,47 @@ void toggle(AccountStore& store, ASSBasicAccount& account, const std::string& da
                   store.logLines().empty() ? "the library said nothing" : store.logLines().back(),
                   store.image().rootPath()));
 }
+
+// Turns dataclasses on or off, and back again. For the account of the device itself that reaches
+// the device at once, before the accounts are saved.
+class Toggling {
+ public:
+  Toggling(bool enabled, bool dryRun) : _enabled(enabled), _dryRun(dryRun) {}
+
+  void toggleAll(AccountStore& store, const FoundAccount& found, const StringList& dataclasses) {
+    _account = found.account;
+    for (const std::string& dataclass : dataclasses) {
+      if (isStoredAsEnabled(*_account, dataclass) == _enabled) continue;
+      toggle(store, *_account, dataclass, _enabled, _dryRun);
+      _toggled.push_back(dataclass);
+    }
+  }
+
+  // What to add to the message of a failure; nothing when the device was not reached.
+  std::string takeBack() const {
+    if (_toggled.empty() || _dryRun || !std::dynamic_pointer_cast<ASSDeviceLocalAccount>(_account))
+      return {};
+    StringList left;
+    for (const std::string& dataclass : _toggled) {
+      _account->setEnabledForDataclass(!_enabled, dataclass);
+      if (isStoredAsEnabled(*_account, dataclass) == _enabled)
+        left.push_back(shownDataclass(dataclass));
+    }
+    if (left.empty())
+      return fmt::format("; on the device {} turned {} again",
+                         fmt::join(shownDataclasses(_toggled), ", "), _enabled ? "off" : "on");
+    return fmt::format(
+        "; on the device {} could not be turned {} again, unlike in the settings "
+        "file: repeat the command, or its opposite, when the cause is mended",
+        fmt::join(left, ", "), _enabled ? "off" : "on");
+  }
+
+ private:
+  bool _enabled;
+  bool _dryRun;
+  accountsettings::AccountPtr _account;
+  StringList _toggled;
+};
 
 // Why a list that was changed does not take effect.
 void warnOfNoEffect(const ASSBasicAccount& account, const StringList& dataclasses, bool enabled) {
@@ -78,14 +118,15 @@ ExitCode run(const Options& options, bool enabled) {
   StringList dataclasses;
   for (const std::string& name : options.dataclasses)
     dataclasses.push_back(dataclassIdentifierOf(name));
-  return changeAccounts(options, [&](AccountStore& store) {
+  Toggling toggling(enabled, options.dryRun);
+  const auto edit = [&](AccountStore& store) {
     const FoundAccount found = store.find(options.identifier);
     for (const std::string& dataclass : dataclasses) requireSupport(*found.account, dataclass);
-    for (const std::string& dataclass : dataclasses)
-      toggle(store, *found.account, dataclass, enabled, options.dryRun);
+    toggling.toggleAll(store, found, dataclasses);
     store.update(found);
     warnOfNoEffect(*found.account, dataclasses, enabled);
-  });
+  };
+  return changeAccounts(options, edit, [&] { return toggling.takeBack(); });
 }
 
 void addCommand(CLI::App& app, ExitCode& outcome, bool enabled) {

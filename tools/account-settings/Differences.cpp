@@ -14,7 +14,10 @@ using propertylist::Value;
 
 namespace {
 
-using AccountsByID = std::map<std::string, Dictionary>;
+struct Accounts {
+  std::vector<std::string> order;  // of the identifiers, as in the file
+  std::map<std::string, Dictionary> byIdentifier;
+};
 
 std::optional<Value> valueOf(const Dictionary& properties, std::string_view key) {
   const Value* const value = properties.find(key);
@@ -31,29 +34,35 @@ std::vector<Dictionary> childrenOf(const Dictionary& properties) {
   return children;
 }
 
-AccountsByID byIdentifier(const std::vector<Dictionary>& accounts) {
-  AccountsByID result;
-  for (const Dictionary& account : accounts) {
-    const std::string* const identifier =
+Accounts accountsOf(const std::vector<Dictionary>& dictionaries) {
+  Accounts accounts;
+  for (const Dictionary& account : dictionaries) {
+    const std::string* const stored =
         propertylist::findString(account, accountsettings::kAccountIdentifier);
-    result[identifier != nullptr ? *identifier : std::string()] = account;
+    const std::string identifier = stored != nullptr ? *stored : std::string();
+    if (accounts.byIdentifier.insert_or_assign(identifier, account).second)
+      accounts.order.push_back(identifier);
   }
-  return result;
+  return accounts;
 }
 
 class Comparison {
  public:
   std::vector<Difference> differences;
 
-  void compareAccounts(const AccountsByID& before, const AccountsByID& after,
-                       const std::string& parent) {
-    for (const auto& [identifier, properties] : before)
-      if (!after.contains(identifier))
-        differences.push_back(
-            {Difference::Kind::deleted, identifier, parent, {}, properties, std::nullopt});
-    for (const auto& [identifier, properties] : after) {
-      const auto old = before.find(identifier);
-      if (old == before.end())
+  void compareAccounts(const Accounts& before, const Accounts& after, const std::string& parent) {
+    for (const std::string& identifier : before.order)
+      if (!after.byIdentifier.contains(identifier))
+        differences.push_back({Difference::Kind::deleted,
+                               identifier,
+                               parent,
+                               {},
+                               before.byIdentifier.at(identifier),
+                               std::nullopt});
+    for (const std::string& identifier : after.order) {
+      const Dictionary& properties = after.byIdentifier.at(identifier);
+      const auto old = before.byIdentifier.find(identifier);
+      if (old == before.byIdentifier.end())
         differences.push_back(
             {Difference::Kind::added, identifier, parent, {}, std::nullopt, properties});
       else
@@ -72,8 +81,7 @@ class Comparison {
       const auto now = valueOf(after, entry.key());
       if (old == now) continue;
       if (entry.key() == accountsettings::kAccountChildAccounts)
-        compareAccounts(byIdentifier(childrenOf(before)), byIdentifier(childrenOf(after)),
-                        identifier);
+        compareAccounts(accountsOf(childrenOf(before)), accountsOf(childrenOf(after)), identifier);
       else
         differences.push_back(
             {Difference::Kind::modified, identifier, parent, entry.key(), old, now});
@@ -103,7 +111,7 @@ std::string quoted(const Value& value) {
 std::vector<Difference> differencesBetween(const std::vector<Dictionary>& before,
                                            const std::vector<Dictionary>& after) {
   Comparison comparison;
-  comparison.compareAccounts(byIdentifier(before), byIdentifier(after), {});
+  comparison.compareAccounts(accountsOf(before), accountsOf(after), {});
   return std::move(comparison.differences);
 }
 

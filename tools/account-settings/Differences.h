@@ -21,7 +21,8 @@ struct Difference {
 };
 
 // What differs between two states of the top-level accounts, children included. Accounts are
-// matched by their identifiers; their order does not count.
+// matched by their identifiers; their order does not
+// count, but the differences are in that of the accounts, deleted ones first.
 std::vector<Difference> differencesBetween(const std::vector<propertylist::Dictionary>& before,
                                            const std::vector<propertylist::Dictionary>& after);
 

@@ -58,9 +58,11 @@ std::string shownValue(const Value& value) {
   return text.substr(0, end) + "...";
 }
 
-void printJson(const ordered_json& json) {
-  fmt::print("{}\n", json.dump(2, ' ', false, ordered_json::error_handler_t::replace));
+std::string jsonText(const ordered_json& json) {
+  return json.dump(2, ' ', false, ordered_json::error_handler_t::replace) + '\n';
 }
+
+void printJson(const ordered_json& json) { fmt::print("{}", jsonText(json)); }
 
 void warnOfUnusableEntries(AccountStore& store) {
   const Value* const accounts = store.root().find("Accounts");

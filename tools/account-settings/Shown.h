@@ -28,6 +28,7 @@ std::string kindName(const propertylist::Value& value);
 std::string shownValue(const propertylist::Value& value);
 
 // Indented, with a line end.
+std::string jsonText(const nlohmann::ordered_json& json);
 void printJson(const nlohmann::ordered_json& json);
 
 // Says on standard error how many entries of the settings file are no accounts to the library, and

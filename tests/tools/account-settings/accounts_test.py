@@ -2,9 +2,10 @@
 
 import json
 import plistlib
+import subprocess
 import unittest
 
-from settingstest import DATACLASS, MAIL, QUILLNET, SettingsTest
+from settingstest import DATACLASS, DEVICE_IMAGE, MAIL, QUILLNET, TOOL, SettingsTest, run
 
 LOCAL = {"Identifier": "DeviceLocalAccount", "Type": "OnMyDevice", "Class": "ASSDeviceLocalAccount"}
 LDAP = {"Identifier": "L1", "Type": "LDAP", "Class": "LDAPAccount"}
@@ -65,6 +66,25 @@ class Dataclasses(SettingsTest):
         self.assertEqual(self.account("DeviceLocalAccount")["Enabled Dataclasses"], [])
 
 
+    def test_of_the_device_itself_are_as_before_when_the_save_fails(self):
+        self.write({"Version": 12, "Accounts": [LOCAL]})
+        self.succeed("enable", "DeviceLocalAccount", "contacts")
+        self.succeed("disable", "DeviceLocalAccount", "contacts")
+        before = self.records()
+        users = (self.image / "etc/passwd").read_text()
+        (self.image / "etc/passwd").write_text("nobody:x:1:1::/:/bin/sh\n")
+        said = self.fail_with(1, "enable", "DeviceLocalAccount", "contacts", "calendars")
+        self.assertIn("the accounts were not saved", said)
+        self.assertIn("on the device contacts, calendars turned off again", said)
+        (self.image / "etc/passwd").write_text(users)
+        self.assertEqual(self.account("DeviceLocalAccount")["Enabled Dataclasses"], [])
+        self.assertEqual(self.records(), before)
+
+    def records(self):
+        """What the device's stores hold."""
+        return run("show", self.image, tool=DEVICE_IMAGE).stdout
+
+
 class FileTest(SettingsTest):
     """Tests of commands that read a file with accounts."""
 
@@ -89,6 +109,23 @@ class Insert(FileTest):
         printed = self.succeed("insert", self.file({"Type": "LDAP", "Class": "LDAPAccount"})).strip()
         self.assertRegex(printed, r"^[0-9A-F]{8}(-[0-9A-F]{4}){3}-[0-9A-F]{12}$")
         self.assertEqual(self.settings()["Accounts"][2]["Identifier"], printed)
+
+    def test_prints_the_identifiers_in_the_order_of_the_file(self):
+        accounts = [dict(LDAP, Identifier=name) for name in ("Z", "A", "M")]
+        self.assertEqual(self.succeed("insert", self.file(accounts)), "Z\nA\nM\n")
+
+    def test_says_that_the_accounts_were_saved_when_their_identifiers_cannot_be_printed(self):
+        for options in ([], ["--json"]):
+            with self.subTest(options), open("/dev/full", "wb") as full:
+                account = dict(LDAP, Identifier="full" + "".join(options))
+                ended = subprocess.run(
+                    [TOOL, "insert", self.file(account), "--image", self.image, *options],
+                    stdout=full, stderr=subprocess.PIPE, check=False, timeout=100,
+                )  # fmt: skip
+                self.assertEqual(ended.returncode, 1)
+                self.assertIn(b"cannot write standard output", ended.stderr)
+                self.assertIn(b"the accounts were saved", ended.stderr)
+                self.assertEqual(self.account(account["Identifier"]), account)
 
     def test_takes_the_account_of_the_device_itself(self):
         self.assertEqual(self.succeed("insert", self.file(LOCAL)), "DeviceLocalAccount\n")

@@ -125,6 +125,10 @@ class Notify(SettingsTest):
         self.assertIn("leave --notify out", said)
         self.assertEqual(self.account("M1"), dict(MAIL, A="b"))
         self.succeed("set", "M1", "A", "c")
+        file = self.directory / "account.json"
+        file.write_text(json.dumps(dict(MAIL, Identifier="M2")))
+        ended = self.run_on_image("insert", file, "--notify")
+        self.assertEqual((ended.returncode, ended.stdout), (1, b"M2\n"))
 
     def test_says_which_resource_of_the_installation_is_broken(self):
         tool = self.installation_with({"Mail": [{"Type": "NotifierAccount", "Description": {
