@@ -24,6 +24,7 @@
 #include "tools/common/Images.h"
 #include "tools/common/Installation.h"
 #include "tools/common/Program.h"
+#include "tools/common/Text.h"
 
 namespace tools {
 namespace {
@@ -171,11 +172,13 @@ std::string reportText(const AccountStore& store, const Result& result,
       json["changes"].push_back(jsonOf(difference));
     text = jsonText(json);
   } else if (options.dryRun) {
-    for (const Difference& difference : result.differences) text += describe(difference) + '\n';
+    for (const Difference& difference : result.differences)
+      text += forTerminal(describe(difference)) + '\n';
     if (result.differences.empty()) text = "nothing would change\n";
   } else {
     for (const Difference& difference : result.differences)
-      if (difference.kind == Difference::Kind::added) text += difference.account + '\n';
+      if (difference.kind == Difference::Kind::added)
+        text += forTerminal(difference.account) + '\n';
   }
   return text;
 }

@@ -57,7 +57,7 @@ std::string readWholeFile(const std::string& path, std::size_t limit) {
   if (file.number() < 0) refuse(path, reason(errno) + " (check its name and its rights)");
   struct stat status {};
   if (::fstat(file.number(), &status) != 0) refuse(path, reason(errno));
-  if (!S_ISREG(status.st_mode)) refuse(path, "it is no regular file");
+  if (!S_ISREG(status.st_mode)) refuse(path, "it is no regular file; give a file");
   std::string bytes;
   const std::size_t expected = static_cast<std::size_t>(status.st_size);
   for (;;) {

@@ -7,6 +7,8 @@
 #include <exception>
 #include <string>
 
+#include "tools/common/Text.h"
+
 namespace tools {
 namespace {
 
@@ -45,15 +47,7 @@ int runProgram(CLI::App& app, const ExitCode& outcome, int argumentCount, char**
 }
 
 void printMessage(std::string_view text) {
-  std::string line = programName() + ": ";
-  for (const char c : text) {
-    const auto byte = static_cast<unsigned char>(c);
-    if (byte < 0x20 || byte == 0x7F)
-      line += fmt::format("\\x{:02x}", byte);
-    else
-      line += c;
-  }
-  line += '\n';
+  const std::string line = programName() + ": " + forTerminal(text) + '\n';
   std::fwrite(line.data(), 1, line.size(), stderr);
 }
 

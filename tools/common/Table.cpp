@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <utility>
 
+#include "tools/common/Text.h"
+
 namespace tools {
 namespace {
 
@@ -16,10 +18,7 @@ std::size_t widthOf(const std::string& text) {
 }  // namespace
 
 void Table::addRow(std::vector<std::string> cells) {
-  for (std::string& cell : cells)
-    std::replace_if(
-        cell.begin(), cell.end(),
-        [](char c) { return static_cast<unsigned char>(c) < 0x20 || c == 0x7F; }, '?');
+  for (std::string& cell : cells) cell = forTerminal(cell);
   _rows.push_back(std::move(cells));
 }
 

@@ -9,7 +9,7 @@ namespace tools {
 class Table {
  public:
   explicit Table(std::vector<std::string> heading) { addRow(std::move(heading)); }
-  // As many cells as the heading has. Control characters are shown as "?".
+  // As many cells as the heading has. Control characters are escaped (Text.h).
   void addRow(std::vector<std::string> cells);
   std::string text() const;
 

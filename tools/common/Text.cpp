@@ -1,5 +1,7 @@
 #include "tools/common/Text.h"
 
+#include <fmt/format.h>
+
 #include <algorithm>
 #include <cstdint>
 
@@ -26,6 +28,20 @@ std::size_t sequenceLength(std::string_view bytes) {
   return length;
 }
 
+// One UTF-8 sequence, or a byte that is none.
+std::string shownCharacter(std::string_view bytes) {
+  const auto first = static_cast<std::uint8_t>(bytes[0]);
+  if (bytes.size() == 1)
+    return first >= 0x20 && first < 0x7F ? std::string(bytes) : fmt::format("\\x{:02x}", first);
+  const bool isControl = first == 0xC2 && static_cast<std::uint8_t>(bytes[1]) < 0xA0;
+  const bool turnsDirection =
+      (bytes >= "\u202A" && bytes <= "\u202E") || (bytes >= "\u2066" && bytes <= "\u2069");
+  if (isControl) return fmt::format("\\u{:04x}", static_cast<std::uint8_t>(bytes[1]));
+  if (!turnsDirection) return std::string(bytes);
+  const unsigned low = (static_cast<std::uint8_t>(bytes[1]) & 0x3FU) << 6U;
+  return fmt::format("\\u{:04x}", 0x2000U | low | (static_cast<std::uint8_t>(bytes[2]) & 0x3FU));
+}
+
 }  // namespace
 
 bool isText(std::string_view bytes) {
@@ -35,6 +51,16 @@ bool isText(std::string_view bytes) {
     bytes.remove_prefix(length);
   }
   return true;
+}
+
+std::string forTerminal(std::string_view text) {
+  std::string shown;
+  while (!text.empty()) {
+    const std::size_t length = std::max<std::size_t>(sequenceLength(text), 1);
+    shown += shownCharacter(text.substr(0, length));
+    text.remove_prefix(length);
+  }
+  return shown;
 }
 
 std::string_view trimmed(std::string_view text) {

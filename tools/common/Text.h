@@ -9,6 +9,11 @@ namespace tools {
 // which no text holds.
 bool isText(std::string_view bytes);
 
+// The text as a terminal may have it, on one line: control characters (those from U+0080 on too),
+// bytes that are no UTF-8, and characters that turn the direction of writing around, are escaped as
+// "\x1b" and "\u202e".
+std::string forTerminal(std::string_view text);
+
 // Without blanks, tabs and line ends on both sides.
 std::string_view trimmed(std::string_view text);
 

@@ -114,6 +114,16 @@ class EveryChange(SettingsTest):
         self.assertEqual((answer["dry_run"], answer["saved"]), (True, False))
         self.assertEqual(self.state(), before)
 
+    def test_shows_no_control_characters_and_no_turned_writing(self):
+        bad = "a\x1b[31m\x9b\u202eb\u2066\u00fc"
+        shown = "a\\x1b[31m\\u009b\\u202eb\\u2066\u00fc"
+        self.assertIn(f'"{shown}" added', self.succeed("set", "M1", "Nick", bad, "--dry-run"))
+        self.assertIn(shown, self.fail_with(7, "delete", bad))
+        self.succeed("set", "M1", "DisplayName", bad)
+        self.assertIn(shown, self.succeed("list"))
+        self.write({"Version": 12, "Accounts": [dict(MAIL, Identifier=bad)]})
+        self.assertIn(shown, self.succeed("delete", bad, "--dry-run"))
+
     def test_keeps_the_file_private(self):
         self.succeed("set", "M1", "A", "b")
         self.assertEqual(stat.S_IMODE(self.settings_file.stat().st_mode), 0o600)
