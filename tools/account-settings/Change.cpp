@@ -162,12 +162,12 @@ std::string reportText(const AccountStore& store, const Result& result,
                        const ChangeOptions& options) {
   std::string text;
   if (options.json) {
-    nlohmann::ordered_json json;
+    nlohmann::json json;
     json["image"] = store.image().rootPath();
     json["dry_run"] = options.dryRun;
     json["saved"] = result.saved;
     json["notified"] = result.saved && options.notify && !result.untold;
-    json["changes"] = nlohmann::ordered_json::array();
+    json["changes"] = nlohmann::json::array();
     for (const Difference& difference : result.differences)
       json["changes"].push_back(jsonOf(difference));
     text = jsonText(json);

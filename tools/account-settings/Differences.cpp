@@ -137,8 +137,8 @@ std::string describe(const Difference& difference) {
                      quoted(*difference.after));
 }
 
-nlohmann::ordered_json jsonOf(const Difference& difference) {
-  nlohmann::ordered_json json;
+nlohmann::json jsonOf(const Difference& difference) {
+  nlohmann::json json;
   json["account"] = difference.account;
   json["parent"] = orNull(difference.parent);
   json["change"] = nameOf(difference.kind);

@@ -28,6 +28,6 @@ std::vector<Difference> differencesBetween(const std::vector<propertylist::Dicti
 
 // One line without a line end: "Q1: Port: 993 -> 995".
 std::string describe(const Difference& difference);
-nlohmann::ordered_json jsonOf(const Difference& difference);
+nlohmann::json jsonOf(const Difference& difference);
 
 }  // namespace tools

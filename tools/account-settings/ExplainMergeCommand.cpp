@@ -13,7 +13,6 @@
 namespace tools {
 namespace {
 
-using nlohmann::ordered_json;
 using propertylist::Dictionary;
 
 struct Options {
@@ -65,15 +64,15 @@ Dictionary settingsIn(const std::string& file) {
 }
 
 void showAsJson(const std::vector<MergeLine>& lines) {
-  ordered_json json;
-  json["lines"] = ordered_json::array();
+  nlohmann::json json;
+  json["lines"] = nlohmann::json::array();
   for (const MergeLine& line : lines) {
-    ordered_json entry;
+    nlohmann::json entry;
     entry["account"] = line.account;
     entry["key"] = orNull(line.key);
     entry["winner"] = nameOf(line.winner);
     entry["why"] = line.why;
-    entry["value"] = line.value ? jsonFormOf(*line.value) : ordered_json();
+    entry["value"] = line.value ? jsonFormOf(*line.value) : nlohmann::json();
     json["lines"].push_back(std::move(entry));
   }
   printJson(json);

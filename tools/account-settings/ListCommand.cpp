@@ -15,10 +15,9 @@ namespace {
 
 using accountsettings::AccountPtr;
 using accountsettings::ASSBasicAccount;
-using nlohmann::ordered_json;
 
-ordered_json jsonOf(const ASSBasicAccount& account) {
-  ordered_json json;
+nlohmann::json jsonOf(const ASSBasicAccount& account) {
+  nlohmann::json json;
   json["identifier"] = orNull(storedIdentifier(account));
   json["type"] = account.type().value_or("");
   json["class"] = account.accountClass().value_or("");
@@ -28,10 +27,10 @@ ordered_json jsonOf(const ASSBasicAccount& account) {
 }
 
 void showAsJson(AccountStore& store) {
-  ordered_json accounts = ordered_json::array();
+  nlohmann::json accounts = nlohmann::json::array();
   for (const AccountPtr& account : *store.manager().allBasicAccounts()) {
-    ordered_json json = jsonOf(*account);
-    json["children"] = ordered_json::array();
+    nlohmann::json json = jsonOf(*account);
+    json["children"] = nlohmann::json::array();
     for (const FoundAccount& child : AccountStore::childrenOf(account))
       json["children"].push_back(jsonOf(*child.account));
     accounts.push_back(std::move(json));

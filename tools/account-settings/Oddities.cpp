@@ -135,7 +135,7 @@ class Search {
     else if (type->asString() == nullptr)
       typeProblem = fmt::format("is no string but of the kind {}", kindName(*type));
     else if (!isKnownType(*type->asString()))
-      typeProblem = fmt::format("\"{}\" is unknown", *type->asString());
+      typeProblem = fmt::format("\"{}\" is unknown", shownValue(*type));
     const bool hasClass = !textUnder(properties, accountsettings::kAccountClass).empty();
     if (!typeProblem.empty())
       _add(place, identifier, accountsettings::kAccountType, typeProblem + "; " + then, effect);
@@ -214,8 +214,9 @@ class Search {
 
 std::string describe(const Oddity& oddity) {
   std::string text = oddity.place;
-  if (!oddity.identifier.empty()) text += fmt::format(" ({})", oddity.identifier);
-  for (const std::string& part : {oddity.key, oddity.text})
+  if (!oddity.identifier.empty())
+    text += fmt::format(" ({})", shownValue(Value(oddity.identifier)));
+  for (const std::string& part : {shownValue(Value(oddity.key)), oddity.text})
     if (!part.empty()) text += (text.empty() ? "" : ": ") + part;
   return text;
 }

@@ -14,7 +14,6 @@ namespace tools {
 namespace {
 
 using accountsettings::ASSBasicAccount;
-using nlohmann::ordered_json;
 using propertylist::Dictionary;
 
 struct Options : LookOptions {
@@ -42,13 +41,13 @@ std::vector<std::string> childIdentifiers(const FoundAccount& found) {
 
 void showAsJson(const FoundAccount& found) {
   const ASSBasicAccount& account = *found.account;
-  ordered_json json;
+  nlohmann::json json;
   json["identifier"] = orNull(storedIdentifier(account));
   json["sync_identifier"] = orNull(account.syncStoreIdentifier().value_or(""));
   json["type"] = account.type().value_or("");
   json["class"] = account.accountClass().value_or("");
   json["display_name"] = account.displayName().value_or("");
-  json["parent"] = found.parent ? orNull(storedIdentifier(*found.parent)) : ordered_json();
+  json["parent"] = found.parent ? orNull(storedIdentifier(*found.parent)) : nlohmann::json();
   json["children"] = childIdentifiers(found);
   json["supported_dataclasses"] = shownDataclasses(account.supportedDataclasses());
   json["provisioned_dataclasses"] = shownDataclasses(account.provisionedDataclasses());

@@ -9,7 +9,6 @@
 
 namespace tools {
 
-using nlohmann::ordered_json;
 using propertylist::Value;
 
 std::vector<std::string> shownDataclasses(
@@ -20,11 +19,11 @@ std::vector<std::string> shownDataclasses(
   return names;
 }
 
-ordered_json orNull(const std::string& text) {
-  return text.empty() ? ordered_json() : ordered_json(text);
+nlohmann::json orNull(const std::string& text) {
+  return text.empty() ? nlohmann::json() : nlohmann::json(text);
 }
 
-ordered_json jsonFormOf(const Value& value) { return ordered_json::parse(jsonFormText(value)); }
+nlohmann::json jsonFormOf(const Value& value) { return nlohmann::json::parse(jsonFormText(value)); }
 
 std::string kindName(const Value& value) {
   switch (value.kind()) {
@@ -58,11 +57,11 @@ std::string shownValue(const Value& value) {
   return text.substr(0, end) + "...";
 }
 
-std::string jsonText(const ordered_json& json) {
-  return json.dump(2, ' ', false, ordered_json::error_handler_t::replace) + '\n';
+std::string jsonText(const nlohmann::json& json) {
+  return json.dump(2, ' ', false, nlohmann::json::error_handler_t::replace) + '\n';
 }
 
-void printJson(const ordered_json& json) { fmt::print("{}", jsonText(json)); }
+void printJson(const nlohmann::json& json) { fmt::print("{}", jsonText(json)); }
 
 void warnOfUnusableEntries(AccountStore& store) {
   const Value* const accounts = store.root().find("Accounts");

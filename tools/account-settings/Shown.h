@@ -16,10 +16,10 @@ std::vector<std::string> shownDataclasses(
     const std::optional<accountsettings::StringList>& identifiers);
 
 // The text, or null for an empty one.
-nlohmann::ordered_json orNull(const std::string& text);
+nlohmann::json orNull(const std::string& text);
 
 // The JSON form of the value (JsonForm.h).
-nlohmann::ordered_json jsonFormOf(const propertylist::Value& value);
+nlohmann::json jsonFormOf(const propertylist::Value& value);
 
 // "string", "integer", ...
 std::string kindName(const propertylist::Value& value);
@@ -28,8 +28,8 @@ std::string kindName(const propertylist::Value& value);
 std::string shownValue(const propertylist::Value& value);
 
 // Indented, with a line end.
-std::string jsonText(const nlohmann::ordered_json& json);
-void printJson(const nlohmann::ordered_json& json);
+std::string jsonText(const nlohmann::json& json);
+void printJson(const nlohmann::json& json);
 
 // Says on standard error how many entries of the settings file are no accounts to the library, and
 // so are not shown.

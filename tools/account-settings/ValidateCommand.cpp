@@ -17,7 +17,6 @@ namespace tools {
 namespace {
 
 using deviceimage::DeviceImage;
-using nlohmann::ordered_json;
 
 Oddity oddityOfFile(std::string text, Oddity::Effect effect = Oddity::Effect::none) {
   return {{}, {}, {}, std::move(text), effect};
@@ -59,13 +58,13 @@ const char* nameOf(Oddity::Effect effect) {
 }
 
 void showAsJson(const DeviceImage& image, const std::vector<Oddity>& found) {
-  ordered_json json;
+  nlohmann::json json;
   json["image"] = image.rootPath();
   json["file"] = image.settingsFile();
   json["sound"] = found.empty();
-  json["findings"] = ordered_json::array();
+  json["findings"] = nlohmann::json::array();
   for (const Oddity& oddity : found) {
-    ordered_json finding;
+    nlohmann::json finding;
     finding["place"] = orNull(oddity.place);
     finding["identifier"] = orNull(oddity.identifier);
     finding["key"] = orNull(oddity.key);

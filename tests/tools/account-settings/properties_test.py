@@ -124,6 +124,12 @@ class EveryChange(SettingsTest):
         self.write({"Version": 12, "Accounts": [dict(MAIL, Identifier=bad)]})
         self.assertIn(shown, self.succeed("delete", bad, "--dry-run"))
 
+    def test_cuts_long_texts_of_the_file_in_its_messages(self):
+        long = "x" * 1_000_000
+        for settings in ({"Accounts": [], long: 1}, {"Accounts": [dict(MAIL, Type=long, Identifier=long)]}):
+            self.write(dict(settings, Version=12))
+            self.assertLess(len(self.fail_with(6, "set", "M1", "A", "b")), 2000)
+
     def test_keeps_the_file_private(self):
         self.succeed("set", "M1", "A", "b")
         self.assertEqual(stat.S_IMODE(self.settings_file.stat().st_mode), 0o600)
