@@ -6,7 +6,7 @@ if(NOT GCOVR)
 endif()
 set(filters "")
 foreach(floor IN ITEMS propertylist platform QuillnetAccountTypeRemoval localdata migrator deviceimage
-                       accountservices host tools)
+                       accountservices accountsdatamigrator host tools)
   list(APPEND filters --filter ${floor}/)
 endforeach()
 add_custom_target(

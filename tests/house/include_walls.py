@@ -32,6 +32,15 @@ FLOORS = {
         ],
         ["posix"],
     ),
+    "accountsdatamigrator": (
+        [
+            "propertylist", "platform", "QuillnetAccountTypeRemoval/AccountConstants.h",
+            "QuillnetAccountTypeRemoval/AccountsDataMigrator.h",
+            "QuillnetAccountTypeRemoval/PropertyNumbers.h",
+            "QuillnetAccountTypeRemoval/SettingsFileWriting.h",
+        ],
+        [],
+    ),
     "host": (["propertylist", "platform", "deviceimage"], ["posix", "fmt", "nlohmann"]),
     "tools": (
         [

@@ -30,6 +30,8 @@ IN_LIBRARIES = [
       for version in ("", ".0.1", ".0.1.0")),
     "libaccount_settings.a", "libdeviceimage.a",
     *(f"account-retirement/services/{name}Service.so" for name in ("Calendar", "Contacts", "Device", "Mail")),
+    *(f"account-retirement/services/AccountMigrator.migrator/{name}" for name in (
+        "Info.plist", "AccountMigrator.so", "AccountTypesProperties.plist")),
     *(f"cmake/AccountRetirement/AccountRetirement{name}.cmake"
       for name in ("Config", "ConfigVersion", "Targets", "DeviceImageTargets")),
     *(f"pkgconfig/account-retirement{name}.pc" for name in ("", "-platform", "-deviceimage")),

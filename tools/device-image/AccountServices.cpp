@@ -7,6 +7,7 @@
 #include <array>
 #include <cerrno>
 #include <cstdint>
+#include <map>
 #include <optional>
 #include <set>
 #include <span>
@@ -36,8 +37,21 @@ std::set<std::string> namedServices() {
   return names;
 }
 
-std::string imageFile(std::string_view name) {
-  return fmt::format("{}/{}", DeviceImage::kAccountServicesDirectory, name);
+// The files of the accounts data migrator's bundle.
+constexpr std::array<std::string_view, 3> kMigratorFiles = {"Info.plist", "AccountMigrator.so",
+                                                            "AccountTypesProperties.plist"};
+constexpr std::string_view kMigratorFolder = "AccountMigrator.migrator";
+
+// Where each bundle's files lie in the image, by where they lie among those that are installed.
+std::map<std::string, std::string> placesInImage() {
+  std::map<std::string, std::string> places;
+  for (const std::string& name : namedServices())
+    places.emplace(name, fmt::format("{}/{}", DeviceImage::kAccountServicesDirectory, name));
+  for (const std::string_view name : kMigratorFiles) {
+    const std::string file = fmt::format("{}/{}", kMigratorFolder, name);
+    places.emplace(file, fmt::format("{}/{}", DeviceImage::kMigratorsDirectory, file));
+  }
+  return places;
 }
 
 // Empty when the file cannot be read.
@@ -62,9 +76,9 @@ std::optional<std::string> contentOf(const DeviceImage& image, const std::string
 std::vector<AccountService> installedServices() {
   try {
     std::vector<AccountService> services;
-    for (const std::string& name : namedServices())
-      services.push_back({imageFile(name),
-                          readWholeFile(installedAccountServices() + "/" + name, kLargestBundle)});
+    for (const auto& [name, file] : placesInImage())
+      services.push_back(
+          {file, readWholeFile(installedAccountServices() + "/" + name, kLargestBundle)});
     return services;
   } catch (const CommandFailure& failure) {
     throw CommandFailure(
@@ -89,18 +103,19 @@ ServicesCheck checkServices(const DeviceImage& image) {
   const std::string directory(DeviceImage::kAccountServicesDirectory);
   if (!image.exists(directory)) return check;  // an image without services
   try {
-    for (const std::string& name : namedServices()) {
-      const std::string file = imageFile(name);
+    for (const auto& [name, file] : placesInImage()) {
+      const bool isService = file.starts_with(DeviceImage::kAccountServicesDirectory);
       const std::string installed = installedAccountServices() + "/" + name;
-      if (image.lookAt(file).kind != deviceimage::FileLook::Kind::file)
+      const bool isThere = image.lookAt(file).kind == deviceimage::FileLook::Kind::file;
+      if (!isThere && isService)
         check.missing.push_back(
             {file, fmt::format("is missing, and accounts need this service; copy {} there, with "
                                "mode 0600",
                                installed)});
-      else if (contentOf(image, file) != readWholeFile(installed, kLargestBundle))
+      else if (isThere && contentOf(image, file) != readWholeFile(installed, kLargestBundle))
         check.warnings.push_back(
-            {file, fmt::format("is not the installed service; where it should be, copy {} there",
-                               installed)});
+            {file, fmt::format("is not the installed {}; where it should be, copy {} there",
+                               isService ? "service" : "migrator", installed)});
     }
   } catch (const CommandFailure& failure) {
     check.warnings.push_back(

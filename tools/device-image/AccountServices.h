@@ -8,9 +8,10 @@
 namespace tools {
 
 // The bundles of the account services: those that the installed catalogue of account creators names
-// below the image's System/Library/AccountServices.
+// below the image's System/Library/AccountServices. With them goes the accounts data migrator, a
+// folder among the image's migrators.
 
-// One bundle as it is installed beside the programs.
+// One file of a bundle as it is installed beside the programs.
 struct AccountService {
   std::string file;  // its name in the image
   std::string content;

@@ -11,6 +11,7 @@ from pathlib import Path
 from imagetest import SETTINGS, TOOL, ImageTest, run
 
 SERVICES = "System/Library/AccountServices"
+MIGRATOR = "System/Library/DataClassMigrators/AccountMigrator.migrator"
 
 CARD = "BEGIN:VCARD\r\nVERSION:3.0\r\nUID:ada\r\nFN:Ada\r\nEND:VCARD\r\n"
 
@@ -81,6 +82,22 @@ class Check(ImageTest):
         for path in files:
             self.assertEqual(path.stat().st_mode & 0o7777, 0o600)
             self.assertEqual(path.read_bytes(), (installed / path.name).read_bytes())
+
+    def test_a_new_image_has_private_copies_of_the_accounts_data_migrator(self):
+        files = sorted((self.image / MIGRATOR).iterdir())
+        self.assertEqual([path.name for path in files],
+                         ["AccountMigrator.so", "AccountTypesProperties.plist", "Info.plist"])
+        installed = Path(os.environ["INSTALLED_SERVICES"]) / "AccountMigrator.migrator"
+        for path in files:
+            self.assertEqual(path.stat().st_mode & 0o7777, 0o600)
+            self.assertEqual(path.read_bytes(), (installed / path.name).read_bytes())
+
+    def test_warns_of_another_accounts_data_migrator_than_the_installed_one(self):
+        (self.image / MIGRATOR / "AccountMigrator.so").write_bytes(b"other")
+        self.assertEqual(set(self.warnings()), {f"{MIGRATOR}/AccountMigrator.so"})
+        shutil.rmtree(self.image / MIGRATOR)
+        self.assertEqual(self.warnings(), {})
+        self.assertEqual(self.findings(), {})
 
     def run_alone(self, *arguments) -> subprocess.CompletedProcess:
         """Runs a copy of the tool beside which nothing is installed."""

@@ -1,0 +1,57 @@
+#include "accountsdatamigrator/OlderSettings.h"
+
+#include "QuillnetAccountTypeRemoval/AccountConstants.h"
+#include "QuillnetAccountTypeRemoval/PropertyNumbers.h"
+#include "platform/Services.h"
+
+namespace accountsdatamigrator {
+
+using namespace accountsettings;
+using propertylist::Array;
+using propertylist::Dictionary;
+using propertylist::Value;
+
+namespace {
+
+bool identifyAll(Dictionary& holder, std::string_view key, bool withChildren);
+
+bool identify(Dictionary& account, bool withChildren) {
+  const std::string* const type = propertylist::findString(account, kAccountType);
+  const bool isDevice = type != nullptr && *type == kOnMyDeviceAccountType;
+  if (!isDevice && propertylist::findString(account, kAccountIdentifier) == nullptr) {
+    const std::optional<std::string> made = platform::services().uuidGenerator.generateUUID();
+    if (!made) return false;
+    account.set(kAccountIdentifier, *made);
+  }
+  return !withChildren || identifyAll(account, kAccountChildAccounts, false);
+}
+
+// Every account of the list under `key`; what is no list, and what is no account, stays as it is.
+bool identifyAll(Dictionary& holder, std::string_view key, bool withChildren) {
+  const Array* const list = propertylist::findArray(holder, key);
+  if (list == nullptr) return true;
+  Array accounts = *list;
+  for (std::size_t index = 0; index < accounts.size(); ++index) {
+    if (accounts[index].asDictionary() == nullptr) continue;
+    Dictionary account = *accounts[index].asDictionary();
+    if (!identify(account, withChildren)) return false;
+    accounts.replace(index, std::move(account));
+  }
+  holder.set(key, std::move(accounts));
+  return true;
+}
+
+}  // namespace
+
+bool isOutdated(const Dictionary& root) {
+  const Value* const version = root.find("Version");
+  return version != nullptr && static_cast<std::uint64_t>(integerValue(version)) < kSettingsVersion;
+}
+
+std::optional<Dictionary> broughtUpToDate(Dictionary root) {
+  if (!identifyAll(root, "Accounts", true)) return std::nullopt;
+  root.set("Version", kSettingsVersion);
+  return root;
+}
+
+}  // namespace accountsdatamigrator
