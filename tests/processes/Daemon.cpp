@@ -3,7 +3,7 @@
 //   obeys FILE      ends once the file names the notification
 //   restarts FILE   leaves the work to a new process at that moment
 //   ignores         does nothing but stay, and lets no signal end it that can be kept from it
-//   lasts           does nothing but stay
+//   lasts           does nothing but stay, for a minute at most
 #include <signal.h>
 #include <sys/prctl.h>
 #include <unistd.h>
@@ -33,16 +33,20 @@ bool wasAskedToExit(const char* file) {
 
 int main(int count, char** arguments) {
   if (count < 2) return 2;
+  const std::string behaviour = arguments[1];
+  // Nobody waits for this one, and the daemon that started it may not have ended yet, so that it
+  // must not share its end.
+  if (behaviour == "lasts") {
+    ::alarm(60);
+    for (;;) ::pause();
+  }
   // Not longer than the test, which may be killed.
   ::prctl(PR_SET_PDEATHSIG, SIGKILL);
-  const std::string behaviour = arguments[1];
-  if (behaviour == "lasts") ::pause();
   if (::write(STDOUT_FILENO, ".", 1) != 1) return 1;
   if (behaviour == "ignores") stay();
   if (count < 3) return 2;
   while (!wasAskedToExit(arguments[2])) std::this_thread::sleep_for(std::chrono::milliseconds(10));
   if (behaviour == "restarts" && ::fork() == 0) {
-    ::alarm(60);  // in case that nobody kills it
     ::execl("/proc/self/exe", arguments[0], "lasts", nullptr);
     return 1;
   }

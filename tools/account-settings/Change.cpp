@@ -6,19 +6,16 @@
 #include <unistd.h>
 
 #include <algorithm>
-#include <chrono>
 #include <cstdio>
-#include <cstdlib>
 #include <exception>
 #include <nlohmann/json.hpp>
 #include <optional>
-#include <thread>
-#include <utility>
 
 #include "deviceimage/ImageLock.h"
 #include "platform/InternalConsistencyFailure.h"
 #include "tools/account-settings/BundleTrust.h"
 #include "tools/account-settings/Differences.h"
+#include "tools/account-settings/ImageAccess.h"
 #include "tools/account-settings/Oddities.h"
 #include "tools/account-settings/Shown.h"
 #include "tools/common/Images.h"
@@ -32,35 +29,6 @@ namespace {
 using accountsettings::ASSAccountsManager;
 using deviceimage::DeviceImage;
 using deviceimage::ImageLock;
-
-// Null without --lock.
-std::unique_ptr<ImageLock> takeLock(const DeviceImage& image, const ChangeOptions& options) {
-  using Clock = std::chrono::steady_clock;
-  constexpr auto kPause = std::chrono::milliseconds(20);
-  if (!options.lock || options.dryRun) return nullptr;
-  const auto end = Clock::now() + std::chrono::duration<double>(options.wait);
-  for (;;) {
-    ImageLock::Attempt attempt = ImageLock::tryAcquire(image);
-    if (attempt.outcome == ImageLock::Outcome::held) return std::move(attempt.lock);
-    if (attempt.outcome != ImageLock::Outcome::heldByAnother)
-      throw CommandFailure(ExitCode::refused, attempt.error);
-    if (Clock::now() >= end)
-      throw CommandFailure(ExitCode::heldByAnotherRun,
-                           fmt::format("{} (waited {} seconds; --wait gives another time)",
-                                       attempt.error, options.wait));
-    std::this_thread::sleep_for(kPause);
-  }
-}
-
-// The library writes its temporary file into the directory that TMPDIR names, and moves it over the
-// settings file, which must be on the same file system.
-void useTemporaryDirectory(const DeviceImage& image) {
-  if (image.lookAt(DeviceImage::kTemporaryDirectory).kind != deviceimage::FileLook::Kind::directory)
-    throw CommandFailure(ExitCode::refused,
-                         fmt::format("{} is no directory; nothing was changed; make it",
-                                     image.temporaryDirectory()));
-  ::setenv("TMPDIR", image.temporaryDirectory().c_str(), 1);
-}
 
 void refuseLossySave(const AccountStore& store) {
   std::vector<std::string> problems;
@@ -215,7 +183,8 @@ Result change(AccountStore& store, const ChangeOptions& options, const Edit& edi
 ExitCode changeAccounts(const ChangeOptions& options, const Edit& edit, const TakeBack& takeBack) {
   ImagePtr image = openImage(options.image);
   if (options.notify) requireTrustedServices(*image);
-  const std::unique_ptr<ImageLock> lock = takeLock(*image, options);
+  const std::unique_ptr<ImageLock> lock =
+      options.lock && !options.dryRun ? takeLock(*image, options.wait) : nullptr;
   useTemporaryDirectory(*image);
   AccountStore store(std::move(image));
   refuseLossySave(store);

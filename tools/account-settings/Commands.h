@@ -22,5 +22,7 @@ void addRemoveChildCommand(CLI::App& app, ExitCode& outcome);
 void addValidateCommand(CLI::App& app, ExitCode& outcome);
 void addConvertCommand(CLI::App& app, ExitCode& outcome);
 void addExplainMergeCommand(CLI::App& app, ExitCode& outcome);
+void addWaitForMigrationCommand(CLI::App& app, ExitCode& outcome);
+void addStopDaemonCommand(CLI::App& app, ExitCode& outcome);
 
 }  // namespace tools

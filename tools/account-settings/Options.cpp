@@ -17,19 +17,28 @@ void addIdentifier(CLI::App& command, const std::string& name, std::string& iden
   });
 }
 
+CLI::Option* addSeconds(CLI::App& command, const std::string& name, double& seconds,
+                        double shortest, const std::string& help) {
+  constexpr double kLongest = 86'400;
+  return command.add_option(name, seconds, help)
+      ->type_name("SECONDS")
+      ->check(CLI::Range(shortest, kLongest))
+      ->check([](const std::string& text) {  // which lets "nan" pass
+        return std::isfinite(std::strtod(text.c_str(), nullptr)) ? std::string()
+                                                                 : text + " is no number";
+      });
+}
+
+void addWait(CLI::App& command, double& wait) {
+  addSeconds(command, "--wait", wait, 0, "How long to wait for a lock that another run holds (10)");
+}
+
 void addChangeOptions(CLI::App& command, ChangeOptions& options) {
   addLookOptions(command, options);
   command.add_flag("--lock,!--no-lock", options.lock,
                    "Hold the image's lock from reading to writing, so that nobody's change is "
                    "lost (the default)");
-  command
-      .add_option("--wait", options.wait, "How long to wait for a lock that another run holds (10)")
-      ->type_name("SECONDS")
-      ->check(CLI::Range(0.0, 86'400.0))
-      ->check([](const std::string& text) {  // which lets "nan" pass
-        return std::isfinite(std::strtod(text.c_str(), nullptr)) ? std::string()
-                                                                 : text + " is no number";
-      });
+  addWait(command, options.wait);
   command.add_flag("--notify", options.notify,
                    "Tell the notifiers of the image's account services; runs their code");
   command.add_flag("--dry-run", options.dryRun, "Print what would change, and change nothing");

@@ -16,6 +16,10 @@ void addLookOptions(CLI::App& command, LookOptions& options);
 void addIdentifier(CLI::App& command, const std::string& name, std::string& identifier,
                    const std::string& help);
 
+// An option that takes a number of seconds, `shortest` or more.
+CLI::Option* addSeconds(CLI::App& command, const std::string& name, double& seconds,
+                        double shortest, const std::string& help);
+
 // What every command that changes a settings file is told.
 struct ChangeOptions : LookOptions {
   bool lock = true;     // hold the image's lock from the reading to the writing
@@ -23,6 +27,7 @@ struct ChangeOptions : LookOptions {
   bool notify = false;  // tell the notifiers of the service bundles
   bool dryRun = false;
 };
+void addWait(CLI::App& command, double& wait);  // the option --wait
 void addChangeOptions(CLI::App& command, ChangeOptions& options);
 
 }  // namespace tools

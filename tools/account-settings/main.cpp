@@ -6,7 +6,9 @@ namespace {
 
 constexpr const char* kFooter =
     "Exit codes: 0 done; 1 unexpected failure; 2 wrong usage; 6 a settings file is damaged, or\n"
-    "validate found something; 7 refused, nothing was written; 11 another run holds the image.\n\n"
+    "validate found something; 7 refused, nothing was written; 9 the time was up; 10 the "
+    "data-access\n"
+    "daemon runs all the same; 11 another run holds the image.\n\n"
     "Example:\n"
     "  account-settings list --image my-device\n"
     "  account-settings show Q1 --image my-device\n"
@@ -34,5 +36,7 @@ int main(int argumentCount, char** arguments) {
   tools::addValidateCommand(app, outcome);
   tools::addConvertCommand(app, outcome);
   tools::addExplainMergeCommand(app, outcome);
+  tools::addWaitForMigrationCommand(app, outcome);
+  tools::addStopDaemonCommand(app, outcome);
   return tools::runProgram(app, outcome, argumentCount, arguments);
 }

@@ -13,6 +13,8 @@ enum class ExitCode {
   someRecordsBad = 4,  // the others were imported
   imageDamaged = 6,    // or check found something
   refused = 7,         // nothing was written
+  timedOut = 9,        // what was waited for did not come in time
+  daemonRuns = 10,     // the data-access daemon runs all the same
   heldByAnotherRun = 11
 };
 

@@ -46,8 +46,12 @@ int runProgram(CLI::App& app, const ExitCode& outcome, int argumentCount, char**
   return static_cast<int>(code);
 }
 
+std::string messageLine(std::string_view text) {
+  return programName() + ": " + forTerminal(text) + '\n';
+}
+
 void printMessage(std::string_view text) {
-  const std::string line = programName() + ": " + forTerminal(text) + '\n';
+  const std::string line = messageLine(text);
   std::fwrite(line.data(), 1, line.size(), stderr);
 }
 

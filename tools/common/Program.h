@@ -1,6 +1,7 @@
 #pragma once
 
 #include <CLI/CLI.hpp>
+#include <string>
 #include <string_view>
 
 #include "tools/common/ExitCode.h"
@@ -12,8 +13,8 @@ namespace tools {
 // program's exit code.
 int runProgram(CLI::App& app, const ExitCode& outcome, int argumentCount, char** arguments);
 
-// One line on standard error: the program's name and the text, whose control characters are
-// escaped.
+// A line for standard error: the program's name and the text, whose control characters are escaped.
+std::string messageLine(std::string_view text);
 void printMessage(std::string_view text);
 
 }  // namespace tools

@@ -8,7 +8,7 @@ from pathlib import Path
 from settingstest import run
 
 COMMANDS = ["list", "show", "enable", "disable", "set", "unset", "insert", "delete", "add-child", "remove-child",
-            "validate", "convert", "explain-merge"]  # fmt: skip
+            "validate", "convert", "explain-merge", "wait-for-migration", "stop-daemon"]  # fmt: skip
 MAN_PAGE = Path(os.environ["SOURCE_TREE"], "docs/man/account-settings.1").read_text(encoding="utf-8")
 
 
@@ -22,7 +22,8 @@ class Help(unittest.TestCase):
         text = self.help_of()
         self.assertEqual(re.findall(r"^  ([a-z-]+)  ", text.split("Subcommands:")[1], re.MULTILINE), COMMANDS)
         self.assertIn("Example:", text)
-        for code in ["0 done", "1 unexpected", "2 wrong", "6 a settings file", "7 refused", "11 another"]:
+        for code in ["0 done", "1 unexpected", "2 wrong", "6 a settings file", "7 refused", "9 the time", "10 the data",
+                     "11 another"]:
             self.assertIn(code, text)
 
     def test_of_each_command_gives_an_example(self):
@@ -37,7 +38,9 @@ class Help(unittest.TestCase):
 
     def test_wrong_usage_ends_with_2_and_a_hint(self):
         for arguments in [[], ["dance"], ["list"], ["show", "--nope"], ["convert", "x", "--to", "yaml"],
-                          ["set", "A", "B", "C", "--image", "x", "--wait", "-1"]]:  # fmt: skip
+                          ["set", "A", "B", "C", "--image", "x", "--wait", "-1"],
+                          ["wait-for-migration", "--image", "x", "--timeout", "0"],
+                          ["wait-for-migration", "--image", "x", "--timeout", "nan"]]:  # fmt: skip
             with self.subTest(arguments):
                 ended = run(*arguments)
                 self.assertEqual((ended.returncode, ended.stdout), (2, b""))
@@ -52,7 +55,7 @@ class Help(unittest.TestCase):
 
     def test_the_man_page_knows_every_exit_code(self):
         codes = re.findall(r"^\.It (\d+)$", MAN_PAGE, re.MULTILINE)
-        self.assertEqual(codes, ["0", "1", "2", "6", "7", "11"])
+        self.assertEqual(codes, ["0", "1", "2", "6", "7", "9", "10", "11"])
 
 
 if __name__ == "__main__":
