@@ -1,0 +1,56 @@
+"""Files and values of every kind, read and merged: rows R1, R3 and R4 of docs/reliability.md."""
+
+import concurrent.futures
+import pathlib
+import re
+import subprocess
+import sys
+
+EXCHANGE = pathlib.Path(__file__).resolve().parents[1] / "propertylist/exchange.py"
+SEED = 20261121
+BATCH = 2500
+
+
+def counted(command):
+    """Runs a program that prints its bad cases and "N cases": the number, and what was bad."""
+    done = subprocess.run(command, check=False, stdout=subprocess.PIPE, stderr=subprocess.STDOUT, text=True,
+                          errors="replace")
+    bad = [("", line) for line in done.stdout.splitlines() if line.startswith("bad ")]
+    count = re.search(r"^(\d+) cases$", done.stdout, re.MULTILINE)
+    if count is None or (done.returncode != 0) != bool(bad):
+        bad.append(("", f"{' '.join(command)} ended with {done.returncode}: {done.stdout[-300:]}"))
+    return int(count[1]) if count else 0, bad
+
+
+def damaged_lists(found, _directory, _is_full):
+    program = found["fault_lists"]
+    commands = [[program, "odd-files"], [program, "every-change", "0"], [program, "every-change", "1"]]
+    with concurrent.futures.ThreadPoolExecutor(2) as pool:
+        results = list(pool.map(counted, commands))
+    return sum(count for count, _ in results), [text for _, bad in results for text in bad]
+
+
+def exchanged_values(found, _directory, is_full):
+    """Half of the values are written by the product and read by Python's plistlib, half the other way."""
+    total = 200_000 if is_full else 20_000
+    print(f"     R3 seed {SEED}", flush=True)
+
+    def exchange(seed):
+        done = subprocess.run([sys.executable, str(EXCHANGE), found["propertylist-exchange"], str(BATCH),
+                               str(seed)], check=False, capture_output=True, text=True)
+        return (f"seed {seed}", done.stderr[-300:]) if done.returncode != 0 else None
+
+    seeds = range(SEED, SEED + total // (2 * BATCH))
+    with concurrent.futures.ThreadPoolExecutor(2) as pool:
+        return 2 * BATCH * len(seeds), [bad for bad in pool.map(exchange, seeds) if bad]
+
+
+def merged_triples(found, _directory, _is_full):
+    return counted([found["fault_merges"]])
+
+
+ROWS = {
+    "R1": ("damaged property lists are read within the limits", damaged_lists),
+    "R3": ("values are exchanged with an independent reader", exchanged_values),
+    "R4": ("all small merges, against a model", merged_triples),
+}
