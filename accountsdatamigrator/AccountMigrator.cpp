@@ -91,8 +91,9 @@ class MigratorClass : public platform::RuntimeClass,
   }
 };
 
-// Made, and thereby registered, while the bundle is loaded.
-MigratorClass migratorClass;
+// Made, and thereby registered, while the bundle is loaded, and never destroyed: the registry
+// answers it until the process is gone, also to what runs at its exit.
+auto& migratorClass = *new MigratorClass;
 
 }  // namespace
 }  // namespace accountsdatamigrator

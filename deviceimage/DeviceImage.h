@@ -35,6 +35,13 @@ struct OpenedFile {
   int descriptor = -1;
 };
 
+// What a file holds, or why that cannot be read.
+struct FileContent {
+  bool exists = false;
+  std::optional<propertylist::Bytes> bytes;
+  std::string error;  // empty exactly when there are bytes
+};
+
 // What is at a name of the image, seen without opening it.
 struct FileLook {
   enum class Kind { nothing, file, directory, other };  // a link is "other", also on the way there
@@ -127,6 +134,8 @@ class DeviceImage {
   std::vector<std::string> namesIn(std::string_view relative) const;
   platform::Status removeFile(std::string_view relative) const;
 
+  // The content of a file of 256 MiB at the most.
+  FileContent readFile(std::string_view relative) const;
   // The property list in the file; limits and errors as propertylist::readPropertyListFile.
   propertylist::FileReadResult readPropertyList(std::string_view relative) const;
   // The value under `key` in the file's dictionary. What cannot be read counts as absent.

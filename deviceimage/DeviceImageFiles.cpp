@@ -37,13 +37,13 @@ int writeAll(int descriptor, std::span<const std::uint8_t> bytes) {
 
 }  // namespace
 
-propertylist::FileReadResult DeviceImage::readPropertyList(std::string_view relative) const {
+FileContent DeviceImage::readFile(std::string_view relative) const {
   const OpenedFile opened = openFile(relative, O_RDONLY);
-  propertylist::FileReadResult result;
-  result.exists = opened.status.code != ENOENT;
+  FileContent content;
+  content.exists = opened.status.code != ENOENT;
   if (!opened.status.isSuccess()) {
-    result.error = opened.status.error->description;
-    return result;
+    content.error = opened.status.error->description;
+    return content;
   }
   const Descriptor file(opened.descriptor);
   propertylist::Bytes bytes;
@@ -52,17 +52,27 @@ propertylist::FileReadResult DeviceImage::readPropertyList(std::string_view rela
     const ssize_t count = ::read(file.number(), chunk.data(), chunk.size());
     if (count < 0 && errno == EINTR) continue;
     if (count < 0) {
-      result.error = failure(errno, "read", relative).error->description;
-      return result;
+      content.error = failure(errno, "read", relative).error->description;
+      return content;
     }
     if (count == 0) break;
     bytes.insert(bytes.end(), chunk.data(), chunk.data() + count);
     if (bytes.size() > propertylist::kMaximumFileSize) {
-      result.error = "\"" + std::string(relative) + "\" in the image is larger than 256 MiB";
-      return result;
+      content.error = "\"" + std::string(relative) + "\" in the image is larger than 256 MiB";
+      return content;
     }
   }
-  propertylist::ReadResult read = propertylist::readPropertyList(bytes);
+  content.bytes = std::move(bytes);
+  return content;
+}
+
+propertylist::FileReadResult DeviceImage::readPropertyList(std::string_view relative) const {
+  const FileContent content = readFile(relative);
+  propertylist::FileReadResult result;
+  result.exists = content.exists;
+  result.error = content.error;
+  if (!content.bytes) return result;
+  propertylist::ReadResult read = propertylist::readPropertyList(*content.bytes);
   if (!read.value)
     result.error = "\"" + std::string(relative) +
                    "\" in the image is no property list: " + read.error.description();

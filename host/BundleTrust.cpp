@@ -75,4 +75,15 @@ std::optional<std::string> whyNotTrusted(const std::string& path, const TrustWor
   return std::nullopt;
 }
 
+std::optional<std::string> whyFolderNotTrusted(const std::string& path, const TrustWords& words) {
+  if (auto reason = whyNotTrusted(path, words)) return reason;
+  std::error_code error;
+  std::filesystem::recursive_directory_iterator entry(path, error);
+  for (const std::filesystem::recursive_directory_iterator end; !error && entry != end;
+       entry.increment(error))
+    if (auto reason = whyNotTrusted(entry->path().string(), words)) return reason;
+  if (error) return path + " cannot be looked through: " + error.message() + "; check its rights.";
+  return std::nullopt;
+}
+
 }  // namespace host

@@ -21,4 +21,7 @@ struct TrustWords {
 // who could replace the code there could replace the program.
 std::optional<std::string> whyNotTrusted(const std::string& path, const TrustWords& words);
 
+// The same of the folder and of everything in it, since code may bring libraries of its own.
+std::optional<std::string> whyFolderNotTrusted(const std::string& path, const TrustWords& words);
+
 }  // namespace host

@@ -10,6 +10,7 @@
 #include "deviceimage/RecordStores.h"
 #include "deviceimage/SyncAgent.h"
 #include "host/AccountComparison.h"
+#include "host/MigratorChild.h"
 #include "host/ProcessTree.h"
 #include "host/RecordAccounting.h"
 #include "host/SettingsFileCheck.h"
@@ -25,31 +26,6 @@ using deviceimage::RecordStores;
 
 // A report stays readable whatever a migrator writes; the image's system log has every line.
 constexpr std::size_t kMaximumLogSize = std::size_t{64} << 20U;  // bytes
-
-std::string sentenceFor(const MigratorOutcome& migrator) {
-  const std::string detail = migrator.detail.empty() ? "." : " (" + migrator.detail + ").";
-  switch (migrator.ending) {
-    case Ending::succeeded:
-      return {};
-    case Ending::failed:
-      return migrator.name + " reports that its migration failed" + detail;
-    case Ending::notLoaded:
-      return migrator.name + " could not be loaded" + detail;
-    case Ending::raised:
-      return migrator.name + " raised a failure" + detail;
-    case Ending::crashed:
-      return migrator.name + " crashed" + detail;
-    case Ending::left:
-      return migrator.name + " ended its process without an answer" + detail;
-    case Ending::timedOut:
-      return migrator.name + " ran past its limit and was stopped" + detail;
-    case Ending::interrupted:
-      return migrator.name + " was stopped because the run was interrupted" + detail;
-    case Ending::notStarted:
-      return migrator.name + " could not be given a process" + detail;
-  }
-  return {};
-}
 
 std::string textOf(const platform::Status& status) {
   return status.error ? status.error->description : "error " + std::to_string(status.code);
@@ -184,8 +160,12 @@ bool MigrationHost::_checkDatabases(RunOutcome whenDamaged) {
 void MigrationHost::_runMigrators(const RunOptions& options, int lockDescriptor) {
   for (const MigratorBundle& bundle : _bundles) {
     _listener.stageBegan("Running " + bundle.name);
-    const MigratorTask task = {_image->rootPath(), _image->temporaryDirectory(), lockDescriptor,
-                               bundle, options.limit};
+    const MigratorTask task = {bundle.name,
+                               {kRunMigratorArgument, _image->rootPath(), bundle.path,
+                                bundle.executable, bundle.principalClass},
+                               _image->temporaryDirectory(),
+                               lockDescriptor,
+                               options.limit};
     MigratorOutcome outcome =
         runMigrator(task, _interruption, [this](std::string_view line) { _keepLogLine(line); });
     std::string sentence = sentenceFor(outcome);

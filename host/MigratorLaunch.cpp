@@ -15,7 +15,7 @@
 #include <string>
 #include <vector>
 
-#include "host/MigratorChild.h"
+#include "host/ChildProcess.h"
 
 namespace host {
 namespace {
@@ -127,9 +127,8 @@ std::optional<LaunchedMigrator> launchMigrator(const MigratorTask& task) {
       fcntl(launched.output.number(), F_SETFL, O_NONBLOCK) != 0)
     return std::nullopt;
 
-  std::vector<std::string> arguments = {"migration-host",       kRunMigratorArgument,
-                                        task.imagePath,         task.bundle.path,
-                                        task.bundle.executable, task.bundle.principalClass};
+  std::vector<std::string> arguments = task.arguments;
+  arguments.insert(arguments.begin(), program_invocation_short_name);
   std::vector<std::string> environment = migratorEnvironment(task.temporaryDirectory);
   const std::vector<char*> argumentPointers = pointersTo(arguments);
   const std::vector<char*> environmentPointers = pointersTo(environment);

@@ -31,7 +31,7 @@ class Watch {
  public:
   Watch(LaunchedMigrator launched, const MigratorTask& task, const LineSink& sink)
       : _process(std::move(launched)), _sink(sink), _deadline(Clock::now() + task.limit) {
-    _outcome.name = task.bundle.name;
+    _outcome.name = task.name;
     _outcome.ending = Ending::left;
   }
 
@@ -180,6 +180,31 @@ class Watch {
 
 }  // namespace
 
+std::string sentenceFor(const MigratorOutcome& migrator) {
+  const std::string detail = migrator.detail.empty() ? "." : " (" + migrator.detail + ").";
+  switch (migrator.ending) {
+    case Ending::succeeded:
+      return {};
+    case Ending::failed:
+      return migrator.name + " reports that its migration failed" + detail;
+    case Ending::notLoaded:
+      return migrator.name + " could not be loaded" + detail;
+    case Ending::raised:
+      return migrator.name + " raised a failure" + detail;
+    case Ending::crashed:
+      return migrator.name + " crashed" + detail;
+    case Ending::left:
+      return migrator.name + " ended its process without an answer" + detail;
+    case Ending::timedOut:
+      return migrator.name + " ran past its limit and was stopped" + detail;
+    case Ending::interrupted:
+      return migrator.name + " was stopped because the run was interrupted" + detail;
+    case Ending::notStarted:
+      return migrator.name + " could not be given a process" + detail;
+  }
+  return {};
+}
+
 MigratorOutcome runMigrator(const MigratorTask& task, Interruption& interruption,
                             const LineSink& sink) {
   const Clock::time_point start = Clock::now();
@@ -187,7 +212,7 @@ MigratorOutcome runMigrator(const MigratorTask& task, Interruption& interruption
   if (std::optional<LaunchedMigrator> launched = launchMigrator(task)) {
     outcome = Watch(std::move(*launched), task, sink).untilItEnds(interruption);
   } else {
-    outcome.name = task.bundle.name;
+    outcome.name = task.name;
     outcome.detail = std::generic_category().message(errno);
   }
   outcome.duration = std::chrono::duration_cast<milliseconds>(Clock::now() - start);

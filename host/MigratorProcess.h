@@ -5,9 +5,9 @@
 #include <functional>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "host/Interruption.h"
-#include "host/MigratorBundle.h"
 
 namespace host {
 
@@ -33,22 +33,26 @@ struct MigratorOutcome {
   bool outputWasCut = false;
 };
 
+// What there is to say of an outcome: one sentence; empty when the migrator succeeded.
+std::string sentenceFor(const MigratorOutcome& migrator);
+
 inline constexpr std::size_t kMaximumOutput = std::size_t{64} * 1024;
 
 struct MigratorTask {
-  std::string imagePath;  // absolute
+  std::string name;  // what the migrator is called until it says so itself
+  // What this program is started with anew: one of its child arguments, and what belongs to that.
+  std::vector<std::string> arguments;
   std::string temporaryDirectory;
   int lockDescriptor = -1;  // the image's lock, which the process is to share
-  MigratorBundle bundle;
   std::chrono::seconds limit{0};
 };
 
 // Gets each line that the migrator writes to the system log, as it comes.
 using LineSink = std::function<void(std::string_view line)>;
 
-// Runs the migrator of a bundle in a process of its own and comes back in time, whatever it does:
+// Runs a migrator in a process of its own and comes back in time, whatever it does:
 //
-// - The process is this program anew (/proc/self/exe with kRunMigratorArgument), so that it
+// - The process is this program anew (/proc/self/exe with the task's arguments), so that it
 //   inherits nothing but umask 077, its end of the channel and the image's lock. Its environment is
 //   TMPDIR alone, in a build with sanitizers their options too. It is in a session of its own, its
 //   address space is limited, and it dies with the host.

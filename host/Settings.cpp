@@ -68,6 +68,11 @@ Settings readSettings(const deviceimage::DeviceImage& image) {
   return settings;
 }
 
+bool isSameFile(const struct stat& a, const struct stat& b) {
+  return a.st_dev == b.st_dev && a.st_ino == b.st_ino && a.st_size == b.st_size &&
+         a.st_ctim.tv_sec == b.st_ctim.tv_sec && a.st_ctim.tv_nsec == b.st_ctim.tv_nsec;
+}
+
 std::string textUnder(const Dictionary& account, std::string_view key) {
   const std::string* text = propertylist::findString(account, key);
   return text != nullptr ? *text : std::string();

@@ -25,6 +25,12 @@ struct Settings {
 };
 Settings readSettings(const deviceimage::DeviceImage& image);
 
+// The version that programs write now.
+inline constexpr std::int64_t kPresentVersion = 12;
+
+// Whether both tell of one file that nobody has written or replaced in between.
+bool isSameFile(const struct stat& a, const struct stat& b);
+
 // The text under `key`; empty without one.
 std::string textUnder(const propertylist::Dictionary& account, std::string_view key);
 inline std::string identifierOf(const propertylist::Dictionary& account) {

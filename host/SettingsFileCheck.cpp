@@ -3,13 +3,7 @@
 namespace host {
 namespace {
 
-constexpr std::int64_t kPresentVersion = 12;
 constexpr mode_t kPrivate = S_IFREG | S_IRUSR | S_IWUSR;
-
-bool isSameFile(const struct stat& a, const struct stat& b) {
-  return a.st_dev == b.st_dev && a.st_ino == b.st_ino && a.st_size == b.st_size &&
-         a.st_ctim.tv_sec == b.st_ctim.tv_sec && a.st_ctim.tv_nsec == b.st_ctim.tv_nsec;
-}
 
 }  // namespace
 

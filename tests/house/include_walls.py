@@ -41,7 +41,13 @@ FLOORS = {
         ],
         [],
     ),
-    "host": (["propertylist", "platform", "deviceimage"], ["posix", "fmt", "nlohmann"]),
+    "host": (
+        [
+            "propertylist", "platform", "deviceimage",
+            "QuillnetAccountTypeRemoval/AccountsDataMigrator.h",
+        ],
+        ["posix", "fmt", "nlohmann"],
+    ),
     "tools": (
         [
             "propertylist", "platform", "QuillnetAccountTypeRemoval", "localdata", "deviceimage",

@@ -27,6 +27,7 @@ class IncludeWalls(unittest.TestCase):
             ("migrator/a.cpp", '#include "localdata/a.h"'),
             ("deviceimage/a.cpp", "#include <sqlite3.h>"),
             ("host/a.cpp", '#include "deviceimage/a.h"'),
+            ("host/a.cpp", '#include "QuillnetAccountTypeRemoval/AccountsDataMigrator.h"'),
             ("accountservices/a.cpp", '#include "deviceimage/Journal.h"'),
             ("accountservices/a.cpp", '#include "QuillnetAccountTypeRemoval/AccountChanges.h"'),
             ("tools/a.cpp", "#include <CLI/CLI.hpp>"),
@@ -53,6 +54,8 @@ class IncludeWalls(unittest.TestCase):
             ("accountservices/a.cpp", '#include "QuillnetAccountTypeRemoval/ASSAccountsManager.h"'),
             ("host/a.cpp", '#include "accountservices/a.h"'),
             ("host/a.cpp", '#include "migrator/a.h"'),
+            ("host/a.cpp", '#include "QuillnetAccountTypeRemoval/ASSAccountsManager.h"'),
+            ("deviceimage/a.cpp", '#include "QuillnetAccountTypeRemoval/AccountsDataMigrator.h"'),
             ("host/a.cpp", '  #  include "localdata/a.h"  // wanted'),
             ("tools/a.cpp", '#include "tests/a.h"'),
         ):

@@ -3,6 +3,8 @@
 #include <fmt/format.h>
 
 #include <filesystem>
+#include <optional>
+#include <string>
 #include <system_error>
 
 #include "host/BundleTrust.h"
@@ -19,13 +21,12 @@ constexpr host::TrustWords kTrustWords = {
     "the account service", "the user who runs account-settings",
     "put the account service itself there, with the rights to look at it"};
 
-// With every folder above it.
-void requireTrust(const std::string& path) {
-  if (const auto reason = host::whyNotTrusted(path, kTrustWords))
+void require(const std::optional<std::string>& reasonAgainst) {
+  if (reasonAgainst)
     throw CommandFailure(ExitCode::refused,
                          fmt::format("--notify runs the code of the image's account services, and "
                                      "{} Nothing was changed; leave --notify out otherwise",
-                                     *reason));
+                                     *reasonAgainst));
 }
 
 bool isMissing(const fs::path& path) {
@@ -33,29 +34,17 @@ bool isMissing(const fs::path& path) {
   return fs::symlink_status(path, error).type() == fs::file_type::not_found;
 }
 
-// Bundles may bring libraries of their own, so everything in the folder counts.
-void requireTrustedFolder(const std::string& folder) {
-  if (isMissing(folder)) return;
-  requireTrust(folder);
-  std::error_code error;
-  fs::recursive_directory_iterator entry(folder, error);
-  for (const fs::recursive_directory_iterator end; !error && entry != end; entry.increment(error))
-    requireTrust(entry->path().string());
-  if (error)
-    throw CommandFailure(
-        ExitCode::refused,
-        fmt::format("{}: {}; nothing was changed; check its rights", folder, error.message()));
-}
-
 }  // namespace
 
 void requireTrustedServices(const deviceimage::DeviceImage& image) {
-  requireTrustedFolder(image.absolutePath(deviceimage::DeviceImage::kAccountServicesDirectory));
+  const std::string services =
+      image.absolutePath(deviceimage::DeviceImage::kAccountServicesDirectory);
+  if (!isMissing(services)) require(host::whyFolderNotTrusted(services, kTrustWords));
   for (const std::string& bundle : namedBundles()) {
     fs::path path = platform::joinedPath(image.rootPath(), bundle);
     // Where a bundle is missing, nobody else may be able to put one.
     while (isMissing(path)) path = path.parent_path();
-    requireTrust(path.string());
+    require(host::whyNotTrusted(path.string(), kTrustWords));
   }
 }
 

@@ -22,7 +22,13 @@ void addRemoveChildCommand(CLI::App& app, ExitCode& outcome);
 void addValidateCommand(CLI::App& app, ExitCode& outcome);
 void addConvertCommand(CLI::App& app, ExitCode& outcome);
 void addExplainMergeCommand(CLI::App& app, ExitCode& outcome);
+void addMigrateLegacyCommand(CLI::App& app, ExitCode& outcome);
 void addWaitForMigrationCommand(CLI::App& app, ExitCode& outcome);
 void addStopDaemonCommand(CLI::App& app, ExitCode& outcome);
+
+// Whether the program was started by migrate-legacy, for the process that migrates; and what that
+// process does. Gives its exit status.
+bool isLegacyMigrationProcess(int argumentCount, char** arguments);
+int migrateLegacyInThisProcess(char** arguments);
 
 }  // namespace tools

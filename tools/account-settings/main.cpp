@@ -17,6 +17,8 @@ constexpr const char* kFooter =
 }  // namespace
 
 int main(int argumentCount, char** arguments) {
+  if (tools::isLegacyMigrationProcess(argumentCount, arguments))
+    return tools::migrateLegacyInThisProcess(arguments);
   CLI::App app("Looks at and changes the account settings file of a device image.",
                "account-settings");
   app.set_version_flag("--version", "account-settings " PROJECT_VERSION);
@@ -36,6 +38,7 @@ int main(int argumentCount, char** arguments) {
   tools::addValidateCommand(app, outcome);
   tools::addConvertCommand(app, outcome);
   tools::addExplainMergeCommand(app, outcome);
+  tools::addMigrateLegacyCommand(app, outcome);
   tools::addWaitForMigrationCommand(app, outcome);
   tools::addStopDaemonCommand(app, outcome);
   return tools::runProgram(app, outcome, argumentCount, arguments);

@@ -8,7 +8,7 @@ from pathlib import Path
 from settingstest import run
 
 COMMANDS = ["list", "show", "enable", "disable", "set", "unset", "insert", "delete", "add-child", "remove-child",
-            "validate", "convert", "explain-merge", "wait-for-migration", "stop-daemon"]  # fmt: skip
+            "validate", "convert", "explain-merge", "migrate-legacy", "wait-for-migration", "stop-daemon"]  # fmt: skip
 MAN_PAGE = Path(os.environ["SOURCE_TREE"], "docs/man/account-settings.1").read_text(encoding="utf-8")
 
 

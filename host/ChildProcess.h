@@ -1,0 +1,38 @@
+#pragma once
+
+#include <functional>
+#include <string>
+#include <string_view>
+
+#include "deviceimage/DeviceImage.h"
+#include "platform/Services.h"
+
+// The process that runs a migrator, from the inside.
+namespace host {
+
+// Where it finds its end of the channel, and the image's lock, which it shares: when the host is
+// killed, the image is free no sooner than the migrator has ended.
+inline constexpr int kChannelDescriptor = 3;
+inline constexpr int kLockDescriptor = 4;
+
+// Does the process's work over the image, tells the host what came of it through one of the
+// functions below, and gives its answer.
+using ChildWork = std::function<int(const deviceimage::DeviceImage& image)>;
+struct ChildOptions {
+  std::string processName = "migration-host";  // in the lines of the image's log
+  std::function<void(std::string_view line)>
+      lineSink;  // gets the log's lines as well; may be empty
+};
+
+// Installs the services of the image at `imagePath`, does the work, passes every line of the log
+// and whatever is thrown on to the host, and gives the exit status of the process. Nothing of the
+// program's own may have been set up before.
+int workForHost(const std::string& imagePath, const ChildWork& work,
+                const ChildOptions& options = {});
+
+// Each tells the host and gives the exit status.
+int tellEnd(bool hasSucceeded);
+int tellNotLoaded(std::string_view why);
+void tellName(std::string_view name);  // what the migrator calls itself; before the end
+
+}  // namespace host

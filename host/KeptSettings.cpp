@@ -1,0 +1,96 @@
+#include "host/KeptSettings.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <charconv>
+#include <map>
+#include <optional>
+#include <string_view>
+
+#include "host/Settings.h"
+
+namespace host {
+namespace {
+
+using deviceimage::DeviceImage;
+
+constexpr std::string_view kMark = ".before-migration-";
+
+std::string nameOfCopy(unsigned number) {
+  return std::string(DeviceImage::kSettingsFile) + std::string(kMark) + std::to_string(number);
+}
+
+// The number in a copy's plain name; empty for any other name.
+std::optional<unsigned> numberOfCopy(std::string_view name) {
+  const std::string_view file =
+      DeviceImage::kSettingsFile.substr(DeviceImage::kSettingsFile.rfind('/') + 1);
+  if (!name.starts_with(file)) return std::nullopt;
+  name.remove_prefix(file.size());
+  if (!name.starts_with(kMark)) return std::nullopt;
+  name.remove_prefix(kMark.size());
+  unsigned number = 0;
+  const char* const end = name.data() + name.size();
+  const auto [stop, error] = std::from_chars(name.data(), end, number);
+  const bool isPlain = error == std::errc() && stop == end && !name.starts_with('0');
+  return isPlain ? std::optional(number) : std::nullopt;
+}
+
+// The names of the copies in the image, by number.
+std::map<unsigned, std::string> copiesIn(const DeviceImage& image) {
+  std::map<unsigned, std::string> copies;
+  for (const std::string& name : image.namesIn(DeviceImage::kPreferencesDirectory))
+    if (const std::optional<unsigned> number = numberOfCopy(name))
+      copies.emplace(*number, nameOfCopy(*number));
+  return copies;
+}
+
+}  // namespace
+
+KeptSettings::KeptSettings(const DeviceImage& image)
+    : _image(image), _content(image.readFile(DeviceImage::kSettingsFile)) {
+  _file = readSettings(image).file;
+  if (_content.exists) _keep();
+}
+
+void KeptSettings::_keep() {
+  if (!_content.bytes) {
+    _error = _content.error;
+    return;
+  }
+  const std::map<unsigned, std::string> copies = copiesIn(_image);
+  if (std::any_of(copies.begin(), copies.end(), [this](const auto& copy) {
+        return _image.readFile(copy.second).bytes == _content.bytes;
+      }))
+    return;
+  unsigned free = 1;
+  while (copies.contains(free)) ++free;
+  const std::string name = nameOfCopy(free);
+  const platform::Status status = _image.createFile(name, *_content.bytes);
+  if (status.isSuccess())
+    _copy = name;
+  else
+    _error = status.error->description;
+}
+
+SettingsFate KeptSettings::settle() {
+  const Settings now = readSettings(_image);
+  if (!now.exists) return _content.exists ? _putBack() : SettingsFate::untouched;
+  if (!_content.exists || !isSameFile(_file, now.file)) return SettingsFate::replaced;
+  if (!_copy.empty()) _image.removeFile(_copy).ignore("one copy too many does no harm");
+  return SettingsFate::untouched;
+}
+
+SettingsFate KeptSettings::_putBack() {
+  const platform::Status status = _image.createFile(DeviceImage::kSettingsFile, *_content.bytes);
+  if (!status.isSuccess()) return SettingsFate::lost;
+  if (!_copy.empty()) _image.removeFile(_copy).ignore("one copy too many does no harm");
+  return SettingsFate::putBack;
+}
+
+std::vector<std::string> keptSettingsOf(const DeviceImage& image) {
+  std::vector<std::string> paths;
+  for (const auto& [number, name] : copiesIn(image)) paths.push_back(image.absolutePath(name));
+  return paths;
+}
+
+}  // namespace host

@@ -1,0 +1,76 @@
+#include "host/LegacyStep.h"
+
+#include <utility>
+
+#include "host/Settings.h"
+#include "host/SettingsFileCheck.h"
+
+namespace host {
+namespace {
+
+using deviceimage::DeviceImage;
+
+std::string sentenceFor(SettingsFate fate, const DeviceImage& image) {
+  const std::string path = image.settingsFile();
+  switch (fate) {
+    case SettingsFate::untouched:
+      return path + " is as it was.";
+    case SettingsFate::replaced:
+      return path + " is a new one; what was there before is kept beside it.";
+    case SettingsFate::putBack:
+      return path + " was put back as it was.";
+    case SettingsFate::lost:
+      return path +
+             " is gone and could not be put back; bring back the copy that is kept beside "
+             "it.";
+  }
+  return {};
+}
+
+// What speaks against a migration that says that it went well.
+std::vector<std::string> doubtsAbout(const DeviceImage& image, SettingsFate fate,
+                                     const Settings& before) {
+  if (fate == SettingsFate::replaced) return checkSettingsFile(image, before, readSettings(image));
+  if (fate == SettingsFate::untouched && !legacyNeedOf(image).any()) return {};
+  return {std::string(kAccountMigratorName) + " made no settings file of what older systems left."};
+}
+
+void judge(const DeviceImage& image, const Settings& before, LegacyReport& report) {
+  std::string sentence = sentenceFor(*report.migrator);
+  if (sentence.empty())
+    report.reasons = doubtsAbout(image, report.settings, before);
+  else
+    report.reasons.push_back(std::move(sentence));
+  if (!report.isDone()) report.reasons.push_back(sentenceFor(report.settings, image));
+}
+
+}  // namespace
+
+LegacyReport runLegacyStep(const DeviceImage& image, const LegacyTask& task,
+                           Interruption& interruption, const LineSink& sink) {
+  LegacyReport report;
+  report.need = legacyNeedOf(image);
+  if (report.need.any()) report.reasons = reasonsAgainstAccountMigrator(image);
+  if (report.need.any() && report.isDone()) {
+    const Settings before = readSettings(image);
+    KeptSettings kept(image);
+    if (kept.error().empty()) {
+      report.migrator = runMigrator({std::string(kAccountMigratorName),
+                                     {task.childArgument, image.rootPath()},
+                                     image.temporaryDirectory(),
+                                     task.lockDescriptor,
+                                     task.limit},
+                                    interruption, sink);
+      report.settings = kept.settle();
+      judge(image, before, report);
+    } else {
+      report.reasons.push_back(image.settingsFile() +
+                               " cannot be copied, so that nothing was done: " + kept.error() +
+                               ".");
+    }
+  }
+  report.keptSettings = keptSettingsOf(image);
+  return report;
+}
+
+}  // namespace host
