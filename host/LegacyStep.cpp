@@ -46,6 +46,36 @@ void judge(const DeviceImage& image, const Settings& before, LegacyReport& repor
 
 }  // namespace
 
+std::string_view resultOf(const LegacyReport& report) {
+  if (!report.isDone()) return report.migrator ? "failed" : "refused";
+  return report.migrator ? "done" : "not needed";
+}
+
+std::string_view nameOf(SettingsFate fate) {
+  switch (fate) {
+    case SettingsFate::untouched:
+      return "untouched";
+    case SettingsFate::replaced:
+      return "replaced";
+    case SettingsFate::putBack:
+      return "put back";
+    case SettingsFate::lost:
+      return "lost";
+  }
+  return "lost";
+}
+
+std::string describe(const LegacyReport& report) {
+  if (!report.isDone() || !report.migrator) return std::string(resultOf(report));
+  if (report.settings == SettingsFate::untouched) return "migrated by another program meanwhile";
+  if (report.need.olderVersion) return "brought to version " + std::to_string(kPresentVersion);
+  std::string text = "built from the legacy ";
+  if (report.need.mailAccounts) text += "mail accounts";
+  if (report.need.mailAccounts && report.need.dataAccess) text += " and ";
+  if (report.need.dataAccess) text += "data-access preferences";
+  return text;
+}
+
 LegacyReport runLegacyStep(const DeviceImage& image, const LegacyTask& task,
                            Interruption& interruption, const LineSink& sink) {
   LegacyReport report;

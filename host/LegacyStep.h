@@ -2,6 +2,7 @@
 
 #include <optional>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "deviceimage/DeviceImage.h"
@@ -22,6 +23,13 @@ struct LegacyReport {
   // Whether nothing is left to be done.
   bool isDone() const { return reasons.empty(); }
 };
+
+// The words for programs: "not needed", "done", "failed" or "refused"; and "untouched", "replaced",
+// "put back" or "lost".
+std::string_view resultOf(const LegacyReport& report);
+std::string_view nameOf(SettingsFate fate);
+// What was done, for people: "built from the legacy mail accounts".
+std::string describe(const LegacyReport& report);
 
 struct LegacyTask {
   // The child argument of this program whose process decides again under the migration lock, and

@@ -42,6 +42,26 @@ Selection selectionOf(const std::shared_ptr<const DeviceImage>& image,
   return selection;
 }
 
+// Of a run that ends with a legacy step that was not done.
+RunOutcome outcomeAfter(Ending ending) {
+  switch (ending) {
+    case Ending::notLoaded:
+      return RunOutcome::refused;
+    case Ending::raised:
+    case Ending::crashed:
+    case Ending::left:
+    case Ending::timedOut:
+      return RunOutcome::migratorFailed;
+    case Ending::interrupted:
+      return RunOutcome::interrupted;
+    case Ending::succeeded:  // but there is no fit settings file
+    case Ending::failed:
+    case Ending::notStarted:
+      return RunOutcome::failed;
+  }
+  return RunOutcome::failed;
+}
+
 void append(std::vector<std::string>& target, const std::vector<std::string>& added) {
   target.insert(target.end(), added.begin(), added.end());
 }
@@ -99,6 +119,7 @@ void MigrationHost::_runUnderLock(const RunOptions& options, int lockDescriptor)
             std::generic_category().message(errno) +
             "; run the host outside of the sandbox that forbids it.");
   _readBundles(options);
+  if (options.legacy && _report.reasons.empty() && !_migrateLegacy(options, lockDescriptor)) return;
   for (std::string& reason : reasonsNotToStart(*_image, readSettings(*_image), _bundles))
     _refuse(std::move(reason));
   if (!_report.reasons.empty() || !_prepare()) return;
@@ -116,6 +137,28 @@ void MigrationHost::_runUnderLock(const RunOptions& options, int lockDescriptor)
   const Observation after = observe(_image);
   _compare(before, after, selection, agent);
   _judge();
+}
+
+// False when the run ends here. What speaks against the settings file that is there does not count
+// yet: it may be replaced.
+bool MigrationHost::_migrateLegacy(const RunOptions& options, int lockDescriptor) {
+  if (legacyNeedOf(*_image).any()) {
+    for (std::string& reason : reasonsNotToStart(*_image, Settings{}, _bundles))
+      _refuse(std::move(reason));
+    if (!_report.reasons.empty() || !_prepare()) return false;
+    removeStaleTemporaryFiles(*_image);
+    _image->removeLeftovers();
+    _listener.stageBegan("Migrating legacy settings");
+  }
+  _report.legacy =
+      runLegacyStep(*_image, {kMigrateLegacyArgument, lockDescriptor, options.limit}, _interruption,
+                    [this](std::string_view line) { _keepLogLine(line); });
+  if (_report.legacy->isDone()) return true;
+  append(_report.reasons, _report.legacy->reasons);
+  _report.outcome = _interruption.requested()  ? RunOutcome::interrupted
+                    : _report.legacy->migrator ? outcomeAfter(_report.legacy->migrator->ending)
+                                               : RunOutcome::refused;
+  return false;
 }
 
 void MigrationHost::_readBundles(const RunOptions& options) {

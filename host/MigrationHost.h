@@ -22,6 +22,9 @@ struct RunOptions {
                                       // then the image's own in name order
   std::string installedMigrators;     // folder in which the installed bundle lies
   std::chrono::seconds limit{0};      // for each migrator
+  // Whether to have a settings file made, before everything else, of what older systems left in the
+  // image, when there is such.
+  bool legacy = false;
 };
 
 // Hears about a run while it goes on.
@@ -50,6 +53,7 @@ class MigrationHost {
   void _runUnderLock(const RunOptions& options, int lockDescriptor);
   void _readBundles(const RunOptions& options);
   void _refuse(std::string reason);
+  bool _migrateLegacy(const RunOptions& options, int lockDescriptor);
   bool _prepare();
   bool _checkDatabases(RunOutcome whenDamaged);
   void _runMigrators(const RunOptions& options, int lockDescriptor);

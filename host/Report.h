@@ -1,10 +1,12 @@
 #pragma once
 
 #include <cstdint>
+#include <optional>
 #include <string>
 #include <vector>
 
 #include "deviceimage/Dataclass.h"
+#include "host/LegacyStep.h"
 #include "host/MigratorProcess.h"
 
 namespace host {
@@ -61,6 +63,7 @@ struct MigrationReport {
   std::string image;  // the path as it was given, or without links once it was opened
   RunOutcome outcome = RunOutcome::failed;
   std::vector<std::string> reasons;  // sentences: why refused, what was left, what does not add up
+  std::optional<LegacyReport> legacy;  // of the legacy step; none when it was not asked for
   std::vector<MigratorOutcome> migrators;
   std::vector<AccountReport> accounts;
   std::vector<DataclassReport> dataclasses;

@@ -75,33 +75,14 @@ host::LegacyReport migrate(const ImagePtr& image, const Options& options, Log& l
                              [&](std::string_view line) { log.take(line); });
 }
 
-const char* nameOf(host::SettingsFate fate) {
-  switch (fate) {
-    case host::SettingsFate::untouched:
-      return "untouched";
-    case host::SettingsFate::replaced:
-      return "replaced";
-    case host::SettingsFate::putBack:
-      return "put back";
-    case host::SettingsFate::lost:
-      return "lost";
-  }
-  return "lost";
-}
-
-std::string resultOf(const host::LegacyReport& report) {
-  if (!report.isDone()) return report.migrator ? "failed" : "refused";
-  return report.migrator ? "done" : "not needed";
-}
-
 void printAsJson(const DeviceImage& image, const host::LegacyReport& report, const Log& log) {
   nlohmann::json json;
   json["image"] = image.rootPath();
-  json["result"] = resultOf(report);
+  json["result"] = host::resultOf(report);
   json["mail_accounts"] = report.need.mailAccounts;
   json["data_access"] = report.need.dataAccess;
   json["older_version"] = report.need.olderVersion;
-  json["settings"] = nameOf(report.settings);
+  json["settings"] = host::nameOf(report.settings);
   json["accounts"] = host::readSettings(image).accounts.size();
   json["kept_copies"] = report.keptSettings;
   json["reasons"] = report.reasons;
@@ -109,24 +90,13 @@ void printAsJson(const DeviceImage& image, const host::LegacyReport& report, con
   printJson(json);
 }
 
-std::string sourcesOf(const host::LegacyNeed& need) {
-  if (!need.dataAccess) return "the legacy mail accounts";
-  return need.mailAccounts ? "the legacy mail accounts and data-access preferences"
-                           : "the legacy data-access preferences";
-}
-
 void printAsText(const DeviceImage& image, const host::LegacyReport& report) {
   const std::size_t count = host::readSettings(image).accounts.size();
-  const std::string accounts = fmt::format("{} account{}", count, count == 1 ? "" : "s");
-  const std::string file = forTerminal(image.settingsFile());
   if (!report.migrator)
     fmt::print("nothing to migrate\n");
-  else if (report.settings == host::SettingsFate::untouched)
-    fmt::print("{}: another program has migrated it meanwhile\n", file);
-  else if (report.need.olderVersion)
-    fmt::print("{}: brought to version {}, {}\n", file, host::kPresentVersion, accounts);
   else
-    fmt::print("{}: built from {}, {}\n", file, sourcesOf(report.need), accounts);
+    fmt::print("{}: {}, {} account{}\n", forTerminal(image.settingsFile()), host::describe(report),
+               count, count == 1 ? "" : "s");
   for (const std::string& copy : report.keptSettings)
     fmt::print("{}: kept from before a migration\n", forTerminal(copy));
 }

@@ -16,6 +16,8 @@ constexpr const char* kFooter = R"(Examples:
       prints the report for programs
   migration-host run --image ada --bundle ./Other.migrator --timeout 60
       runs one migrator alone and stops it after a minute
+  migration-host run --image old --legacy
+      makes a settings file of legacy files or of an older one first
 
 Exit codes: 0 done and verified; 1 unexpected failure; 2 wrong usage; 3 done, but
 records or accounts were left behind; 5 verification failed; 7 a check before the
@@ -36,6 +38,8 @@ ParsedCommandLine parseCommandLine(int argumentCount, char** arguments) {
   run->footer(kFooter);
   run->add_option("--image", command.image, "The device image's directory")->required();
   run->add_option("--bundle", command.bundle, "Run only the migrator in this folder");
+  run->add_flag("--legacy", command.legacy,
+                "First make the settings file of what older systems left, if they did");
   run->add_flag("--json", command.json, "Print the report as JSON, and nothing else");
   run->add_option("--log", command.logFile, "Write the migrators' log lines to this file too");
   run->add_option("--timeout", seconds, "Stop a migrator after this many seconds")

@@ -16,6 +16,7 @@ struct CommandLine {
   std::optional<std::string> bundle;
   std::optional<std::string> logFile;
   std::chrono::seconds limit = kStandardLimit;
+  bool legacy = false;
   bool json = false;
   bool quiet = false;
 };

@@ -41,6 +41,15 @@ Json jsonOf(const host::DataclassReport& line) {
           {"left_behind", line.leftBehind}};
 }
 
+Json jsonOf(const host::LegacyReport& legacy) {
+  Json json = {
+      {"result", host::resultOf(legacy)},          {"mail_accounts", legacy.need.mailAccounts},
+      {"data_access", legacy.need.dataAccess},     {"older_version", legacy.need.olderVersion},
+      {"settings", host::nameOf(legacy.settings)}, {"kept_copies", legacy.keptSettings}};
+  if (legacy.migrator) json["migrator"] = jsonOf(*legacy.migrator);
+  return json;
+}
+
 template <typename Item>
 Json jsonOfAll(const std::vector<Item>& items) {
   Json json = Json::array();
@@ -51,16 +60,17 @@ Json jsonOfAll(const std::vector<Item>& items) {
 }  // namespace
 
 std::string jsonReport(const host::MigrationReport& report) {
-  const Json json = {{"image", report.image},
-                     {"outcome", wordFor(report.outcome)},
-                     {"exit_code", static_cast<int>(report.outcome)},
-                     {"reasons", report.reasons},
-                     {"migrators", jsonOfAll(report.migrators)},
-                     {"accounts", jsonOfAll(report.accounts)},
-                     {"dataclasses", jsonOfAll(report.dataclasses)},
-                     {"balanced", report.balanced},
-                     {"log", report.log},
-                     {"log_was_cut", report.logWasCut}};
+  Json json = {{"image", report.image},
+               {"outcome", wordFor(report.outcome)},
+               {"exit_code", static_cast<int>(report.outcome)},
+               {"reasons", report.reasons},
+               {"migrators", jsonOfAll(report.migrators)},
+               {"accounts", jsonOfAll(report.accounts)},
+               {"dataclasses", jsonOfAll(report.dataclasses)},
+               {"balanced", report.balanced},
+               {"log", report.log},
+               {"log_was_cut", report.logWasCut}};
+  if (report.legacy) json["legacy"] = jsonOf(*report.legacy);
   return json.dump(2, ' ', false, Json::error_handler_t::replace) + "\n";
 }
 

@@ -135,6 +135,14 @@ std::string migratorOutput(const host::MigratorOutcome& migrator) {
   return text;
 }
 
+std::string legacyLines(const host::LegacyReport& legacy) {
+  std::string text = "Legacy settings: " + host::describe(legacy) + "\n";
+  for (const std::string& copy : legacy.keptSettings)
+    text += "Settings from before a migration: " + printable(copy) + "\n";
+  if (legacy.migrator) text += migratorOutput(*legacy.migrator);
+  return text;
+}
+
 }  // namespace
 
 std::string printable(std::string_view text) {
@@ -151,7 +159,8 @@ std::string printable(std::string_view text) {
 }
 
 std::string textReport(const host::MigrationReport& report, bool colours) {
-  std::string text = accountTable(report, colours);
+  std::string text = report.legacy ? legacyLines(*report.legacy) : std::string();
+  text += accountTable(report, colours);
   for (const host::MigratorOutcome& migrator : report.migrators) text += migratorOutput(migrator);
   for (const std::string& reason : report.reasons) text += printable(reason) + "\n";
   text +=

@@ -39,7 +39,8 @@ int run(const CommandLine& command) {
   {
     host::Interruption interruption;
     report = host::MigrationHost(terminal, interruption)
-                 .run({command.image, command.bundle, tools::installedMigrators(), command.limit});
+                 .run({command.image, command.bundle, tools::installedMigrators(), command.limit,
+                       command.legacy});
   }
   terminal.stageEnded();
   const std::string logProblem = terminal.closeLogFile();
@@ -61,6 +62,8 @@ int run(const CommandLine& command) {
 int main(int argumentCount, char** arguments) {
   if (host::isMigratorProcess(argumentCount, arguments))
     return host::runMigratorInThisProcess(arguments);
+  if (host::isLegacyProcess(argumentCount, arguments))
+    return host::migrateLegacyInThisProcess(arguments);
   const ParsedCommandLine parsed = parseCommandLine(argumentCount, arguments);
   if (!parsed.command) return parsed.exitCode;
   try {
