@@ -182,6 +182,20 @@ TEST(Calendars, ACalendarThatIsCutOffKeepsItsWholeRecords) {
   EXPECT_EQ(read.records[1].bytes, kHead + kTask + kTail);
 }
 
+TEST(Calendars, AFileThatIsCutOffBeforeALineEndGivesWholeRecords) {
+  const std::string record = kHead + kOnce + kTail;
+  const std::string cut = kHead + kOnce;
+  for (const std::size_t missing : {1U, 2U}) {  // of the last line end
+    const ReadText read = readCalendars(cut.substr(0, cut.size() - missing));
+    ASSERT_EQ(read.records.size(), 1U);
+    EXPECT_EQ(read.records[0].bytes, record);
+  }
+  const ReadText read = readCalendars("BEGIN:VCALENDAR\nVERSION:2.0\n" + kTask + "X-LAST:1");
+  ASSERT_EQ(read.records.size(), 1U);
+  EXPECT_EQ(read.records[0].bytes,
+            "BEGIN:VCALENDAR\nVERSION:2.0\nX-LAST:1\n" + kTask + "END:VCALENDAR\n");
+}
+
 TEST(Calendars, AnotherVersionIsRefusedAndTheNextCalendarRead) {
   const ReadText read = readCalendars("BEGIN:VCALENDAR\nVERSION:1.0\nEND:VCALENDAR\n" + kHead +
                                       kTask + kTail + "x\n");

@@ -126,12 +126,17 @@ class Divider {
     _room -= size;
     std::string text;
     text.reserve(size + 16);
-    for (const Span& part : parts) text += part.of(_bytes);
-    const std::string_view begin = _calendar.ownLines.front().of(_bytes);
-    text += _calendar.endLine         ? _calendar.endLine->of(_bytes)
-            : begin.ends_with("\r\n") ? "END:VCALENDAR\r\n"
-                                      : "END:VCALENDAR\n";
-    return withLineEnd(text);
+    const bool hasReturns = _calendar.ownLines.front().of(_bytes).ends_with("\r\n");
+    const auto add = [&](std::string_view part) {
+      text += part;
+      // The last line of a file that was cut off has none, and need not be the last one here.
+      if (part.ends_with('\n')) return;
+      if (hasReturns && !part.ends_with('\r')) text += '\r';
+      text += '\n';
+    };
+    for (const Span& part : parts) add(part.of(_bytes));
+    add(_calendar.endLine ? _calendar.endLine->of(_bytes) : "END:VCALENDAR");
+    return text;
   }
 
   // The time zones that the group names, in the order of the file. A zone that the calendar does
