@@ -59,36 +59,6 @@ TEST_F(DecisionTable, WithNothingOldNothingHappens) {
   EXPECT_FALSE(lockFileExists());
 }
 
-TEST_F(DecisionTable, ANewerVersionIsLeftAlone) {
-  for (const int version : {13, -1}) {
-    writeSettings(version);
-    const auto before = bytesOf(kSettingsFile);
-    EXPECT_FALSE(ASSAccountsManager::accountSettingsNeedsToBeMigrated());
-    EXPECT_EQ(bytesOf(kSettingsFile), before);
-  }
-  migrate();
-  EXPECT_EQ(log(), Lines());
-  EXPECT_FALSE(lockFileExists());
-}
-
-TEST_F(DecisionTable, SettingsWithoutAVersionAreLeftAlone) {
-  write(kSettingsFile, {{"Accounts", Array()}});
-  const auto before = bytesOf(kSettingsFile);
-  migrate();
-  EXPECT_EQ(log(), Lines{"Account Settings plist is missing a version number, returning NO for "
-                         "migration"});
-  EXPECT_EQ(bytesOf(kSettingsFile), before);
-  EXPECT_FALSE(lockFileExists());
-}
-
-TEST_F(DecisionTable, UnreadableSettingsAreLeftAlone) {
-  writeBytes(kSettingsFile, "rubbish");
-  migrate();
-  EXPECT_EQ(log(), Lines());
-  EXPECT_EQ(bytesOf(kSettingsFile), "rubbish");
-  EXPECT_FALSE(lockFileExists());
-}
-
 TEST_F(DecisionTable, AnOutdatedVersionIsBroughtUpToDate) {
   writeSettings(11);
   migrate();

@@ -1,4 +1,4 @@
-"""Files and values of every kind, read and merged: rows R1, R3 and R4 of docs/reliability.md."""
+"""Files and values of every kind, read and merged: rows R1 to R4 of docs/reliability.md."""
 
 import concurrent.futures
 import pathlib
@@ -6,7 +6,8 @@ import re
 import subprocess
 import sys
 
-EXCHANGE = pathlib.Path(__file__).resolve().parents[1] / "propertylist/exchange.py"
+TOP = pathlib.Path(__file__).resolve().parents[2]
+EXCHANGE = TOP / "tests/propertylist/exchange.py"
 SEED = 20261121
 BATCH = 2500
 
@@ -30,6 +31,20 @@ def damaged_lists(found, _directory, _is_full):
     return sum(count for count, _ in results), [text for _, bad in results for text in bad]
 
 
+def fuzzed(_found, _directory, is_full):
+    """Every target of fuzz/ for some seconds, or for five minutes each."""
+    done = subprocess.run([str(TOP / "fuzz/run"), "25" if is_full else "0.5"], check=False,
+                          stdout=subprocess.PIPE, stderr=subprocess.STDOUT, text=True, errors="replace")
+    lines = re.findall(r"^([a-z-]+) +(\d+) runs +(\d+) crashes$", done.stdout, re.MULTILINE)
+    for name, runs, crashes in lines:
+        print(f"     R2 {name:<14} {runs:>12} runs {crashes:>4} crashes", flush=True)
+    bad = [(name, "crashed; the input lies in build/fuzz/crashes") for name, _, crashes in lines
+           if crashes != "0"]
+    if not lines or (done.returncode != 0) != bool(bad):
+        bad.append(("fuzz/run", f"ended with {done.returncode}: {done.stdout[-300:]}"))
+    return sum(int(runs) for _, runs, _ in lines), bad
+
+
 def exchanged_values(found, _directory, is_full):
     """Half of the values are written by the product and read by Python's plistlib, half the other way."""
     total = 200_000 if is_full else 20_000
@@ -51,6 +66,7 @@ def merged_triples(found, _directory, _is_full):
 
 ROWS = {
     "R1": ("damaged property lists are read within the limits", damaged_lists),
+    "R2": ("fuzzers under the sanitizers", fuzzed),
     "R3": ("values are exchanged with an independent reader", exchanged_values),
     "R4": ("all small merges, against a model", merged_triples),
 }

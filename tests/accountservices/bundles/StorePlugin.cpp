@@ -26,6 +26,6 @@ class StorePluginClass : public platform::RuntimeClass, public StorePlugin {
   }
 };
 
-auto& storePlugin = *new StorePluginClass;
+StorePluginClass storePlugin;
 
 }  // namespace

@@ -1,0 +1,130 @@
+// The input's first byte chooses one of the image's own files, which gets the other bytes: the
+// property lists of the device, of programs and of configuration profiles, the settings as the host
+// sees them, a migrator's Info.plist, and the lists of users and groups. Whoever reads them
+// answers.
+#include <stdlib.h>
+
+#include <array>
+#include <filesystem>
+#include <fstream>
+#include <stdexcept>
+
+#include "deviceimage/DeviceImageServices.h"
+#include "deviceimage/SyncAgent.h"
+#include "fuzz/Check.h"
+#include "host/MigratorBundle.h"
+#include "host/Settings.h"
+#include "host/StartChecks.h"
+
+namespace {
+
+using deviceimage::DeviceImage;
+constexpr std::string_view kBundle = "System/Library/DataClassMigrators/Some.migrator";
+
+// An image in the directory of temporary files, which goes with the process.
+class Image {
+ public:
+  Image() {
+    std::string path = (std::filesystem::temp_directory_path() / "fuzz-image-XXXXXX").string();
+    if (::mkdtemp(path.data()) == nullptr) throw std::runtime_error("cannot make " + path);
+    _path = path;
+    image = DeviceImage::create(path).image;
+    if (image == nullptr) throw std::runtime_error("cannot make an image in " + path);
+    deviceimage::ServiceOptions options;
+    options.writesLog = false;
+    services = std::make_unique<deviceimage::DeviceImageServices>(image, options);
+  }
+  ~Image() {
+    std::error_code ignored;
+    std::filesystem::remove_all(_path, ignored);
+  }
+  Image(const Image&) = delete;
+  Image& operator=(const Image&) = delete;
+
+  void write(std::string_view name, std::span<const std::uint8_t> bytes) const {
+    const std::filesystem::path path = image->absolutePath(name);
+    std::filesystem::create_directories(path.parent_path());
+    std::ofstream file(path, std::ofstream::binary | std::ofstream::trunc);
+    file.write(reinterpret_cast<const char*>(bytes.data()),
+               static_cast<std::streamsize>(bytes.size()));
+  }
+
+  std::shared_ptr<const DeviceImage> image;
+  std::unique_ptr<deviceimage::DeviceImageServices> services;
+
+ private:
+  std::filesystem::path _path;
+};
+
+void readSettings(const DeviceImage& image, bool isDictionary) {
+  const host::Settings settings = host::readSettings(image);
+  FUZZ_CHECK(settings.error.empty() == isDictionary);
+  host::Selection selection{"QuillnetStatus", {{{"Quillnet", "VantorAccount"}, 1}}};
+  for (const propertylist::Dictionary& account : settings.accounts) {
+    if (selection.covers(account)) FUZZ_CHECK(!host::typeOf(account).empty());
+    deviceimage::SyncAgent(image).storeIdentifier(account, deviceimage::Dataclass::calendars);
+  }
+  const auto reasons = host::reasonsNotToStart(image, settings, {});
+  FUZZ_CHECK(isDictionary || !reasons.empty());
+}
+
+void readBundle(const DeviceImage& image) {
+  const host::ReadBundle read = host::readMigratorBundle(image.absolutePath(kBundle));
+  FUZZ_CHECK(read.bundle.has_value() == read.problems.empty());
+  FUZZ_CHECK(host::readMigratorBundlesOfImage(image).size() <= 1);
+}
+
+}  // namespace
+
+extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
+  static const Image made;
+  const DeviceImage& image = *made.image;
+  const platform::Services& services = made.services->services();
+  if (size == 0) return 0;
+  const std::array names = {std::string(DeviceImage::kDevicePropertiesFile),
+                            std::string(DeviceImage::kProcessDefaultsFile),
+                            std::string(DeviceImage::kRestrictionsFile),
+                            *DeviceImage::preferencesFile(deviceimage::SyncAgent::kApplication),
+                            std::string(DeviceImage::kSettingsFile),
+                            std::string(kBundle) + "/Info.plist",
+                            std::string(DeviceImage::kUsersFile),
+                            std::string(DeviceImage::kGroupsFile)};
+  const std::size_t chosen = data[0] % names.size();
+  const std::span<const std::uint8_t> bytes(data + 1, size - 1);
+  made.write(names[chosen], bytes);
+  const propertylist::ReadResult list = propertylist::readPropertyList(bytes);
+  const bool isDictionary = list.value && list.value->asDictionary() != nullptr;
+  const auto has = [&](std::string_view key) {
+    return isDictionary && list.value->asDictionary()->contains(key);
+  };
+  switch (chosen) {
+    case 0:
+      FUZZ_CHECK(!services.deviceInfo.queryValue("key") || has("key"));
+      break;
+    case 1:
+      FUZZ_CHECK(services.preferences.readDefault("key").has_value() == has("key"));
+      break;
+    case 2:
+      FUZZ_CHECK(
+          services.restrictions.featureRestriction(platform::RestrictedFeature::photoStream) == 0 ||
+          has("PhotoStream"));
+      break;
+    case 3:
+      FUZZ_CHECK(!deviceimage::SyncAgent(image).quillnetStoreIdentifier() ||
+                 has(deviceimage::SyncAgent::kAccountNameKey));
+      break;
+    case 4:
+      readSettings(image, isDictionary);
+      break;
+    case 5:
+      readBundle(image);
+      break;
+    case 6:
+      image.userNumber("mobile");
+      break;
+    default:
+      image.groupNumber("mobile");
+      break;
+  }
+  return 0;
+}
