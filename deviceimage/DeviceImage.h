@@ -127,6 +127,14 @@ class DeviceImage {
   OpenedFile openFile(std::string_view relative, int flags) const;
   // Makes the directory with those above it; success when it is there.
   platform::Status makeDirectory(std::string_view relative) const;
+  // The directory that holds `relative`, opened without following links, and the last component.
+  // The caller closes the descriptor; -1 on failure.
+  struct Parent {
+    platform::Status status;
+    int descriptor = -1;
+    std::string name;
+  };
+  Parent openParent(std::string_view relative) const { return _openParent(relative, false); }
   FileLook lookAt(std::string_view relative) const;
   // Whether a file or directory is there; a link is not.
   bool exists(std::string_view relative) const;
@@ -164,12 +172,6 @@ class DeviceImage {
 
  private:
   DeviceImage(std::string rootPath, int rootDescriptor);
-  // The directory that holds `relative`, opened without following links, and the last component.
-  struct Parent {
-    platform::Status status;
-    int descriptor = -1;
-    std::string name;
-  };
   Parent _openParent(std::string_view relative, bool makeMissing) const;
   // Gives what root has just made under var/mobile to the image's user.
   platform::Status _handOver(int descriptor, std::string_view relative) const;

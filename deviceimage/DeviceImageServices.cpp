@@ -5,6 +5,7 @@
 #include "deviceimage/Database.h"
 #include "deviceimage/ImageCalendarStore.h"
 #include "deviceimage/ImageContactsStore.h"
+#include "deviceimage/ImageFileServices.h"
 #include "deviceimage/ImageLock.h"
 #include "deviceimage/ImageMessages.h"
 #include "deviceimage/ImagePreferences.h"
@@ -13,7 +14,6 @@
 #include "platform/posix/DlAddrBundleResources.h"
 #include "platform/posix/LinuxProcessTable.h"
 #include "platform/posix/MonotonicClock.h"
-#include "platform/posix/PosixFileServices.h"
 #include "platform/posix/ProcessClassRegistry.h"
 #include "platform/posix/RandomUUIDGenerator.h"
 
@@ -29,6 +29,7 @@ class DeviceImageServices::Implementation {
         _contactsStore(_databases),
         _deviceInfo(image),
         _fileLocks(image),
+        _fileServices(image),
         _preferences(image),
         _processTable(image->rootPath()),
         _restrictions(image),
@@ -56,7 +57,7 @@ class DeviceImageServices::Implementation {
   ImageContactsStore _contactsStore;
   ImageDeviceInfo _deviceInfo;
   ImageFileLocks _fileLocks;
-  platform::PosixFileServices _fileServices;
+  ImageFileServices _fileServices;
   ImagePreferences _preferences;
   platform::LinuxProcessTable _processTable;
   ImageRestrictions _restrictions;

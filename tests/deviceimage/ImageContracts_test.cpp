@@ -9,6 +9,7 @@
 #include "tests/contracts/ContactsStoreContract.h"
 #include "tests/contracts/DeviceInfoContract.h"
 #include "tests/contracts/ExclusiveFileLockContract.h"
+#include "tests/contracts/FileServicesContract.h"
 #include "tests/contracts/NotifyCenterContract.h"
 #include "tests/contracts/PreferencesContract.h"
 #include "tests/contracts/ProcessTableContract.h"
@@ -257,6 +258,14 @@ class ImageAccounts : public OnAnImage<AccountFrameworkUnderTest> {
 };
 INSTANTIATE_TEST_SUITE_P(DeviceImage, AccountFrameworkContract,
                          Values(portOf<ImageAccounts>("DeviceImage")));
+
+class ImageFiles : public OnAnImage<FileServicesUnderTest> {
+ public:
+  platform::FileServices& service() override { return services().fileServices; }
+  std::string directory() override { return image.image->temporaryDirectory(); }
+};
+INSTANTIATE_TEST_SUITE_P(DeviceImage, FileServicesContract,
+                         Values(portOf<ImageFiles>("DeviceImage")));
 
 class ImageLocks : public OnAnImage<ExclusiveFileLockUnderTest> {
  public:

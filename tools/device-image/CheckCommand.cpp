@@ -7,6 +7,7 @@
 #include "deviceimage/RecordStores.h"
 #include "tools/common/Images.h"
 #include "tools/common/Program.h"
+#include "tools/common/Text.h"
 #include "tools/device-image/AccountServices.h"
 #include "tools/device-image/AccountTypes.h"
 #include "tools/device-image/Commands.h"
@@ -100,7 +101,7 @@ ExitCode run(const Options& options) {
       printMessage(fmt::format("{}: {}", image->absolutePath(problem.path), problem.text));
     for (const ImageProblem& warning : services.warnings)
       printMessage(fmt::format("{}: warning: {}", image->absolutePath(warning.path), warning.text));
-    if (found.empty()) fmt::print("{}: sound\n", image->rootPath());
+    if (found.empty()) fmt::print("{}: sound\n", forTerminal(image->rootPath()));
   }
   return found.empty() ? ExitCode::done : ExitCode::imageDamaged;
 }

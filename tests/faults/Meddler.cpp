@@ -1,0 +1,96 @@
+// A library for LD_PRELOAD that does what others who may write somewhere do at the worst moment.
+//   MEDDLER_NAMES=A:B   the names that tempnam proposes, in turn; after the last one, its own
+//   MEDDLER_LINK=PATH   the name of a file that is about to be given away becomes a link to PATH
+//   MEDDLER_GROW=PATH   the file grows by a MiB before each read of it, without end
+//   MEDDLER_SWAP=A:B    A and B change places before each opening, so that no look at a path holds
+#include <dlfcn.h>
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <array>
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <string>
+
+namespace {
+
+template <typename Function>
+Function* original(const char* name) {
+  return reinterpret_cast<Function*>(dlsym(RTLD_NEXT, name));
+}
+
+std::string nameOf(int descriptor) {
+  std::array<char, 4096> name = {};
+  const std::string link = "/proc/self/fd/" + std::to_string(descriptor);
+  const ssize_t size = readlink(link.c_str(), name.data(), name.size() - 1);
+  return size > 0 ? std::string(name.data(), static_cast<std::size_t>(size)) : std::string();
+}
+
+}  // namespace
+
+#define EXPORTED extern "C" __attribute__((visibility("default")))
+
+EXPORTED char* tempnam(const char* directory, const char* prefix) {
+  static const char* names = std::getenv("MEDDLER_NAMES");
+  if (names == nullptr || *names == '\0')
+    return original<decltype(tempnam)>("tempnam")(directory, prefix);
+  const std::size_t size = std::strcspn(names, ":");
+  char* const name = strndup(names, size);
+  names += size + (names[size] == ':' ? 1 : 0);
+  return name;
+}
+
+EXPORTED int fchown(int descriptor, uid_t user, gid_t group) noexcept {
+  if (const char* target = std::getenv("MEDDLER_LINK")) {
+    const std::string name = nameOf(descriptor);
+    if (unlink(name.c_str()) != 0 || symlink(target, name.c_str()) != 0) std::abort();
+  }
+  return original<decltype(fchown)>("fchown")(descriptor, user, group);
+}
+
+EXPORTED ssize_t read(int descriptor, void* buffer, std::size_t size) {
+  const char* growing = std::getenv("MEDDLER_GROW");
+  struct stat status = {};
+  if (growing != nullptr && nameOf(descriptor) == growing && fstat(descriptor, &status) == 0 &&
+      truncate(growing, status.st_size + (1 << 20)) != 0)
+    std::abort();
+  return original<decltype(read)>("read")(descriptor, buffer, size);
+}
+
+namespace {
+
+void swapPlaces() {
+  static const char* const swapped = std::getenv("MEDDLER_SWAP");
+  if (swapped == nullptr) return;
+  const std::string both = swapped;
+  const std::size_t colon = both.find(':');
+  if (renameat2(AT_FDCWD, both.substr(0, colon).c_str(), AT_FDCWD, both.substr(colon + 1).c_str(),
+                RENAME_EXCHANGE) != 0)
+    std::abort();
+}
+
+mode_t modeAmong(int flags, __builtin_va_list& arguments) {
+  return (flags & O_CREAT) != 0 ? __builtin_va_arg(arguments, mode_t) : 0;
+}
+
+}  // namespace
+
+EXPORTED int openat(int directory, const char* path, int flags, ...) {
+  __builtin_va_list arguments;
+  __builtin_va_start(arguments, flags);
+  const mode_t mode = modeAmong(flags, arguments);
+  __builtin_va_end(arguments);
+  swapPlaces();
+  return original<int(int, const char*, int, ...)>("openat")(directory, path, flags, mode);
+}
+
+EXPORTED int open(const char* path, int flags, ...) {
+  __builtin_va_list arguments;
+  __builtin_va_start(arguments, flags);
+  const mode_t mode = modeAmong(flags, arguments);
+  __builtin_va_end(arguments);
+  swapPlaces();
+  return original<int(const char*, int, ...)>("open")(path, flags, mode);
+}

@@ -1,0 +1,223 @@
+"""Security cases about other users of the machine: private files, plug-ins that they may change, locks."""
+
+import fcntl
+import os
+import pathlib
+import re
+import shutil
+import subprocess
+
+from hostile_image import OTHER_USER, as_other
+
+HELD = 11
+PYTHON = "/usr/bin/python3"  # one that other users can run
+# Tries to read and to write every file of the image that it can get at, until it is told to stop.
+INTRUDER = r"""
+import os, select, sys
+root, opened = sys.argv[1], set()
+print("ready", flush=True)
+while not select.select([sys.stdin], [], [], 0)[0]:
+    for place, _, names in os.walk(root):
+        for name in names:
+            path = os.path.join(place, name)
+            for flags in (os.O_RDONLY, os.O_WRONLY):
+                try:
+                    os.close(os.open(path, flags | os.O_NONBLOCK | os.O_NOFOLLOW))
+                    opened.add(path)
+                except OSError:
+                    pass
+print(len(opened), *sorted(opened), flush=True)
+"""
+MAKING_CALL = re.compile(r'\b(openat|open|mkdir|mkdirat|mknod|mknodat|creat)\(.*?"([^"]*)".*?(?:, (0\d+))?\) = \d')
+
+
+def change_everything(image):
+    """One command each that makes settings, records, copies and logs."""
+    root, outside = image.root, image.outside
+    yield [image.found["fault_saver"], "many", root, "A", 50]
+    yield [image.found["device-image"], "add-account", root, "--type", "CalDAV", "--identifier", "New"]
+    yield [image.found["device-image"], "import", root, "--dataclass", "notes", "--account", "Q1",
+           image.directory / "note.txt"]
+    yield [image.found["account-settings"], "set", "A", "Key", "value", "--image", root]
+    yield [image.found["migration-host"], "run", "--image", root, "--log", outside / "log"]
+    yield [image.found["device-image"], "export", root, "--dataclass", "contacts", "--output", outside / "cards"]
+
+
+def intruder_in_a_loop(image):
+    """Another user tries to open every file while it is made, where directories and umask allow it."""
+    image.open_to_others()
+    image.outside.chmod(0o755)
+    (image.directory / "note.txt").write_text("Subject: x\n\ny\n")
+    intruder = subprocess.Popen([PYTHON, "-c", INTRUDER, str(image.directory)], stdin=subprocess.PIPE,
+                                stdout=subprocess.PIPE, text=True, **as_other())
+    try:
+        # What the test itself made is not meant.
+        for path in (image.directory / "note.txt", image.directory / "cards.vcf"):
+            path.chmod(0o600)
+        image.directory.joinpath("base").chmod(0o700)
+        intruder.stdout.readline()
+        for command in change_everything(image):
+            done = image.run(command, umask=0)
+            if done.returncode not in (0, 3):
+                return f"{command[:2]} ended with {done.returncode}: {done.stderr[-200:]}"
+    finally:
+        output, _ = intruder.communicate("stop\n", timeout=60)
+        (image.directory / "cards.vcf").chmod(0o644)
+    count, *names = output.split(maxsplit=1)
+    return "" if count == "0" else f"another user has opened {names}"
+
+
+def modes_when_made(image):
+    """No call makes a file or directory that others could use, even before its mode is changed."""
+    (image.directory / "note.txt").write_text("Subject: x\n\ny\n")
+    trace = image.directory / "trace"
+    for command in change_everything(image):
+        done = image.run(["strace", "-f", "-qq", "-o", trace, "-e", "trace=openat,open,mkdir,mkdirat,mknod,creat",
+                          "--", *command], umask=0)
+        if done.returncode not in (0, 3):
+            return f"{command[:2]} ended with {done.returncode}"
+        for line in trace.read_text(errors="replace").splitlines():
+            made = MAKING_CALL.search(line)
+            if made and made[3] and int(made[3], 8) & 0o077 and ("O_CREAT" in line or "mk" in made[1]):
+                return f"{os.path.basename(command[0])} {command[1]}: {line}"
+    return ""
+
+
+def nothing_is_public(image):
+    """After all of it no file of the image can be used by others."""
+    (image.directory / "note.txt").write_text("Subject: x\n\ny\n")
+    for command in change_everything(image):
+        image.run(command, umask=0)
+    for path in [*image.root.rglob("*"), image.outside / "log", image.outside / "cards"]:
+        if path.lstat().st_mode & 0o077:
+            return f"others may use {path.name}: {path.lstat().st_mode:o}"
+    return ""
+
+
+BUNDLE = "LogsAndSucceeds"
+
+
+def plugin(change, in_image=False):
+    """A plug-in that others may write, or replace, is not loaded."""
+    def case(image):
+        place = image.root / "System/Library/DataClassMigrators" if in_image else image.directory / "plug-ins"
+        place.mkdir(exist_ok=True)
+        bundle = place / f"{BUNDLE}.migrator"
+        try:
+            shutil.copytree(pathlib.Path(image.found["bundles"]) / bundle.name, bundle)
+            for path in [bundle, *bundle.rglob("*")]:
+                path.chmod(0o755)
+            if image.host(*([] if in_image else ["--bundle", bundle])).returncode not in (0, 3):
+                return "the plug-in is refused as it is"
+            image.reset()
+            if in_image:
+                shutil.copytree(pathlib.Path(image.found["bundles"]) / bundle.name, bundle)
+            change(bundle)
+            done = image.host(*([] if in_image else ["--bundle", bundle]))
+            if done.returncode != 7 or b"first line of" in done.stderr:
+                return f"the host ended with {done.returncode}"
+            return ""
+        finally:
+            shutil.rmtree(place)
+    return case
+
+
+def give_away(path):
+    os.chown(path, OTHER_USER, OTHER_USER)
+
+
+def replace_by_link(path):
+    path.rename(path.with_suffix(".real"))
+    path.symlink_to(path.with_suffix(".real"))
+
+
+def library(bundle):
+    return bundle / f"{BUNDLE}.so"
+
+
+def own_group(path):
+    os.chown(path, 0, OTHER_USER)
+    path.chmod(0o775)
+
+
+PLUGINS = {
+    "its library may be written": lambda bundle: library(bundle).chmod(0o757),
+    "its folder may be written": lambda bundle: bundle.chmod(0o777),
+    "the folder above may be written": lambda bundle: bundle.parent.chmod(0o777),
+    "its information may be written": lambda bundle: (bundle / "Info.plist").chmod(0o666),
+    "a group may write its library": lambda bundle: own_group(library(bundle)),
+    "its library is another user's": lambda bundle: give_away(library(bundle)),
+    "its folder is another user's": give_away,
+    "the folder above is another user's": lambda bundle: give_away(bundle.parent),
+    "its library is a link": lambda bundle: replace_by_link(library(bundle)),
+}
+
+
+def held_by_another(image):
+    """Another user holds the image's lock for ever: everybody is told so and turned away."""
+    lock = image.root / "var/run/image.lock"
+    with open(lock, "a+b") as file:
+        os.fchmod(file.fileno(), 0o666)
+        fcntl.flock(file, fcntl.LOCK_EX)
+        holder = subprocess.Popen(["sleep", "1000"], pass_fds=[file.fileno()], **as_other())
+    try:
+        for command in [*image.commands()[1:2], *image.commands()[4:6], image.commands()[7]]:
+            done = image.run(command)
+            if done.returncode != HELD:
+                return f"{os.path.basename(command[0])} {command[1]} ended with {done.returncode}"
+    finally:
+        holder.kill()
+        holder.wait()
+    return "" if image.host().returncode == 0 else "the lock is not free when its holder has gone"
+
+
+def lock_that_others_may_not_take(name):
+    def case(image):
+        image.open_to_others()
+        for command in change_everything(image):
+            image.run(command)
+            break
+        image.run([image.found["fault_saver"], "add", image.root, "L", 1], umask=0)
+        image.host()
+        path = image.root / name
+        if not path.exists():
+            return f"{name} is not there"
+        done = subprocess.run(["flock", "-n", str(path), "true"], check=False, capture_output=True, **as_other())
+        return "another user can take the lock" if done.returncode == 0 else ""
+    return case
+
+
+def lock_planted_by_another(name):
+    """Another user made the lock file first, a link, or holds it: a migration does not wait for it."""
+    def case(image):
+        image.open_to_others()
+        path = image.root / name
+        path.unlink(missing_ok=True)
+        path.parent.chmod(0o1777)
+        holder = subprocess.Popen(["flock", str(path), "sleep", "1000"], start_new_session=True, **as_other())
+        try:
+            while not path.exists():
+                if holder.poll() is not None:
+                    return "the lock could not be planted"
+            code = image.host().returncode
+            return "" if code in (0, HELD) else f"the host ended with {code}"
+        finally:
+            os.killpg(holder.pid, 9)
+            holder.wait()
+    return case
+
+
+CASES = {
+    "another user opens every new file in a loop": intruder_in_a_loop,
+    "modes of new files at the moment they are made": modes_when_made,
+    "nothing is public afterwards": nothing_is_public,
+    **{f"a plug-in: {kind}": plugin(change) for kind, change in PLUGINS.items()},
+    "a plug-in of the image: its library may be written": plugin(
+        lambda bundle: library(bundle).chmod(0o757), in_image=True),
+    "a plug-in of the image: its folder is another user's": plugin(give_away, in_image=True),
+    "another user holds the image's lock": held_by_another,
+    "another user takes the image's lock": lock_that_others_may_not_take("var/run/image.lock"),
+    "another user takes the migration lock": lock_that_others_may_not_take("tmp/AccountMigrationInProgress"),
+    "another user has made the image's lock": lock_planted_by_another("var/run/image.lock"),
+    "another user has made the migration lock": lock_planted_by_another("tmp/AccountMigrationInProgress"),
+}

@@ -1,0 +1,28 @@
+"""What others on the machine, and hostile files and names, can do: row X1 of docs/reliability.md."""
+
+import hostile_texts
+import matrix
+import other_users
+import planted_files
+from hostile_image import HostileImage
+
+CASES = {**planted_files.CASES, **hostile_texts.CASES, **other_users.CASES}
+
+
+def security(found, directory, is_full):
+    """All cases, always: they take no longer than their images."""
+    directory.chmod(0o711)
+    images = [HostileImage(found, directory / f"x{worker}") for worker in range(2)]
+
+    def judge(case, worker):
+        image = images[worker]
+        image.reset()
+        try:
+            wrong = CASES[case](image)
+        except Exception as error:  # a case that cannot be set up, or a program that does not end
+            wrong = repr(error)
+        return wrong or ("" if image.is_secret_kept() else "the secret is not what it was")
+    return len(CASES), matrix.judge_all(list(CASES), judge)
+
+
+ROWS = {"X1": ("other users, planted files, hostile names", security)}
