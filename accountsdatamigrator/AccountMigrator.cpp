@@ -20,8 +20,10 @@ std::string pathAtHome(std::string_view path) {
   return platform::joinedPath(platform::services().userDatabase.homeDirectory(), path);
 }
 
+// The library looks for the settings below the system's root, wherever the home directory is.
 std::string settingsFile() {
-  return pathAtHome("Library/Preferences/com.vantor.accountsettings.plist");
+  return platform::joinedPath(platform::services().deviceInfo.systemRootDirectory(),
+                              "/var/mobile/Library/Preferences/com.vantor.accountsettings.plist");
 }
 
 // The path of what is there, be it a file or not; empty when nothing is.
