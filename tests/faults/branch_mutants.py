@@ -1,0 +1,118 @@
+"""Turns each conditional jump of a source file, once into an unconditional one and once into none, and looks
+whether tests notice: row Q2 of docs/reliability.md.
+
+The file is compiled without optimisation to assembly, where a line table leads from each jump to its source
+line; so a mutant costs an assembling and a linking. It is linked into what the ordinary build links it into.
+"""
+
+import collections
+import concurrent.futures
+import json
+import os
+import re
+import shlex
+import subprocess
+
+JUMP = re.compile(r"^(\s+)j(?!mp)[a-z]+(\s+)(\.L\w+)")
+FILE = re.compile(r'\s+\.file\s+(\d+)\s+(?:"[^"]*"\s+)?"([^"]*)"')
+LINE = re.compile(r"\s+\.loc\s+(\d+)\s+(\d+)")
+LIMIT = 60  # seconds of one test run; a mutant that takes longer is noticed
+
+Mutant = collections.namedtuple("Mutant", "index line always")
+
+
+class Program:
+    """How a build links a test program or library, and the tests that look at it.
+
+    `output` is the file of the build folder, `tests` a list of commands in which {program} stands for the test
+    program; a library is found by its program through its folder."""
+
+    def __init__(self, build, output, tests):
+        self.build, self.output, self.tests = build, output, tests
+        commands = subprocess.run(["ninja", "-t", "commands", output], cwd=build, check=True,
+                                  stdout=subprocess.PIPE, text=True).stdout.splitlines()
+        parts = [part for part in commands[-1].split(" && ") if f"-o {output}" in part]
+        if len(parts) != 1:
+            raise SystemExit(f"no one command links {output}")
+        self.command = shlex.split(parts[0])
+
+    def link(self, ours, source, place):
+        """Links with `ours` in place of what was made of `source`."""
+        made = os.path.join(place, os.path.basename(self.output))
+        command = [word for word in self.command if not word.endswith(f"{source}.o")]
+        command[command.index(self.output)] = made
+        command.insert(command.index("-o"), ours)
+        return made if run(command, self.build) == 0 else None
+
+    def notices(self, made):
+        environment = {**os.environ, "LD_LIBRARY_PATH": os.path.dirname(made)}
+        return any(run([word.replace("{program}", made) for word in test], self.build, environment) != 0
+                   for test in self.tests)
+
+
+def run(command, directory, environment=None):
+    try:
+        return subprocess.run(command, cwd=directory, env=environment, timeout=LIMIT, check=False,
+                              stdin=subprocess.DEVNULL, stdout=subprocess.DEVNULL,
+                              stderr=subprocess.DEVNULL).returncode
+    except subprocess.TimeoutExpired:
+        return "timeout"
+
+
+def assembly_of(build, source, place):
+    entries = json.loads((build / "compile_commands.json").read_text(encoding="utf-8"))
+    entry = next(entry for entry in entries if entry["file"].endswith("/" + source))
+    command = [word for word in shlex.split(entry["command"]) if word not in ("-c", "ccache", "/usr/bin/ccache")]
+    text = os.path.join(place, "whole.s")
+    command[command.index("-o") + 1] = text
+    if run([*command, "-O0", "-g", "-S"], entry["directory"]) != 0:
+        raise SystemExit(f"{source} does not compile")
+    with open(text, encoding="utf-8") as lines:
+        return command[0], lines.read().split("\n")
+
+
+def mutants_of(lines, source):
+    files, where, mutants = {}, None, []
+    for index, line in enumerate(lines):
+        if match := FILE.match(line):
+            files[match[1]] = os.path.basename(match[2])
+        elif match := LINE.match(line):
+            where = int(match[2]) if files.get(match[1]) == os.path.basename(source) else None
+        elif JUMP.match(line) and where:
+            mutants += [Mutant(index, where, True), Mutant(index, where, False)]
+    return mutants
+
+
+def noticed(compiler, lines, mutant, program, source, place):
+    """None when the mutant cannot be built."""
+    mutated = list(lines)
+    if mutant:
+        mutated[mutant.index] = JUMP.sub(r"\1jmp\2\3", lines[mutant.index]) if mutant.always else ""
+    os.makedirs(place, exist_ok=True)
+    text, ours = os.path.join(place, "mutant.s"), os.path.join(place, "mutant.o")
+    with open(text, "w", encoding="utf-8") as output:
+        output.write("\n".join(mutated))
+    made = program.link(ours, source, place) if run([compiler, "-c", "-o", ours, text], place) == 0 else None
+    return program.notices(made) if made else None
+
+
+def survivors(source, program, directory, workers=2):
+    """How many mutants of the source were tried, and those that no test noticed, as "line 12 always"."""
+    os.makedirs(directory)
+    compiler, lines = assembly_of(program.build, source, str(directory))
+    if noticed(compiler, lines, None, program, source, str(directory / "unchanged")) is not False:
+        raise SystemExit(f"{source}: the tests fail without a change")
+    mutants = mutants_of(lines, source)
+
+    def one(number):
+        place = str(directory / f"{number}")
+        try:
+            return noticed(compiler, lines, mutants[number], program, source, place)
+        finally:
+            subprocess.run(["rm", "-rf", place], check=False)
+
+    with concurrent.futures.ThreadPoolExecutor(workers) as pool:
+        results = list(pool.map(one, range(len(mutants))))
+    left = [f"line {mutant.line} {'always' if mutant.always else 'never'}"
+            for mutant, result in zip(mutants, results) if result is False]
+    return sum(result is not None for result in results), left
