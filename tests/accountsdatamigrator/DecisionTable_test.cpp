@@ -59,6 +59,40 @@ TEST_F(DecisionTable, WithNothingOldNothingHappens) {
   EXPECT_FALSE(lockFileExists());
 }
 
+TEST_F(DecisionTable, WithoutASettingsFileNothingHappens) {
+  migrate();
+  EXPECT_EQ(log(), Lines());
+  EXPECT_EQ(bytesOf(kSettingsFile), std::nullopt);
+  EXPECT_FALSE(lockFileExists());
+}
+
+TEST_F(DecisionTable, ANegativeVersionCountsAsNewer) {
+  writeSettings(-1);
+  const auto before = bytesOf(kSettingsFile);
+  migrate();
+  EXPECT_EQ(log(), Lines());
+  EXPECT_EQ(bytesOf(kSettingsFile), before);
+  EXPECT_FALSE(lockFileExists());
+}
+
+TEST_F(DecisionTable, AMissingVersionIsSaidAndNotMigrated) {
+  write(kSettingsFile, {{"Accounts", Array()}});
+  const auto before = bytesOf(kSettingsFile);
+  migrate();
+  EXPECT_EQ(log(), (Lines{"Account Settings plist is missing a version number, returning NO for "
+                          "migration"}));
+  EXPECT_EQ(bytesOf(kSettingsFile), before);
+  EXPECT_FALSE(lockFileExists());
+}
+
+TEST_F(DecisionTable, AMailFileHidesAMissingVersion) {
+  writeMail();
+  write(kSettingsFile, {{"Accounts", Array()}});
+  migrate();
+  EXPECT_EQ(log(), (Lines{needs(1, 0), needs(1, 0), built("1")}));
+  EXPECT_EQ(identifiers(), Lines{"M1"});
+}
+
 TEST_F(DecisionTable, AnOutdatedVersionIsBroughtUpToDate) {
   writeSettings(11);
   migrate();

@@ -2,6 +2,7 @@
 // "." to whoever started it.
 //   obeys FILE      ends once the file names the notification
 //   restarts FILE   leaves the work to a new process at that moment
+//   overhears       does nothing but stay, and obeys signals
 //   ignores         does nothing but stay, and lets no signal end it that can be kept from it
 //   lasts           does nothing but stay, for a minute at most
 #include <signal.h>
@@ -44,6 +45,8 @@ int main(int count, char** arguments) {
   ::prctl(PR_SET_PDEATHSIG, SIGKILL);
   if (::write(STDOUT_FILENO, ".", 1) != 1) return 1;
   if (behaviour == "ignores") stay();
+  if (behaviour == "overhears")
+    for (;;) ::pause();
   if (count < 3) return 2;
   while (!wasAskedToExit(arguments[2])) std::this_thread::sleep_for(std::chrono::milliseconds(10));
   if (behaviour == "restarts" && ::fork() == 0) {

@@ -99,6 +99,15 @@ TEST_F(DaemonOfAnImage, ThatObeysIsAskedAndNotKilled) {
   EXPECT_EQ(countOfNotifications(), 1U);
 }
 
+TEST_F(DaemonOfAnImage, ThatIgnoresTheNotificationIsKilled) {
+  const pid_t daemon = startDaemon("overhears");
+  clock().factor = kFast;
+  ASSAccountsManager::killDataAccessIfNecessary();
+  EXPECT_EQ(started.waitForEnd(daemon), SIGKILL);
+  EXPECT_EQ(logLines, (Lines{kAsked, kKilled}));
+  EXPECT_EQ(countOfNotifications(), 1U);
+}
+
 TEST_F(DaemonOfAnImage, ThatIgnoresAllItCanIsKilled) {
   const pid_t daemon = startDaemon("ignores");
   clock().factor = kFast;
@@ -126,6 +135,14 @@ TEST_F(DaemonOfAnImage, IsWaitedForWhileTheCallersSourcesAreServed) {
   runLoop().addTimer(std::chrono::milliseconds(1), [&] { ++beats; });
   ASSAccountsManager::killDataAccessIfNecessary();
   EXPECT_GT(beats, 1);
+}
+
+TEST_F(DaemonOfAnImage, IsNotOneWhoseNameOnlyBeginsLikeIt) {
+  const pid_t other = startDaemon("ignores", "tallowdtallowdtallowd");
+  ASSAccountsManager::killDataAccessIfNecessary();
+  EXPECT_EQ(logLines, Lines());
+  EXPECT_EQ(countOfNotifications(), 0U);
+  EXPECT_EQ(findProcessIDByName("tallowdtallowdta"), other);
 }
 
 TEST_F(DaemonOfAnImage, IsFoundByTheFirstSixteenBytesOfALongName) {
