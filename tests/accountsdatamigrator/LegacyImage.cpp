@@ -50,11 +50,11 @@ void LegacyTest::write(std::string_view file, const Dictionary& root) const {
 
 void LegacyTest::writeBytes(std::string_view file, const std::string& bytes) const {
   files::create_directories(image.path(file).parent_path());
-  std::ofstream(image.path(file), std::ios::binary) << bytes;
+  std::ofstream(image.path(file), std::fstream::binary) << bytes;
 }
 
 std::optional<std::string> LegacyTest::bytesOf(std::string_view file) const {
-  std::ifstream stream(image.path(file), std::ios::binary);
+  std::ifstream stream(image.path(file), std::fstream::binary);
   if (!stream) return std::nullopt;
   return std::string(std::istreambuf_iterator<char>(stream), {});
 }
