@@ -2,12 +2,12 @@
 
 #include <algorithm>
 #include <cerrno>
-#include <charconv>
 #include <map>
 #include <optional>
 #include <string_view>
 
 #include "host/Settings.h"
+#include "platform/posix/NumberedNames.h"
 
 namespace host {
 namespace {
@@ -20,26 +20,13 @@ std::string nameOfCopy(unsigned number) {
   return std::string(DeviceImage::kSettingsFile) + std::string(kMark) + std::to_string(number);
 }
 
-// The number in a copy's plain name; empty for any other name.
-std::optional<unsigned> numberOfCopy(std::string_view name) {
-  const std::string_view file =
-      DeviceImage::kSettingsFile.substr(DeviceImage::kSettingsFile.rfind('/') + 1);
-  if (!name.starts_with(file)) return std::nullopt;
-  name.remove_prefix(file.size());
-  if (!name.starts_with(kMark)) return std::nullopt;
-  name.remove_prefix(kMark.size());
-  unsigned number = 0;
-  const char* const end = name.data() + name.size();
-  const auto [stop, error] = std::from_chars(name.data(), end, number);
-  const bool isPlain = error == std::errc() && stop == end && !name.starts_with('0');
-  return isPlain ? std::optional(number) : std::nullopt;
-}
-
 // The names of the copies in the image, by number.
 std::map<unsigned, std::string> copiesIn(const DeviceImage& image) {
+  constexpr std::string_view kFile = DeviceImage::kSettingsFile;
+  const std::string prefix = std::string(kFile.substr(kFile.rfind('/') + 1)) + std::string(kMark);
   std::map<unsigned, std::string> copies;
   for (const std::string& name : image.namesIn(DeviceImage::kPreferencesDirectory))
-    if (const std::optional<unsigned> number = numberOfCopy(name))
+    if (const std::optional<unsigned> number = platform::numberAfter(prefix, name))
       copies.emplace(*number, nameOfCopy(*number));
   return copies;
 }

@@ -8,13 +8,13 @@
 #include <algorithm>
 #include <array>
 #include <cerrno>
-#include <charconv>
 #include <filesystem>
 #include <set>
 #include <span>
 #include <string_view>
 #include <system_error>
 
+#include "platform/posix/NumberedNames.h"
 #include "platform/posix/PosixFileServices.h"
 #include "platform/posix/SystemError.h"
 
@@ -36,29 +36,16 @@ std::string asideName(const std::string& path, unsigned number) {
   return path + std::string(kMark) + std::to_string(number);
 }
 
-// The number in the name of an aside of `file`; empty for any other name.
-std::optional<unsigned> asideNumber(std::string_view name, std::string_view file) {
-  if (!name.starts_with(file)) return std::nullopt;
-  name.remove_prefix(file.size());
-  if (!name.starts_with(kMark)) return std::nullopt;
-  name.remove_prefix(kMark.size());
-  unsigned number = 0;
-  const char* const end = name.data() + name.size();
-  const auto [stop, error] = std::from_chars(name.data(), end, number);
-  const bool isPlain = error == std::errc() && stop == end && !name.starts_with('0');
-  return isPlain ? std::optional(number) : std::nullopt;
-}
-
 // The numbers of the asides of `path`, whoever made them.
 Status findAsides(const std::string& path, std::set<unsigned>& numbers) {
   const std::filesystem::path whole(path);
   const std::filesystem::path directory = whole.has_parent_path() ? whole.parent_path() : ".";
-  const std::string file = whole.filename();
+  const std::string prefix = whole.filename().string() + std::string(kMark);
   std::error_code error;
   for (std::filesystem::directory_iterator entry(directory, error), end; !error && entry != end;
        entry.increment(error)) {
     const std::string name = entry->path().filename();
-    if (const std::optional<unsigned> number = asideNumber(name, file)) numbers.insert(*number);
+    if (const std::optional<unsigned> number = numberAfter(prefix, name)) numbers.insert(*number);
   }
   if (error) return systemFailure(error.value(), "read", directory);
   return Status::success();
