@@ -3,6 +3,7 @@
 #include <sqlite3.h>
 #include <sys/stat.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <cstdlib>
 #include <map>
@@ -243,20 +244,30 @@ Transaction::~Transaction() {
     sqlite3_exec(_database._connection, "ROLLBACK", nullptr, nullptr, nullptr);
 }
 
-DatabaseSet::DatabaseSet(std::shared_ptr<const DeviceImage> image, DatabaseAccess access)
-    : _image(std::move(image)), _access(access) {}
+DatabaseSet::DatabaseSet(std::shared_ptr<const DeviceImage> image, DatabaseAccess access,
+                         std::vector<std::string> leftAlone)
+    : _image(std::move(image)), _access(access), _leftAlone(std::move(leftAlone)) {}
+
+void DatabaseSet::_raiseIfLeftAlone(platform::SyncDataType type) const {
+  const std::string_view name = DeviceImage::databaseFile(type);
+  if (std::find(_leftAlone.begin(), _leftAlone.end(), name) == _leftAlone.end()) return;
+  throw DatabaseFailure(SQLITE_CANTOPEN, "the database \"" + std::string(name) +
+                                             "\" cannot be used and is left alone");
+}
 
 std::unique_ptr<Database>& DatabaseSet::_slot(platform::SyncDataType type) {
   return _databases[static_cast<std::size_t>(type)];
 }
 
 Database* DatabaseSet::find(platform::SyncDataType type) {
+  _raiseIfLeftAlone(type);
   std::unique_ptr<Database>& slot = _slot(type);
   if (slot == nullptr) slot = Database::openExisting(*_image, type, _access);
   return slot.get();
 }
 
 Database& DatabaseSet::make(platform::SyncDataType type) {
+  _raiseIfLeftAlone(type);
   std::unique_ptr<Database>& slot = _slot(type);
   if (slot == nullptr) {
     if (_access == DatabaseAccess::readOnly)

@@ -6,6 +6,7 @@
 #include <stdexcept>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "deviceimage/DeviceImage.h"
 #include "platform/Status.h"
@@ -157,7 +158,9 @@ class Transaction {
 // The connections of one user to one image, opened when they are first needed, one for each type.
 class DatabaseSet {
  public:
-  DatabaseSet(std::shared_ptr<const DeviceImage> image, DatabaseAccess access);
+  // Each use of a database in `leftAlone`, by its path in the image, raises.
+  DatabaseSet(std::shared_ptr<const DeviceImage> image, DatabaseAccess access,
+              std::vector<std::string> leftAlone = {});
   const DeviceImage& image() const { return *_image; }
   // The type's database; null when the image has none (asked anew each time).
   Database* find(platform::SyncDataType type);
@@ -166,8 +169,10 @@ class DatabaseSet {
 
  private:
   std::unique_ptr<Database>& _slot(platform::SyncDataType type);
+  void _raiseIfLeftAlone(platform::SyncDataType type) const;
   std::shared_ptr<const DeviceImage> _image;
   DatabaseAccess _access;
+  std::vector<std::string> _leftAlone;
   std::unique_ptr<Database> _databases[5];
 };
 

@@ -28,13 +28,14 @@ void checkHashes(Database& database, std::vector<std::string>& problems) {
 
 }  // namespace
 
-std::vector<DatabaseReport> RecordStores::checkDatabases() {
+std::vector<DatabaseReport> RecordStores::checkDatabases(const std::set<std::string>& leaveOut) {
   std::vector<DatabaseReport> reports;
   for (const Dataclass dataclass : kDataclasses) {
     if (dataclass == Dataclass::reminders) continue;  // in the calendars' database
     const platform::SyncDataType type = syncTypeOf(dataclass);
     DatabaseReport report;
     report.path = DeviceImage::databaseFile(type);
+    if (leaveOut.contains(report.path)) continue;
     const platform::Status status = statusOf([&] {
       report.exists = _databases->image().lookAt(report.path).kind != FileLook::Kind::nothing;
       if (Database* const database = _databases->find(type)) {

@@ -22,7 +22,7 @@ namespace deviceimage {
 class DeviceImageServices::Implementation {
  public:
   Implementation(const std::shared_ptr<const DeviceImage>& image, ServiceOptions options)
-      : _databases(image, DatabaseAccess::readWrite),
+      : _databases(image, DatabaseAccess::readWrite, std::move(options.databasesLeftAlone)),
         _accountFramework(image),
         _bundleResources(options.preferredLanguages, std::move(options.resourceDirectory)),
         _calendarStore(_databases),

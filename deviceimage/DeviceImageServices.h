@@ -26,6 +26,9 @@ struct ServiceOptions {
   // Where the resources of the account settings library lie; empty for the folder of the object
   // file that asks. A program that is no bundle has none beside it and names the plug-in's folder.
   std::optional<std::string> resourceDirectory = {};
+  // Databases that cannot be used, by their paths in the image: whoever wants one gets a failure,
+  // at once, and nothing in it changes.
+  std::vector<std::string> databasesLeftAlone = {};
 };
 
 // Every platform service over one device image. What a service cannot read in the image counts as

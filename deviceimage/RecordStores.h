@@ -4,6 +4,7 @@
 #include <functional>
 #include <memory>
 #include <optional>
+#include <set>
 #include <span>
 #include <string>
 #include <string_view>
@@ -180,8 +181,9 @@ class RecordStores {
   Anchor syncAnchor(Dataclass dataclass, Row store);
 
   // Looks at every database: readable, of this version, `PRAGMA integrity_check` and
-  // `foreign_key_check` without complaint, each record's hash that of its content.
-  std::vector<DatabaseReport> checkDatabases();
+  // `foreign_key_check` without complaint, each record's hash that of its content. Those whose
+  // paths are in `leaveOut` are passed over.
+  std::vector<DatabaseReport> checkDatabases(const std::set<std::string>& leaveOut = {});
 
   // Rolls back what a killed program left half written, as any writer would; nothing else changes.
   // With readOnly access a database in that state is a failure.

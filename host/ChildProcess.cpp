@@ -66,6 +66,7 @@ int workForHost(const std::string& imagePath, const ChildWork& work,
   if (!opened.image) return tellNotLoaded(opened.error);
   deviceimage::ServiceOptions options;
   options.processName = childOptions.processName;
+  options.databasesLeftAlone = childOptions.databasesLeftAlone;
   options.logSink = [&childOptions](std::string_view line) {
     tell(MessageKind::line, line);
     if (childOptions.lineSink) childOptions.lineSink(line);

@@ -3,6 +3,7 @@
 #include <functional>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "deviceimage/DeviceImage.h"
 #include "platform/Services.h"
@@ -21,7 +22,8 @@ using ChildWork = std::function<int(const deviceimage::DeviceImage& image)>;
 struct ChildOptions {
   std::string processName = "migration-host";  // in the lines of the image's log
   std::function<void(std::string_view line)>
-      lineSink;  // gets the log's lines as well; may be empty
+      lineSink;                                      // gets the log's lines as well; may be empty
+  std::vector<std::string> databasesLeftAlone = {};  // by their paths in the image
 };
 
 // Installs the services of the image at `imagePath`, does the work, passes every line of the log

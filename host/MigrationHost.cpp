@@ -7,7 +7,6 @@
 
 #include "deviceimage/DeviceImageServices.h"
 #include "deviceimage/ImageLock.h"
-#include "deviceimage/RecordStores.h"
 #include "deviceimage/SyncAgent.h"
 #include "host/AccountComparison.h"
 #include "host/MigratorChild.h"
@@ -22,14 +21,9 @@ namespace {
 
 using deviceimage::DeviceImage;
 using deviceimage::ImageLock;
-using deviceimage::RecordStores;
 
 // A report stays readable whatever a migrator writes; the image's system log has every line.
 constexpr std::size_t kMaximumLogSize = std::size_t{64} << 20U;  // bytes
-
-std::string textOf(const platform::Status& status) {
-  return status.error ? status.error->description : "error " + std::to_string(status.code);
-}
 
 Selection selectionOf(const std::shared_ptr<const DeviceImage>& image,
                       const std::vector<MigratorBundle>& bundles) {
@@ -122,10 +116,11 @@ void MigrationHost::_runUnderLock(const RunOptions& options, int lockDescriptor)
   if (options.legacy && _report.reasons.empty() && !_migrateLegacy(options, lockDescriptor)) return;
   for (std::string& reason : reasonsNotToStart(*_image, readSettings(*_image), _bundles))
     _refuse(std::move(reason));
-  if (!_report.reasons.empty() || !_prepare()) return;
+  if (!_report.reasons.empty()) return;
+  _leftAlone = findUnusableDatabases(_image);
 
   _listener.stageBegan("Looking at the image before");
-  const Observation before = observe(_image);
+  const Observation before = observe(_image, _leftAlone);
   if (!before.error.empty()) return _refuse(before.error);
   const Selection selection = selectionOf(_image, _bundles);
   const deviceimage::SyncAgent agent(*_image);
@@ -134,7 +129,7 @@ void MigrationHost::_runUnderLock(const RunOptions& options, int lockDescriptor)
   if (!_interruption.requested()) _runMigrators(options, lockDescriptor);
 
   _listener.stageBegan("Looking at the image after");
-  const Observation after = observe(_image);
+  const Observation after = observe(_image, _leftAlone);
   _compare(before, after, selection, agent);
   _judge();
 }
@@ -145,7 +140,7 @@ bool MigrationHost::_migrateLegacy(const RunOptions& options, int lockDescriptor
   if (legacyNeedOf(*_image).any()) {
     for (std::string& reason : reasonsNotToStart(*_image, Settings{}, _bundles))
       _refuse(std::move(reason));
-    if (!_report.reasons.empty() || !_prepare()) return false;
+    if (!_report.reasons.empty()) return false;
     removeStaleTemporaryFiles(*_image);
     _image->removeLeftovers();
     _listener.stageBegan("Migrating legacy settings");
@@ -175,37 +170,12 @@ void MigrationHost::_readBundles(const RunOptions& options) {
   }
 }
 
-// Rolls back what a killed run may have left. False when the databases are not fit to be migrated.
-bool MigrationHost::_prepare() {
-  RecordStores stores(_image, RecordStores::Access::readWrite);
-  const platform::Status recovered = stores.recoverDatabases();
-  if (!recovered.isSuccess()) {
-    _refuse(textOf(recovered));
-    return false;
-  }
-  return _checkDatabases(RunOutcome::refused);
-}
-
-bool MigrationHost::_checkDatabases(RunOutcome whenDamaged) {
-  RecordStores stores(_image, RecordStores::Access::readOnly);
-  bool isFit = true;
-  for (const deviceimage::DatabaseReport& database : stores.checkDatabases()) {
-    for (const std::string& problem : database.problems) {
-      _report.outcome = whenDamaged;
-      _report.reasons.push_back(_image->absolutePath(database.path) + " is damaged: " + problem +
-                                "; bring back a sound copy.");
-      isFit = false;
-    }
-  }
-  return isFit;
-}
-
 void MigrationHost::_runMigrators(const RunOptions& options, int lockDescriptor) {
   for (const MigratorBundle& bundle : _bundles) {
     _listener.stageBegan("Running " + bundle.name);
     const MigratorTask task = {bundle.name,
                                {kRunMigratorArgument, _image->rootPath(), bundle.path,
-                                bundle.executable, bundle.principalClass},
+                                bundle.executable, bundle.principalClass, joinedPaths(_leftAlone)},
                                _image->temporaryDirectory(),
                                lockDescriptor,
                                options.limit};
@@ -242,10 +212,13 @@ void MigrationHost::_compare(const Observation& before, const Observation& after
     append(contradictions, records.contradictions);
     append(leftBehind, records.leftBehind);
   }
+  append(contradictions, newDamage(_image, _leftAlone));
+  for (const UnusableDatabase& database : _leftAlone)
+    leftBehind.push_back(_image->absolutePath(database.path) + " was left alone: " + database.why +
+                         ".");
   append(_report.reasons, contradictions);
   append(_report.reasons, leftBehind);
-  const bool databasesAreFit = _checkDatabases(RunOutcome::verificationFailed);
-  _report.balanced = contradictions.empty() && databasesAreFit;
+  _report.balanced = contradictions.empty();
   _isAnythingLeftBehind = !leftBehind.empty();
 }
 

@@ -13,6 +13,7 @@
 #include "host/MigratorBundle.h"
 #include "host/Observation.h"
 #include "host/Report.h"
+#include "host/UnusableDatabases.h"
 
 namespace host {
 
@@ -54,8 +55,6 @@ class MigrationHost {
   void _readBundles(const RunOptions& options);
   void _refuse(std::string reason);
   bool _migrateLegacy(const RunOptions& options, int lockDescriptor);
-  bool _prepare();
-  bool _checkDatabases(RunOutcome whenDamaged);
   void _runMigrators(const RunOptions& options, int lockDescriptor);
   void _keepLogLine(std::string_view line);
   void _compare(const Observation& before, const Observation& after, const Selection& selection,
@@ -66,6 +65,7 @@ class MigrationHost {
   Interruption& _interruption;
   std::shared_ptr<const deviceimage::DeviceImage> _image;
   std::vector<MigratorBundle> _bundles;
+  std::vector<UnusableDatabase> _leftAlone;
   MigrationReport _report;
   std::size_t _logSize = 0;  // bytes
   bool _isAnythingLeftBehind = false;

@@ -4,6 +4,7 @@
 #include <string_view>
 
 #include "host/ChildProcess.h"
+#include "host/UnusableDatabases.h"
 #include "platform/DataClassMigrator.h"
 #include "platform/Services.h"
 
@@ -35,9 +36,14 @@ bool isMigratorProcess(int argumentCount, char** arguments) {
 }
 
 int runMigratorInThisProcess(char** arguments) {
-  return workForHost(arguments[2], [&](const deviceimage::DeviceImage&) {
-    return loadAndRun(arguments[3], arguments[4], arguments[5]);
-  });
+  ChildOptions options;
+  options.databasesLeftAlone = pathsJoinedIn(arguments[6]);
+  return workForHost(
+      arguments[2],
+      [&](const deviceimage::DeviceImage&) {
+        return loadAndRun(arguments[3], arguments[4], arguments[5]);
+      },
+      options);
 }
 
 }  // namespace host

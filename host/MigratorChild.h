@@ -3,9 +3,10 @@
 namespace host {
 
 // What the host starts the process of a data-class migrator with: this, the image, the bundle's
-// folder, its executable and its principal class. Not for people.
+// folder, its executable, its principal class, and the databases that it is to leave alone (see
+// joinedPaths). Not for people.
 inline constexpr const char* kRunMigratorArgument = "--run-migrator-in-this-process";
-inline constexpr int kRunMigratorArgumentCount = 6;
+inline constexpr int kRunMigratorArgumentCount = 7;
 
 // Whether the program was started to run a migrator.
 bool isMigratorProcess(int argumentCount, char** arguments);

@@ -1,5 +1,6 @@
 #include "host/Observation.h"
 
+#include <algorithm>
 #include <string_view>
 
 #include "deviceimage/RecordStores.h"
@@ -21,17 +22,30 @@ std::string bytesOfHexadecimal(std::string_view text) {
   return bytes;
 }
 
+bool isUnreadable(deviceimage::Dataclass dataclass,
+                  const std::vector<UnusableDatabase>& leftAlone) {
+  const auto path = deviceimage::DeviceImage::databaseFile(deviceimage::syncTypeOf(dataclass));
+  return std::any_of(leftAlone.begin(), leftAlone.end(), [&](const UnusableDatabase& database) {
+    return database.path == path && !database.isReadable;
+  });
+}
+
 std::string failureText(const platform::Status& status) {
   return status.error ? status.error->description : "error " + std::to_string(status.code);
 }
 
 }  // namespace
 
-Observation observe(const std::shared_ptr<const deviceimage::DeviceImage>& image) {
+Observation observe(const std::shared_ptr<const deviceimage::DeviceImage>& image,
+                    const std::vector<UnusableDatabase>& leftAlone) {
   Observation observation;
   observation.settings = readSettings(*image);
   deviceimage::RecordStores stores(image, deviceimage::RecordStores::Access::readOnly);
   for (const deviceimage::Dataclass dataclass : deviceimage::kDataclasses) {
+    if (isUnreadable(dataclass, leftAlone)) {
+      observation.unseen.insert(dataclass);
+      continue;
+    }
     const auto listed = stores.listStores(dataclass);
     if (!listed.status.isSuccess()) {
       observation.error = failureText(listed.status);

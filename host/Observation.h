@@ -2,12 +2,14 @@
 
 #include <memory>
 #include <optional>
+#include <set>
 #include <string>
 #include <vector>
 
 #include "deviceimage/Dataclass.h"
 #include "deviceimage/DeviceImage.h"
 #include "host/Settings.h"
+#include "host/UnusableDatabases.h"
 
 namespace host {
 
@@ -32,8 +34,10 @@ struct ObservedStore {
 struct Observation {
   Settings settings;
   std::vector<ObservedStore> stores;
-  std::string error;  // what could not be read, in one sentence; empty when all could
+  std::set<deviceimage::Dataclass> unseen;  // those whose database is left alone unread
+  std::string error;  // what could not be read, in one sentence; empty when all else could
 };
-Observation observe(const std::shared_ptr<const deviceimage::DeviceImage>& image);
+Observation observe(const std::shared_ptr<const deviceimage::DeviceImage>& image,
+                    const std::vector<UnusableDatabase>& leftAlone = {});
 
 }  // namespace host

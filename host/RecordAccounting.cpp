@@ -195,6 +195,17 @@ void checkNewStore(const ObservedStore& store, const ActiveStores& before,
                                   " was not there before.");
 }
 
+// There are no figures for them: their lines become sentences.
+void listWhatWasNotSeen(const Observation& before, RecordAccounting& result) {
+  std::erase_if(result.dataclasses, [&](const DataclassReport& line) {
+    if (!before.unseen.contains(line.dataclass)) return false;
+    result.leftBehind.push_back("What account " + line.account + " has of " +
+                                std::string(dataclassName(line.dataclass)) +
+                                " is left as it was, in a database that cannot be used.");
+    return true;
+  });
+}
+
 void listWhatIsNotLocal(RecordAccounting& result) {
   for (const DataclassReport& line : result.dataclasses) {
     if (line.leftBehind > 0)
@@ -218,6 +229,7 @@ RecordAccounting accountForRecords(const Observation& before, const Observation&
   const ActiveStores activeBefore(before);
   const ActiveStores activeAfter(after);
   for (const Dataclass dataclass : deviceimage::kDataclasses) {
+    if (before.unseen.contains(dataclass)) continue;
     DataclassAccounting accounting(dataclass, activeBefore.findLocal(dataclass),
                                    activeAfter.findLocal(dataclass), result);
     accounting.takeRetiredStores(before, after);
@@ -235,6 +247,7 @@ RecordAccounting accountForRecords(const Observation& before, const Observation&
   }
   for (const ObservedStore& store : after.stores) checkNewStore(store, activeBefore, result);
   result.dataclasses = std::move(owners.lines());
+  listWhatWasNotSeen(before, result);
   listWhatIsNotLocal(result);
   return result;
 }

@@ -21,7 +21,8 @@ struct RecordAccounting {
 // and for any other of which its stores hold records. A store that several such accounts share
 // belongs to the first one in file order that has the dataclass enabled, else to the first one. All
 // other stores, and the records that the local and the retired stores had before, must still be
-// there unchanged and as many times; nothing else may come new into any store.
+// there unchanged and as many times; nothing else may come new into any store. What was not seen
+// before has no lines; it is left behind.
 RecordAccounting accountForRecords(const Observation& before, const Observation& after,
                                    const Selection& selection, const deviceimage::SyncAgent& agent);
 

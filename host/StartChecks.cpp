@@ -11,8 +11,6 @@
 #include <string_view>
 #include <system_error>
 
-#include "deviceimage/Dataclass.h"
-
 namespace host {
 namespace {
 
@@ -133,12 +131,6 @@ void checkWriting(const DeviceImage& image, Reasons& reasons) {
   std::set<std::string> paths = {image.temporaryDirectory(), image.preferencesDirectory(),
                                  image.absolutePath(DeviceImage::kLogDirectory),
                                  image.systemLogFile()};
-  for (const deviceimage::Dataclass dataclass : deviceimage::kDataclasses) {
-    const std::string database =
-        image.absolutePath(DeviceImage::databaseFile(deviceimage::syncTypeOf(dataclass)));
-    paths.insert(database);
-    paths.insert(database.substr(0, database.rfind('/')));
-  }
   for (const std::string& path : paths) checkThatWritable(path, reasons);
 }
 

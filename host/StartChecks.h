@@ -19,7 +19,7 @@ namespace host {
 // - tmp/ is a directory on the settings file's file system, else no save could replace the file;
 // - "mobile" is in the image's user database as a user and a group, and the caller is root or that
 //   user, of that group: only they can give the settings file its owner;
-// - settings, databases and logs can be written.
+// - settings and logs can be written. (A database that cannot be used is left alone.)
 std::vector<std::string> reasonsNotToStart(const deviceimage::DeviceImage& image,
                                            const Settings& settings,
                                            const std::vector<MigratorBundle>& bundles);

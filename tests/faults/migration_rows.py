@@ -1,4 +1,4 @@
-"""Migrations that are killed or fail on the way, and run again: rows M1, M3 and M5 of docs/reliability.md.
+"""Migrations that are killed or fail on the way, and run again: rows M1 to M3 and M5 of docs/reliability.md.
 
 The image holds a retired account with records of all five kinds, one that is not retired, and records of
 the device's own, some of them equal to the service's. After a re-run each record is in the local store or in
@@ -8,6 +8,7 @@ a retired one, none of the local ones has changed, and none is there twice.
 import os
 import pathlib
 import plistlib
+import random
 import shutil
 import sqlite3
 import subprocess
@@ -125,6 +126,14 @@ class Migration:
                     database.close()
         return ""
 
+    def records_of(self, name):
+        """What the one database holds at the beginning."""
+        database = sqlite3.connect(f"file:{self.base}/var/mobile/Library/{name}?mode=ro", uri=True)
+        try:
+            return database.execute("SELECT kind, content FROM records").fetchall()
+        finally:
+            database.close()
+
     def judge_end(self, image):
         """After the last run: retired, and nothing lost or doubled."""
         if wrong := self.damage(image):
@@ -184,6 +193,22 @@ def kill_and_rerun(found, directory, is_full):
     return len(cases), matrix.judge_all(cases, judge)
 
 
+def kill_twice(found, directory, is_full):
+    """The second run is killed at another call of its own, and a third one follows."""
+    migration, place = prepared(found, directory, is_full, "m2")
+    kills = matrix.kills(traced(migration, place))
+    chance = random.Random(20261121)
+    pairs = [(first, chance.choice(kills)) for first in sampled(kills, 7 if is_full else 100)]
+
+    def judge(pair, worker):
+        image = migration.copy(worker)
+        for case in pair:
+            matrix.run_with(case, migration.command(image), environment(), limit=120)
+        return rerun(migration, image)
+    bad = matrix.judge_all(pairs, judge)
+    return len(pairs), [(" then ".join(map(matrix.name_of, pair)), text) for pair, text in bad]
+
+
 def fail_and_rerun(found, directory, is_full):
     migration, place = prepared(found, directory, is_full, "m3")
     cases = sampled(matrix.errors(traced(migration, place)), 1 if is_full else 97)
@@ -222,6 +247,7 @@ def two_at_once(found, directory, is_full):
 
 ROWS = {
     "M1": ("a migration is killed at a system call, then run again", kill_and_rerun),
+    "M2": ("the second run is killed too, then a third run", kill_twice),
     "M3": ("a system call of a migration fails", fail_and_rerun),
     "M5": ("two hosts at once, and a host run again", two_at_once),
 }

@@ -166,16 +166,6 @@ class StaleFiles(hosttest.HostTestCase):
         self.run_host("--bundle", GOOD)
         self.assertEqual(before, sorted(os.listdir(self.image / "tmp")))
 
-    def test_a_run_that_is_refused_for_a_damaged_database_sweeps_nothing(self):
-        self.make_image([hosttest.record("notes", None, "a", "a note")])
-        database = self.image / hosttest.KINDS["notes"][1]
-        content = bytearray(database.read_bytes())
-        content[100:200] = bytes(100)
-        database.write_bytes(content)
-        self.place("fileAb12Cd", b"bplist00")
-        with self.unchanged_image():
-            self.assertEqual(7, self.run_host().code)
-
     def test_a_refused_run_sweeps_nothing(self):
         self.place("fileAb12Cd", b"bplist00")
         self.write_settings(account("B", "Telegraph"))

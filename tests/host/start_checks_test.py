@@ -114,16 +114,6 @@ class ImageChecks(hosttest.HostTestCase):
         prefix = self.run_as_other_user(self.OTHER_USER, 501, "--groups=501")
         self.assertEqual(0, self.run_host("--quiet", prefix=prefix).code)
 
-    def test_a_damaged_database(self):
-        self.make_image([record("contacts", None, "a", card("a", "Ada"))])
-        databases = [path for path in self.image.rglob("*")
-                     if path.is_file() and path.read_bytes().startswith(b"SQLite format 3")]
-        self.assertEqual(1, len(databases))
-        content = bytearray(databases[0].read_bytes())
-        content[100:200] = bytes(100)
-        databases[0].write_bytes(content)
-        self.check_refusal(databases[0].name)
-
     def test_a_directory_that_is_not_there(self):
         self.image = self.directory / "nowhere"
         run = self.run_host("--json")

@@ -1,0 +1,85 @@
+#include "host/UnusableDatabases.h"
+
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <optional>
+#include <set>
+#include <system_error>
+
+#include "deviceimage/Dataclass.h"
+#include "deviceimage/RecordStores.h"
+
+namespace host {
+namespace {
+
+using deviceimage::DatabaseReport;
+using deviceimage::DeviceImage;
+using deviceimage::RecordStores;
+
+constexpr char kSeparator = ',';  // in no path of a database
+
+// What is not there yet is made when it is needed, in a folder that is looked at too.
+std::optional<std::string> whyNotWritable(const std::string& path) {
+  if (faccessat(AT_FDCWD, path.c_str(), W_OK, AT_EACCESS) == 0 || errno == ENOENT)
+    return std::nullopt;
+  return path + " cannot be written: " + std::generic_category().message(errno) +
+         "; give the right to write, or mount the image so that it can be written";
+}
+
+void findUnwritable(const DeviceImage& image, const std::string& relative,
+                    std::vector<UnusableDatabase>& found) {
+  const std::string path = image.absolutePath(relative);
+  std::optional<std::string> why = whyNotWritable(path.substr(0, path.rfind('/')));
+  if (!why) why = whyNotWritable(path);
+  if (why) found.push_back({relative, std::move(*why), true});
+}
+
+}  // namespace
+
+std::vector<UnusableDatabase> findUnusableDatabases(
+    const std::shared_ptr<const DeviceImage>& image) {
+  RecordStores(image, RecordStores::Access::readWrite)
+      .recoverDatabases()
+      .ignore("what cannot be recovered shows in the check");
+  RecordStores stores(image, RecordStores::Access::readOnly);
+  std::vector<UnusableDatabase> found;
+  for (const DatabaseReport& database : stores.checkDatabases()) {
+    if (database.problems.empty())
+      findUnwritable(*image, database.path, found);
+    else
+      found.push_back({database.path, "it is damaged or in use: " + database.problems.front() +
+                                          "; bring back a sound copy, or wait for who uses it"});
+  }
+  return found;
+}
+
+std::string joinedPaths(const std::vector<UnusableDatabase>& databases) {
+  std::string joined;
+  for (const UnusableDatabase& database : databases) joined += database.path + kSeparator;
+  return joined;
+}
+
+std::vector<std::string> pathsJoinedIn(std::string_view joined) {
+  std::vector<std::string> paths;
+  for (std::size_t end = 0; (end = joined.find(kSeparator)) != std::string_view::npos;
+       joined.remove_prefix(end + 1))
+    paths.emplace_back(joined.substr(0, end));
+  return paths;
+}
+
+std::vector<std::string> newDamage(const std::shared_ptr<const DeviceImage>& image,
+                                   const std::vector<UnusableDatabase>& leftAlone) {
+  std::set<std::string> known;
+  for (const UnusableDatabase& database : leftAlone) known.insert(database.path);
+  std::vector<std::string> sentences;
+  RecordStores stores(image, RecordStores::Access::readOnly);
+  for (const DatabaseReport& database : stores.checkDatabases(known))
+    for (const std::string& problem : database.problems)
+      sentences.push_back(image->absolutePath(database.path) + " is damaged: " + problem +
+                          "; bring back a sound copy.");
+  return sentences;
+}
+
+}  // namespace host

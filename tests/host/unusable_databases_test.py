@@ -1,0 +1,88 @@
+"""A database that cannot be used is left alone and told of; the others are migrated."""
+import sqlite3
+import subprocess
+
+import hosttest
+from hosttest import SERVICE, account, card, event, record
+
+CONTACTS = hosttest.KINDS["contacts"][1]
+
+
+class UnusableDatabases(hosttest.HostTestCase):
+    def setUp(self):
+        super().setUp()
+        self.write_agent_name("ada")
+        self.write_settings(account("Q", "Quillnet", ("Contacts", "Calendars"), status=1),
+                            account("E", "Exchange", ("Contacts",)))
+        self.make_image([record("contacts", SERVICE, "a", card("a", "Ada")),
+                         record("contacts", None, "b", card("b", "Bo")),
+                         record("calendars", SERVICE, "c", event("c", "Tea"))])
+        self.contacts_file = self.image / CONTACTS
+
+    def check_that_contacts_are_left_alone(self, *words, prefix=()):
+        before = self.contacts_file.read_bytes()
+        run = self.run_host("--json", "--quiet", prefix=prefix)
+        self.assertEqual((3, "left behind", True),
+                         (run.code, run.report["outcome"], run.report["balanced"]), run.output)
+        self.assertTrue(any(all(word in reason for word in (CONTACTS, "was left alone", *words))
+                            for reason in run.report["reasons"]), run.report["reasons"])
+        self.assertEqual(before, self.contacts_file.read_bytes())
+        self.assertEqual(1, len(self.contents("calendars")))
+        self.assertEqual([], self.contents("calendars", SERVICE))
+        self.assertEqual("retired", run.report["accounts"][0]["outcome"])
+        return run
+
+    def damage(self, begin, end):
+        content = bytearray(self.contacts_file.read_bytes())
+        content[begin:end] = bytes(end - begin)
+        self.contacts_file.write_bytes(content)
+
+    def test_a_damaged_one_is_not_opened_by_the_migrator(self):
+        self.damage(100, 200)
+        run = self.check_that_contacts_are_left_alone("damaged", "bring back a sound copy")
+        self.assertIn("What account Q has of contacts is left as it was, in a database that cannot "
+                      "be used.", run.report["reasons"])
+        self.assertEqual(["calendars"], [line["dataclass"] for line in run.report["dataclasses"]])
+        self.assertTrue(any("is left alone" in line for line in run.report["log"]))
+
+    def test_one_with_another_content_than_its_hashes_say(self):
+        with sqlite3.connect(self.contacts_file) as database:
+            database.execute("UPDATE records SET content = x'78'")
+        database.close()
+        self.check_that_contacts_are_left_alone("another content than its hash says")
+
+    def test_one_that_somebody_else_holds(self):
+        # In a process of its own: whoever closes a file loses the locks that he has on it.
+        with subprocess.Popen(["sqlite3", self.contacts_file], stdin=subprocess.PIPE,
+                              stdout=subprocess.PIPE, text=True) as holder:
+            holder.stdin.write("BEGIN EXCLUSIVE; SELECT 'held';\n")
+            holder.stdin.flush()
+            self.assertEqual("held\n", holder.stdout.readline())
+            self.check_that_contacts_are_left_alone("database is locked")
+
+    @hosttest.skip_unless_root
+    def test_one_that_can_only_be_read_is_accounted_for(self):
+        run = self.check_that_contacts_are_left_alone(
+            "cannot be written", "give the right to write",
+            prefix=("unshare", "-m", "sh", "-c",
+                    f'mount --bind "{self.contacts_file}" "{self.contacts_file}" && '
+                    f'mount -o remount,bind,ro "{self.contacts_file}" && exec "$@"', "sh"))
+        line = run.report["dataclasses"][0]
+        self.assertEqual(("contacts", 1, 1), (line["dataclass"], line["service_before"],
+                                              line["left_behind"]))
+
+    def test_one_that_was_not_used_is_told_of_too(self):
+        notes = self.image / hosttest.KINDS["notes"][1]
+        notes.parent.mkdir(mode=0o700, exist_ok=True)
+        notes.write_bytes(b"")
+        run = self.run_host("--json", "--quiet")
+        self.assertEqual(3, run.code)
+        self.assertEqual(2, len(self.contents("contacts")))
+        self.assertTrue(any("an empty file and no database" in reason
+                            for reason in run.report["reasons"]), run.report["reasons"])
+
+    def test_one_that_the_migrator_damages_fails_the_verification(self):
+        (self.image / hosttest.KINDS["notes"][1]).parent.mkdir(mode=0o700, exist_ok=True)
+        (self.image / hosttest.KINDS["notes"][1]).write_bytes(b"")
+        run = self.run_bundle("RemovesADatabase")
+        self.assertEqual((5, False), (run.code, run.report["balanced"]))
