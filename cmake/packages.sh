@@ -6,7 +6,7 @@ BUILD_PACKAGES=(g++ cmake ninja-build pkg-config python3 binutils
   libsqlite3-dev sqlite3 libfmt-dev libcli11-dev nlohmann-json3-dev libgtest-dev libgmock-dev python3-jsonschema)
 # shellcheck disable=SC2034
 CHECK_PACKAGES=(git clang-14 clang-tidy-14 clang-format-14 libclang-rt-14-dev shellcheck mandoc
-  strace e2fsprogs)
+  strace e2fsprogs xfsprogs btrfs-progs)
 
 # need_packages PACKAGE... installs what is missing when we are root, and otherwise says what to install.
 need_packages() {

@@ -33,6 +33,15 @@ class SettingsImage:
         self.expected = None
         self.reset()
 
+    @classmethod
+    def at(cls, root, like):
+        """An image that is at `root` already, to be judged by what `like` has learnt."""
+        image = cls.__new__(cls)
+        image.root = pathlib.Path(root)
+        image.settings = image.root / PREFERENCES / NAME
+        image.old, image.owner, image.expected = like.old, like.owner, like.expected
+        return image
+
     def reset(self):
         for directory in (self.root / "tmp", self.root / PREFERENCES):
             for path in directory.iterdir():

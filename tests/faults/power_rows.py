@@ -1,0 +1,128 @@
+"""Power cuts on real file systems, before every call: rows S4 and M4 of docs/reliability.md."""
+
+import pathlib
+import shutil
+import subprocess
+
+import matrix
+import migration_rows
+import save_rows
+from settings_image import SettingsImage
+
+CUT = pathlib.Path(__file__).resolve().parent / "power_cut.sh"
+# The size, what makes it, and how it is mounted. The second has no notion of a file that replaces another.
+FILE_SYSTEMS = {
+    "ext4": ("64M", ["mkfs.ext4", "-q", "-F"], "defaults"),
+    "ext4 noauto_da_alloc": ("64M", ["mkfs.ext4", "-q", "-F"], "noauto_da_alloc"),
+    "xfs": ("320M", ["mkfs.xfs", "-q", "-f"], "defaults"),
+    "btrfs": ("160M", ["mkfs.btrfs", "-q", "-f"], "defaults"),
+}
+WORKERS = 2
+FILL = 'mount -o loop "$1" "$2" && cp -a "$3" "$2/i" && umount "$2"'
+
+
+def make_file_system(name, path, content):
+    """Why there is no image at the path with a copy of `content` at "i"; empty when there is one."""
+    size, command, _ = FILE_SYSTEMS[name]
+    directory = path.parent
+    place = directory / "fill"
+    place.mkdir(exist_ok=True)
+    with open(path, "wb") as file:
+        file.truncate(int(size[:-1]) << 20)
+    if shutil.which(command[0]) is None:
+        return f"there is no {command[0]}"
+    if subprocess.run([*command, str(path)], check=False, capture_output=True).returncode != 0:
+        return f"{command[0]} fails"
+    if subprocess.run(["unshare", "-m", "sh", "-euc", FILL, "sh", str(path), str(place), str(content)],
+                        check=False, capture_output=True).returncode != 0:
+        return "it cannot be mounted on a loop device"
+    return ""
+
+
+def strace_of(case):
+    return ["strace", "-f", "-qq", "-o", "/dev/null", "-e", "trace=" + case.call,
+            "-e", f"inject={case.call}:signal=SIGKILL:when={case.nth}", "--"]
+
+
+def cut(base, name, work, sync, command, environment):
+    """Runs the command on a copy of the file system and cuts the power when it has been killed: the
+    directory with what is left, or None and why."""
+    work.mkdir(exist_ok=True)
+    done = subprocess.run(
+        ["unshare", "-m", str(CUT), str(base), FILE_SYSTEMS[name][2], str(work), sync, *command],
+        env=environment, check=False, capture_output=True, text=True, timeout=120)
+    return (work / "found/i", "") if done.returncode >= 100 else (None, done.stderr.strip()[-200:])
+
+
+def file_systems(names, directory, content):
+    """For each name an image for each worker, because file systems with one identity cannot be mounted at
+    one time. What cannot be made is told of."""
+    made = {}
+    for name in names:
+        paths = [directory / f"{name.replace(' ', '-')}.{worker}" for worker in range(WORKERS)]
+        if why := next(filter(None, (make_file_system(name, path, content) for path in paths)), ""):
+            print(f"     {name}: skipped, {why}", flush=True)
+        else:
+            made[name] = paths
+    return made
+
+
+def named(bad):
+    return [(f"{name} {matrix.name_of(kill)} {sync}", text) for (name, kill, sync), text in bad]
+
+
+def cut_saves(found, directory, is_full):
+    """Alone, and after another program's sync: the settings are the old or the new ones, and the new ones
+    once the save is done."""
+    place = directory / "s4"
+    place.mkdir()
+    images = save_rows.Images(found, place)
+    calls = images.calls if is_full else images.calls[::7] + images.calls[-1:]
+    first = images.images[0]
+    bases = file_systems(FILE_SYSTEMS, place, first.root)
+    cases = [(name, case, sync) for name in bases for case in matrix.kills(calls) for sync in ("", "sync")]
+
+    def judge(case, worker):
+        name, kill, sync = case
+        work = place / f"cut{worker}"
+        root = work / "m/i"
+        environment = {**first.environment(), "TMPDIR": str(root / "tmp")}
+        left, why = cut(bases[name][worker], name, work, sync, [*strace_of(kill), found["fault_saver"], "once", str(root)],
+                        environment)
+        if left is None:
+            return f"the test could not be set up: {why}"
+        image = SettingsImage.at(left, first)
+        if wrong := image.wrong_files(stale_allowed=True):
+            return wrong
+        if kill.call == "exit_group" and not image.is_new():
+            return "a save that was done is lost"
+        code = subprocess.run([found["fault_saver"], "once", str(left)], check=False,
+                              env={**environment, "TMPDIR": str(left / "tmp")}).returncode
+        return "" if code == 0 and image.is_new() else f"the next save ended with {code}"
+    bad = matrix.judge_all(cases, judge)
+    return len(cases), named(bad)
+
+
+def cut_migrations(found, directory, is_full):
+    """After the cut a second run ends the work, and no record is lost or doubled."""
+    migration, place = migration_rows.prepared(found, directory, is_full, "m4")
+    kills = migration_rows.sampled(matrix.kills(migration_rows.traced(migration, place)), 10 if is_full else 200)
+    bases = file_systems(("ext4", "xfs"), place, migration.base)
+    cases = [(name, kill, sync) for name in bases for kill in kills for sync in ("", "sync")]
+
+    def judge(case, worker):
+        name, kill, sync = case
+        work = place / f"cut{worker}"
+        left, why = cut(bases[name][worker], name, work, sync, [*strace_of(kill), *migration.command(work / "m/i")],
+                        migration_rows.environment())
+        if left is None:
+            return f"the test could not be set up: {why}"
+        return migration_rows.rerun(migration, left)
+    bad = matrix.judge_all(cases, judge)
+    return len(cases), named(bad)
+
+
+ROWS = {
+    "S4": ("the power is cut before a call of a save", cut_saves),
+    "M4": ("the power is cut in a migration, then run again", cut_migrations),
+}
