@@ -1,5 +1,7 @@
 // Writing the accounts back, merged with what the file holds by now.
 
+#include <new>
+
 #include "QuillnetAccountTypeRemoval/ASLog.h"
 #include "QuillnetAccountTypeRemoval/ASSAccountsManager.h"
 #include "QuillnetAccountTypeRemoval/SettingsFileWriting.h"
@@ -90,13 +92,15 @@ void ASSAccountsManager::saveAllAccounts() {
   ASLog("Saving all accounts");
   const bool fixedAny = _fixAccountsBeforeSaving();
   bool saved = false;
-  {
+  try {
     // What another process wrote since this store was loaded.
     const AccountsManagerPtr onDisk = initInsideOfMigration();
     const Dictionary root{{"Accounts", _mergedAccounts(*onDisk)}, {"Version", currentVersion()}};
     // The file may be readable by now, with accounts that this store never saw.
     const bool holdsWhatNobodyRead = settingsFileIsUnreadable_ || onDisk->settingsFileIsUnreadable_;
     saved = writeSettingsFile(root, fullPathToAccountSettingsPlist(), holdsWhatNobodyRead);
+  } catch (const std::bad_alloc&) {
+    saved = false;  // as when any other thing that a save needs is missing
   }
   if (saved) {
     settingsFileIsUnreadable_ = false;

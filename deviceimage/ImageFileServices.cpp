@@ -86,11 +86,15 @@ bool ImageFileServices::fileExists(const std::string& path) {
 platform::FileServices::Opened ImageFileServices::createPrivateFile(const std::string& path) {
   const ReachedPtr reached = _reach(path);
   if (!reached->status.isSuccess()) return {reached->status, -1};
-  Opened opened = PosixFileServices::createPrivateFile(reached->path);
-  opened.status = reached->told(std::move(opened.status));
-  if (opened.status.isSuccess()) {
+  {
+    // First, so that no file is made that its maker never hears of, for want of memory.
     const std::lock_guard guard(_mutex);
     _begun[path] = reached;
+  }
+  Opened opened = PosixFileServices::createPrivateFile(reached->path);
+  if (!opened.status.isSuccess()) {
+    _letGo(path);
+    opened.status = reached->told(std::move(opened.status));
   }
   return opened;
 }

@@ -5,6 +5,7 @@
 #include <cerrno>
 #include <filesystem>
 #include <limits>
+#include <new>
 
 #include "tests/QuillnetAccountTypeRemoval/AccountsDevice.h"
 
@@ -98,6 +99,36 @@ TEST_F(SavingFaults, WhicheverFileCallFailsTheFileIsTheOldOrTheNewOneWhole) {
                    "createPrivateFile: not saved", "writeAll: not saved", "setOwner: not saved",
                    "makePrivate: not saved", "synchronizeFile: not saved", "closeFile: not saved",
                    "renameFileToFile: not saved", "synchronizeDirectoryOfFile: saved"}));
+}
+
+TEST_F(SavingFaults, MemoryThatRunsOutInAFileCallFailsTheSaveAndLeavesNothing) {
+  for (const char* call :
+       {"readPropertyListFile", "temporaryFileName", "createPrivateFile", "writeAll", "setOwner",
+        "makePrivate", "synchronizeFile", "renameFileToFile"}) {
+    SCOPED_TRACE(call);
+    loadAndChange();
+    const std::ptrdiff_t descriptors = countOfOpenDescriptors();
+    device.fileServices.decideBy([call](const std::string& made) -> std::optional<PlannedAnswer> {
+      if (made.starts_with(call)) throw std::bad_alloc();
+      return std::nullopt;
+    });
+    store->saveAllAccounts();
+    device.fileServices.decideBy(nullptr);
+    EXPECT_EQ(countOfOpenDescriptors(), descriptors);
+    expectFailedSave();
+    store->saveAllAccounts();  // with memory again
+    expectSaved();
+  }
+}
+
+TEST_F(SavingFaults, MemoryThatRunsOutBehindTheRenameDoesNotUndoTheSave) {
+  device.fileServices.decideBy([](const std::string& made) -> std::optional<PlannedAnswer> {
+    if (made.starts_with("synchronizeDirectoryOfFile")) throw std::bad_alloc();
+    return std::nullopt;
+  });
+  store->saveAllAccounts();
+  EXPECT_EQ(device.logLines(), Lines());
+  expectSaved();
 }
 
 TEST_F(SavingFaults, WriteThatStopsHalfWayLeavesTheOldFile) {

@@ -14,12 +14,16 @@
 #include <filesystem>
 #include <iterator>
 #include <limits>
+#include <new>
 #include <string>
 
 #include "QuillnetAccountTypeRemoval/ASSAccountsManager.h"
 #include "deviceimage/DeviceImageServices.h"
 #include "platform/InternalConsistencyFailure.h"
 #include "platform/Services.h"
+
+// Of the library that lets allocations fail, when it is there.
+extern "C" void beginToFail() __attribute__((weak));
 
 namespace {
 
@@ -33,7 +37,8 @@ enum Outcome {
   kDescriptorsLeaked = 8,
   kNotLoaded = 16,  // nothing was saved
   kWrongUsage = 32,
-  kTorn = 64,  // a reader met no whole file
+  kTorn = 64,          // a reader met no whole file
+  kOutOfMemory = 128,  // the library threw; alone
 };
 
 int logLines = 0;
@@ -47,6 +52,7 @@ int saveOnce(bool again) {
   // Both ways make the same calls up to the end of the first save, so that a fault hits the same
   // one.
   const std::ptrdiff_t before = countOfDescriptors();
+  if (beginToFail != nullptr) beginToFail();
   const accountsettings::AccountsManagerPtr store = ASSAccountsManager::init();
   const accountsettings::AccountPtr account = store->accountWithIdentifier("A");
   if (account == nullptr) return kNotLoaded;
@@ -126,5 +132,7 @@ int main(int count, char** arguments) {
     return run(count, arguments);
   } catch (const platform::InternalConsistencyFailure&) {
     return kNotLoaded;  // a resource of the library could not be read
+  } catch (const std::bad_alloc&) {
+    return kOutOfMemory;
   }
 }

@@ -32,9 +32,9 @@ CONTROLS = [
         ("propertylist/BinaryReader.cpp", ">= kMaximumDepth", ">= std::size_t{1} << 40U")]),
     Control("a writer without fsync", "S4", ["fault_saver", "device-image"], [
         ("QuillnetAccountTypeRemoval/SettingsFileWriting.cpp",
-         "files.makePrivate(descriptor).isSuccess() &&\n"
-         "                        files.synchronizeFile(descriptor).isSuccess();",
-         "files.makePrivate(descriptor).isSuccess();")]),
+         "_files.makePrivate(_descriptor).isSuccess() &&\n"
+         "                          _files.synchronizeFile(_descriptor).isSuccess();",
+         "_files.makePrivate(_descriptor).isSuccess();")]),
 ]
 
 

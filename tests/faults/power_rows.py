@@ -106,7 +106,7 @@ def cut_saves(found, directory, is_full):
 def cut_migrations(found, directory, is_full):
     """After the cut a second run ends the work, and no record is lost or doubled."""
     migration, place = migration_rows.prepared(found, directory, is_full, "m4")
-    kills = migration_rows.sampled(matrix.kills(migration_rows.traced(migration, place)), 10 if is_full else 200)
+    kills = migration_rows.sampled(matrix.kills(migration_rows.traced(migration, place)), 10 if is_full else 400)
     bases = file_systems(("ext4", "xfs"), place, migration.base)
     cases = [(name, kill, sync) for name in bases for kill in kills for sync in ("", "sync")]
 
