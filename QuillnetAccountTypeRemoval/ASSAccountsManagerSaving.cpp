@@ -15,10 +15,6 @@ using propertylist::Value;
 
 namespace {
 
-std::optional<Array> arrayOfStrings(const std::optional<StringList>& strings) {
-  return strings ? std::optional(accountsettings::arrayOfStrings(*strings)) : std::nullopt;
-}
-
 // Walks both dictionaries once instead of changing a copy key by key, so that the merge of accounts
 // with very many keys stays linear.
 Dictionary merged(const Dictionary& inMemory, const Dictionary& original,
@@ -81,8 +77,8 @@ Array ASSAccountsManager::_mergedAccounts(const ASSAccountsManager& onDisk) cons
         account->propertiesToSave(), account->originalProperties(),
         stored ? std::optional(stored->propertiesToSave()) : std::nullopt);
     // The list is computed whether or not tracing is on, and never printed.
-    const std::optional<Array> enabled = arrayOfStrings(account->enabledDataclasses());
-    ASLog("%@:%@", account->type(), result, enabled);
+    const StringList enabled = account->enabledDataclasses().value_or(StringList());
+    ASLog("%@:%@", account->type(), result, arrayOfStrings(enabled));
     accounts.emplace_back(result);
   }
   return Array(std::move(accounts));

@@ -42,7 +42,7 @@ std::optional<Value> parseIntegerText(std::string_view text) {
   std::uint64_t magnitude = 0;
   const char* const end = text.data() + text.size();
   const auto [stop, error] = std::from_chars(text.data(), end, magnitude, isHexadecimal ? 16 : 10);
-  if (error != std::errc() || stop != end || text.empty()) return std::nullopt;
+  if (error != std::errc() || stop != end) return std::nullopt;
   if (!isNegative) return Value(magnitude);
   if (magnitude > std::uint64_t{1} << 63U) return std::nullopt;
   return Value(static_cast<std::int64_t>(0 - magnitude));

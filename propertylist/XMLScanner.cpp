@@ -80,9 +80,8 @@ bool XMLScanner::_readDeclaration() {
 // Reads the names of a document type, which nobody opens.
 bool XMLScanner::_readDocumentType() {
   if (!_readBlanks() || _readName().empty()) return fail("a document type without a name");
-  bool isSeparate = _readBlanks();
+  _readBlanks();
   const std::size_t literals = _accept("PUBLIC") ? 2 : _accept("SYSTEM") ? 1 : 0;
-  if (literals > 0 && !isSeparate) return fail("a document type that is not well formed");
   for (std::size_t i = 0; i < literals; ++i) {
     if (!_readBlanks() || !_readLiteral()) return fail("a document type that is not well formed");
   }
@@ -118,7 +117,7 @@ bool XMLScanner::_skipInstruction() {
   const std::size_t start = _at;
   _at += 2;
   const std::string_view target = _readName();
-  const bool isSeparate = _at == end || (_at < end && isBlank(_text[_at]));
+  const bool isSeparate = _at == end || isBlank(_text[_at]);  // no name goes past the end
   if (target.empty() || !isSeparate || lowerCase(target) == "xml") {
     return _failAt(start, "a processing instruction that is not well formed");
   }
@@ -180,7 +179,9 @@ bool XMLScanner::_readAttribute(std::string_view& name, std::string& value) {
       value += _text[_at++];
     }
   }
-  return !isAtEnd() && _accept(std::string_view(&quote, 1));
+  if (isAtEnd()) return false;
+  ++_at;
+  return true;
 }
 
 bool XMLScanner::readText(std::string& text) {

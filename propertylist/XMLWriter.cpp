@@ -56,9 +56,9 @@ class XMLWriter {
   std::optional<std::string> write(const Value& value) {
     _text = kHead;
     bool isGood = _begin(value);
-    while (isGood && !_open.empty()) isGood = _continue() && _text.size() <= kMaximumFileSize;
+    while (isGood && !_open.empty()) isGood = _continue();
+    if (!isGood) return std::nullopt;
     _text += kFoot;
-    if (!isGood || _text.size() > kMaximumFileSize) return std::nullopt;
     return std::move(_text);
   }
 
@@ -93,9 +93,9 @@ class XMLWriter {
   bool _beginContainer(const Value& value, const std::string& name, bool isEmpty) {
     if (_open.size() == kMaximumDepth) return false;
     if (isEmpty) return _putLine("<" + name + "/>");
-    _putLine("<" + name + ">");
+    const bool isGood = _putLine("<" + name + ">");
     _open.push_back({&value, 0});
-    return true;
+    return isGood;
   }
 
   bool _continue() {
@@ -116,14 +116,16 @@ class XMLWriter {
   }
 
   bool _put(const std::string& name, const std::optional<std::string>& text) {
-    return text && _putLine("<" + name + ">" + *text + "</" + name + ">");
+    if (!text) return false;
+    return _putLine("<" + name + ">" + *text + "</" + name + ">");
   }
 
+  // False when the text has become larger than a reader takes.
   bool _putLine(std::string_view line) {
     _text.append(_open.size(), '\t');
     _text += line;
     _text += '\n';
-    return true;
+    return _text.size() + kFoot.size() <= kMaximumFileSize;
   }
 
   std::string _text;

@@ -50,6 +50,15 @@ TEST_F(SavingFixers, AreAskedFromTheLastAccountToTheFirstBeforeTheFileIsRead) {
   device.fileServices.alsoNoteCallsIn(nullptr);
 }
 
+TEST_F(SavingFixers, AccountWithoutIdentifierThatCannotBeFixedIsStillWritten) {
+  device.uuidGenerator.failEvery("generateUUID");
+  const Dictionary nameless = without(accountInfo("1"), "Identifier");
+  const auto store = loaded({"a"}, {nameless});
+  verdicts[""] = FixVerdict::couldNotFix;
+  store->saveAllAccounts();
+  EXPECT_EQ(device.savedAccounts(), Array{nameless});
+}
+
 TEST_F(SavingFixers, EachAccountGoesThroughEveryFixerInOrder) {
   const auto store = loaded({"a", "b"}, {accountInfo("1")});  // listed once for each fixer
   store->saveAllAccounts();

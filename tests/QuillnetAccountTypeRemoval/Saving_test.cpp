@@ -1,5 +1,7 @@
 #include <gtest/gtest.h>
 
+#include <utility>
+
 #include "tests/QuillnetAccountTypeRemoval/AccountsDevice.h"
 
 namespace accountsettings {
@@ -156,6 +158,32 @@ TEST_F(Saving, SnapshotStaysAsLoadedWhileNotificationsAreSkipped) {
   store->saveAllAccounts();
   EXPECT_EQ(store->originalAccountsByID().size(), 2U);
   EXPECT_EQ(store->originalAccountsByID().at("1"), accountInfo("1"));
+}
+
+TEST_F(Saving, RenewsTheSnapshotWhenTheNotifiersHaveBeenTold) {
+  ASSAccountsManager::_setShouldSkipNotifications(false);
+  device.writeAccounts({accountInfo("1"), accountInfo("2")});
+  const auto store = OpenStore::ofFile();
+  first(store)->setAccountPropertyForKey(2, "a");
+  store->deleteAccountWithIdentifier("2");
+  store->saveAllAccounts();
+  EXPECT_EQ(store->originalAccountsByID().size(), 1U);
+  EXPECT_EQ(store->originalAccountsByID().at("1"), accountInfo("1", "CalDAV", {{"a", 2}}));
+}
+
+TEST_F(Saving, TellsTheNotifiersOfWhatWasSavedAlone) {
+  ASSAccountsManager::_setShouldSkipNotifications(false);
+  device.setResource("AccountCreators", Dictionary());  // whoever looks for notifiers finds none
+  device.writeAccounts({accountInfo("1")});
+  const AccountsManagerPtr store = ASSAccountsManager::init();
+  first(store)->setAccountPropertyForKey(Array{kAccountDataclassCalendars}, "Enabled Dataclasses");
+  const auto users = std::exchange(device.userDatabase.users, {});
+  store->saveAllAccounts();
+  EXPECT_EQ(device.savedAccounts(), Array{accountInfo("1")});
+  device.userDatabase.users = users;
+  expectAssertionFailure(
+      "Malformed AccountCreators information. Could not find the information for the type CalDAV",
+      "ASSAccountsManager", [&] { store->saveAllAccounts(); });
 }
 
 TEST_F(Saving, ExactlyTheAccountsInMemoryAreWritten) {

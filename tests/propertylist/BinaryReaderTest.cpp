@@ -196,6 +196,19 @@ TEST(BinaryReader, ReadsAMillionSharedValuesAndNotOneMore) {
   EXPECT_EQ(errorOf(product(999, 1000, true)).what, "too many values");
 }
 
+TEST(BinaryReader, RefusesAContainerThatFillsTheLimitAlone) {
+  // 1 + 998 * (1 + 1001) + 3 = 1,000,000 in an array of its own, which is one more.
+  BinaryList list = product(998, 1001, false);
+  std::vector<std::uint64_t> members(998, 1);
+  members.insert(members.end(), 3, 2);
+  list.objects[0] = container(0xA0, members.size(), members, 1);
+  EXPECT_TRUE(read(list).has_value());
+  list.objects.push_back(container(0xA0, 1, {0}, 1));
+  list.top = 3;
+  EXPECT_EQ(read(list), std::nullopt);
+  EXPECT_EQ(errorOf(list).what, "too many values");
+}
+
 TEST(BinaryReader, ReadsAsManyValuesAsALargeFileHasBytes) {
   BinaryList list = product(999, 1000, true);
   list.objects.emplace_back(2000000, '\0');  // reached by nobody

@@ -108,6 +108,14 @@ TEST(BinaryWriter, GivesEqualBytesForEqualValuesHoweverTheyShare) {
   EXPECT_EQ(written(readBack), written(shared));
 }
 
+TEST(BinaryWriter, StoresLongDataOnceWhetherSharedOrEqual) {
+  const Value data(Bytes(1000, 7));
+  const Value value(Array{data, data, Bytes(1000, 7)});
+  const std::optional<Bytes> written = writeBinaryPropertyList(value);
+  EXPECT_LT(written->size(), 1100U);
+  EXPECT_EQ(readBinaryPropertyList(*written).value, value);
+}
+
 TEST(BinaryWriter, UsesTheSmallestSizesThatFit) {
   const struct {
     const char* name;
@@ -152,6 +160,10 @@ TEST(BinaryWriter, GivesNothingForWhatAReaderWouldRefuse) {
     EXPECT_EQ(writeBinaryPropertyList(c.value), std::nullopt);
     EXPECT_EQ(writeXMLPropertyList(c.value), std::nullopt);
   }
+}
+
+TEST(BinaryWriter, GivesNothingForAFileAboveTheLimit) {
+  EXPECT_EQ(writeBinaryPropertyList(Bytes(std::size_t{256} << 20U)), std::nullopt);
 }
 
 TEST(BinaryWriter, WritesMoreThanAMillionValuesWhereTheFileHasAsManyBytes) {
