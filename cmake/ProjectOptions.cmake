@@ -28,8 +28,15 @@ if(PROJECT_SANITIZE)
   target_link_options(project_options INTERFACE -fsanitize=${PROJECT_SANITIZE})
 endif()
 if(PROJECT_COVERAGE)
-  target_compile_options(project_options INTERFACE --coverage)
-  target_link_options(project_options INTERFACE --coverage)
+  # gcov counts branches of the machine's code, among them those that destroy temporaries; clang counts
+  # branches of the source.
+  if(CMAKE_CXX_COMPILER_ID STREQUAL "Clang")
+    set(coverage_flags -fprofile-instr-generate -fcoverage-mapping)
+  else()
+    set(coverage_flags --coverage)
+  endif()
+  target_compile_options(project_options INTERFACE ${coverage_flags})
+  target_link_options(project_options INTERFACE ${coverage_flags})
 endif()
 
 # Everything built lies where its users look for it, so that the build tree runs like an installation.

@@ -16,6 +16,8 @@ import subprocess
 JUMP = re.compile(r"^(\s+)j(?!mp)[a-z]+(\s+)(\.L\w+)")
 FILE = re.compile(r'\s+\.file\s+(\d+)\s+(?:"[^"]*"\s+)?"([^"]*)"')
 LINE = re.compile(r"\s+\.loc\s+(\d+)\s+(\d+)")
+LANDING = re.compile(r"\s+\.uleb128 (\.L\d+)-\.LFB\d+$")
+DESTRUCTOR = re.compile(r"\s+call\s+\S*D[012]Ev(@PLT)?$")
 LIMIT = 60  # seconds of one test run; a mutant that takes longer is noticed
 
 Mutant = collections.namedtuple("Mutant", "index line always")
@@ -38,10 +40,12 @@ class Program:
 
     def link(self, ours, source, place):
         """Links with `ours` in place of what was made of `source`."""
-        made = os.path.join(place, os.path.basename(self.output))
-        command = [word for word in self.command if not word.endswith(f"{source}.o")]
+        names = [word.rsplit(",", 1)[1] for word in self.command if word.startswith("-Wl,-soname,")]
+        made = os.path.join(place, (names or [os.path.basename(self.output)])[0])
+        replaced = f"/{os.path.basename(source)}.o"
+        command = [word for word in self.command if not word.endswith(replaced)]
         command[command.index(self.output)] = made
-        command.insert(command.index("-o"), ours)
+        command.insert(1, ours)  # before others that have the same inline functions
         return made if run(command, self.build) == 0 else None
 
     def notices(self, made):
@@ -65,20 +69,38 @@ def assembly_of(build, source, place):
     command = [word for word in shlex.split(entry["command"]) if word not in ("-c", "ccache", "/usr/bin/ccache")]
     text = os.path.join(place, "whole.s")
     command[command.index("-o") + 1] = text
-    if run([*command, "-O0", "-g", "-S"], entry["directory"]) != 0:
+    if run([*command, "-O0", "-g", "-D_GLIBCXX_ASSERTIONS", "-S"], entry["directory"]) != 0:
         raise SystemExit(f"{source} does not compile")
     with open(text, encoding="utf-8") as lines:
         return command[0], lines.read().split("\n")
 
 
+def skips_a_destructor(lines, index):
+    """Whether the jump only passes over the destruction of a temporary, which is no branch of the source."""
+    label = JUMP.match(lines[index])[3] + ":"
+    calls = []
+    for line in lines[index + 1:index + 12]:
+        if line == label or re.match(r"\s+jmp\s", line):
+            return len(calls) == 1 and DESTRUCTOR.match(calls[0]) is not None
+        if re.match(r"\s+(call|j)", line):
+            calls.append(line)
+    return False
+
+
 def mutants_of(lines, source):
-    files, where, mutants = {}, None, []
+    """Two for each jump of the source, those left out that only an exception or a destruction comes to."""
+    landings = {match[1] + ":" for line in lines if (match := LANDING.match(line))}
+    files, where, is_landing, mutants = {}, None, False, []
     for index, line in enumerate(lines):
-        if match := FILE.match(line):
+        if line in landings:
+            is_landing = True
+        elif re.match(r"\s+(jmp|\.cfi_endproc|call\s+_Unwind_Resume)", line):
+            is_landing = False
+        elif match := FILE.match(line):
             files[match[1]] = os.path.basename(match[2])
         elif match := LINE.match(line):
             where = int(match[2]) if files.get(match[1]) == os.path.basename(source) else None
-        elif JUMP.match(line) and where:
+        elif where and not is_landing and JUMP.match(line) and not skips_a_destructor(lines, index):
             mutants += [Mutant(index, where, True), Mutant(index, where, False)]
     return mutants
 

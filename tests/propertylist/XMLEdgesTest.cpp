@@ -76,6 +76,7 @@ TEST(XMLEdges, AreReadWhereTheFormAllowsThem) {
       {"return at the end of a text", "<plist><string>a\r</string></plist>", "a\n"},
       {"capital X of a hexadecimal number", "<plist><integer>0X1F</integer></plist>", 31},
       {"names of every sign", "<?a-b.c9_:\xC3\xA4Z?><?_?><?:?><plist><true/></plist>", true},
+      {"instruction that begins like a declaration", "<?xml-style a?><plist><true/></plist>", true},
       {"name of another script", "<?\xC3\xA4?><plist><true/></plist>", true},
       {"capital digits of a reference", "<plist><string>&#x4F;</string></plist>", "O"},
   };
