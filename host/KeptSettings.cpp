@@ -45,32 +45,43 @@ void KeptSettings::_keep() {
     return;
   }
   const std::map<unsigned, std::string> copies = copiesIn(_image);
-  if (std::any_of(copies.begin(), copies.end(), [this](const auto& copy) {
-        return _image.readFile(copy.second).bytes == _content.bytes;
-      }))
+  const auto equal = std::find_if(copies.begin(), copies.end(), [this](const auto& copy) {
+    return _image.readFile(copy.second).bytes == _content.bytes;
+  });
+  if (equal != copies.end()) {
+    _copy = equal->second;
     return;
+  }
   unsigned free = 1;
   while (copies.contains(free)) ++free;
   const std::string name = nameOfCopy(free);
   const platform::Status status = _image.createFile(name, *_content.bytes);
-  if (status.isSuccess())
+  if (status.isSuccess()) {
     _copy = name;
-  else
+    _wasMadeHere = true;
+  } else {
     _error = status.error->description;
+  }
+}
+
+void KeptSettings::_removeCopy() {
+  if (!_wasMadeHere) return;
+  _image.removeFile(_copy).ignore("one copy too many does no harm");
+  _copy.clear();
 }
 
 SettingsFate KeptSettings::settle() {
   const Settings now = readSettings(_image);
   if (!now.exists) return _content.exists ? _putBack() : SettingsFate::untouched;
   if (!_content.exists || !isSameFile(_file, now.file)) return SettingsFate::replaced;
-  if (!_copy.empty()) _image.removeFile(_copy).ignore("one copy too many does no harm");
+  _removeCopy();
   return SettingsFate::untouched;
 }
 
 SettingsFate KeptSettings::_putBack() {
   const platform::Status status = _image.createFile(DeviceImage::kSettingsFile, *_content.bytes);
   if (!status.isSuccess()) return SettingsFate::lost;
-  if (!_copy.empty()) _image.removeFile(_copy).ignore("one copy too many does no harm");
+  _removeCopy();
   return SettingsFate::putBack;
 }
 

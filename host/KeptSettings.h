@@ -27,18 +27,22 @@ class KeptSettings {
 
   // Why the settings file, which is there, could not be copied; empty when all is well.
   const std::string& error() const { return _error; }
+  // The path of the copy; empty when there is none.
+  std::string copy() const { return _copy.empty() ? _copy : _image.absolutePath(_copy); }
   // After the migration, whatever came of it. A file that is gone is put back as it was; the copy
   // of one that is there as before is removed, if this object made it.
   SettingsFate settle();
 
  private:
   void _keep();
+  void _removeCopy();
   SettingsFate _putBack();
 
   const deviceimage::DeviceImage& _image;
   deviceimage::FileContent _content;  // of the settings file before
   struct stat _file = {};
-  std::string _copy;  // the name of the one that was made here; empty when none was
+  std::string _copy;          // its name; empty when there is none
+  bool _wasMadeHere = false;  // and not found
   std::string _error;
 };
 

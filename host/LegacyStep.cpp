@@ -35,10 +35,10 @@ std::vector<std::string> doubtsAbout(const DeviceImage& image, SettingsFate fate
   return {std::string(kAccountMigratorName) + " made no settings file of what older systems left."};
 }
 
-void judge(const DeviceImage& image, const Settings& before, LegacyReport& report) {
+void judge(const DeviceImage& image, LegacyReport& report) {
   std::string sentence = sentenceFor(*report.migrator);
   if (sentence.empty())
-    report.reasons = doubtsAbout(image, report.settings, before);
+    report.reasons = doubtsAbout(image, report.settings, report.settingsBefore);
   else
     report.reasons.push_back(std::move(sentence));
   if (!report.isDone()) report.reasons.push_back(sentenceFor(report.settings, image));
@@ -82,7 +82,7 @@ LegacyReport runLegacyStep(const DeviceImage& image, const LegacyTask& task,
   report.need = legacyNeedOf(image);
   if (report.need.any()) report.reasons = reasonsAgainstAccountMigrator(image);
   if (report.need.any() && report.isDone()) {
-    const Settings before = readSettings(image);
+    report.settingsBefore = readSettings(image);
     KeptSettings kept(image);
     if (kept.error().empty()) {
       report.migrator = runMigrator({std::string(kAccountMigratorName),
@@ -92,7 +92,8 @@ LegacyReport runLegacyStep(const DeviceImage& image, const LegacyTask& task,
                                      task.limit},
                                     interruption, sink);
       report.settings = kept.settle();
-      judge(image, before, report);
+      report.keptCopy = kept.copy();
+      judge(image, report);
     } else {
       report.reasons.push_back(image.settingsFile() +
                                " cannot be copied, so that nothing was done: " + kept.error() +

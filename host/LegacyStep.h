@@ -10,6 +10,7 @@
 #include "host/KeptSettings.h"
 #include "host/LegacySettings.h"
 #include "host/MigratorProcess.h"
+#include "host/Settings.h"
 
 namespace host {
 
@@ -18,6 +19,8 @@ struct LegacyReport {
   LegacyNeed need;                          // before the step
   std::optional<MigratorOutcome> migrator;  // none when it was not run
   SettingsFate settings = SettingsFate::untouched;
+  Settings settingsBefore;  // before the step; of a step that ran a migrator
+  std::string keptCopy;     // the path of the copy of those settings; empty when there is none
   std::vector<std::string> keptSettings;  // paths of all copies that lie in the image afterwards
   std::vector<std::string> reasons;       // sentences: why it was refused, or what went wrong
   // Whether nothing is left to be done.

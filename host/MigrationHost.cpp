@@ -9,6 +9,7 @@
 #include "deviceimage/ImageLock.h"
 #include "deviceimage/SyncAgent.h"
 #include "host/AccountComparison.h"
+#include "host/DiscardedAccounts.h"
 #include "host/MigratorChild.h"
 #include "host/ProcessTree.h"
 #include "host/RecordAccounting.h"
@@ -124,6 +125,9 @@ void MigrationHost::_runUnderLock(const RunOptions& options, int lockDescriptor)
   if (!before.error.empty()) return _refuse(before.error);
   const Selection selection = selectionOf(_image, _bundles);
   const deviceimage::SyncAgent agent(*_image);
+  if (_report.legacy && _report.legacy->migrator)
+    _leftByLegacy =
+        leftByNewSettings(_report.legacy->settingsBefore, before, agent, _report.legacy->keptCopy);
   removeStaleTemporaryFiles(*_image);
   _image->removeLeftovers();
   if (!_interruption.requested()) _runMigrators(options, lockDescriptor);
@@ -141,9 +145,12 @@ bool MigrationHost::_migrateLegacy(const RunOptions& options, int lockDescriptor
     for (std::string& reason : reasonsNotToStart(*_image, Settings{}, _bundles))
       _refuse(std::move(reason));
     if (!_report.reasons.empty()) return false;
-    removeStaleTemporaryFiles(*_image);
-    _image->removeLeftovers();
     _listener.stageBegan("Migrating legacy settings");
+    // The step itself refuses a migrator that is not to be trusted; nothing is written before.
+    if (reasonsAgainstAccountMigrator(*_image).empty()) {
+      removeStaleTemporaryFiles(*_image);
+      _image->removeLeftovers();
+    }
   }
   _report.legacy =
       runLegacyStep(*_image, {kMigrateLegacyArgument, lockDescriptor, options.limit}, _interruption,
@@ -205,7 +212,8 @@ void MigrationHost::_compare(const Observation& before, const Observation& after
                                                selection, rightsOf(_bundles));
   _report.accounts = std::move(accounts.accounts);
   append(contradictions, accounts.contradictions);
-  std::vector<std::string> leftBehind = std::move(accounts.leftBehind);
+  std::vector<std::string> leftBehind = std::move(_leftByLegacy);
+  append(leftBehind, accounts.leftBehind);
   if (after.error.empty()) {
     RecordAccounting records = accountForRecords(before, after, selection, agent);
     _report.dataclasses = std::move(records.dataclasses);

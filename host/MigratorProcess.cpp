@@ -29,8 +29,11 @@ constexpr std::chrono::seconds kPatience{10};
 // Watches one process from its start to its end.
 class Watch {
  public:
-  Watch(LaunchedMigrator launched, const MigratorTask& task, const LineSink& sink)
-      : _process(std::move(launched)), _sink(sink), _deadline(Clock::now() + task.limit) {
+  Watch(LaunchedMigrator launched, Sessions spared, const MigratorTask& task, const LineSink& sink)
+      : _process(std::move(launched)),
+        _spared(std::move(spared)),
+        _sink(sink),
+        _deadline(Clock::now() + task.limit) {
     _outcome.name = task.name;
     _outcome.ending = Ending::left;
   }
@@ -134,7 +137,7 @@ class Watch {
 
   void _collectEnd() {
     kill(-_process.identifier, SIGKILL);
-    const EndedChildren ended = endAllChildren(_process.identifier);
+    const EndedChildren ended = endAllChildren(_process.identifier, _spared);
     // The rest of what was sent. Who cannot be killed may go on sending.
     const Clock::time_point end = Clock::now() + (ended.all ? kPatience : std::chrono::seconds(0));
     do _takeNews();
@@ -168,6 +171,7 @@ class Watch {
   }
 
   LaunchedMigrator _process;
+  Sessions _spared;
   const LineSink& _sink;
   Clock::time_point _deadline;
   MessageReader _reader;
@@ -209,8 +213,9 @@ MigratorOutcome runMigrator(const MigratorTask& task, Interruption& interruption
                             const LineSink& sink) {
   const Clock::time_point start = Clock::now();
   MigratorOutcome outcome;
+  Sessions earlier = sessionsOfFamily();
   if (std::optional<LaunchedMigrator> launched = launchMigrator(task)) {
-    outcome = Watch(std::move(*launched), task, sink).untilItEnds(interruption);
+    outcome = Watch(std::move(*launched), std::move(earlier), task, sink).untilItEnds(interruption);
   } else {
     outcome.name = task.name;
     outcome.detail = std::generic_category().message(errno);

@@ -57,9 +57,11 @@ using LineSink = std::function<void(std::string_view line)>;
 //   TMPDIR alone, in a build with sanitizers their options too. It is in a session of its own, its
 //   address space is limited, and it dies with the host.
 // - Past the limit of the task, or when the user interrupts, it is killed.
-// - When it has ended, every process that it left behind is killed, and none remains a zombie. The
-//   caller has no other children meanwhile, and has called adoptOrphans. Processes that cannot be
-//   killed within ten seconds are left alone, and the migrator counts as having left.
+// - When it has ended, every process that it left behind is killed, and none remains a zombie.
+//   Children that the caller had before, as a program run by a shell's exec may, are left alone,
+//   and so is what is in their sessions; it starts none meanwhile, and has called adoptOrphans.
+//   Processes that cannot be killed within ten seconds are left alone, and the migrator counts as
+//   having left.
 MigratorOutcome runMigrator(const MigratorTask& task, Interruption& interruption,
                             const LineSink& sink);
 

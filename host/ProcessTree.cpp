@@ -11,6 +11,7 @@
 #include <csignal>
 #include <cstdlib>
 #include <fstream>
+#include <map>
 #include <string>
 #include <vector>
 
@@ -30,18 +31,38 @@ pid_t parentOf(const std::string& process) {
   return static_cast<pid_t>(std::strtol(line.c_str() + end + 4, nullptr, 10));
 }
 
-std::vector<pid_t> childrenOf(pid_t parent) {
-  std::vector<pid_t> children;
+using Children = std::map<pid_t, std::vector<pid_t>>;  // by their parent
+
+Children childrenOfAll() {
+  Children children;
   DIR* directory = opendir("/proc");
   if (directory == nullptr) return children;
   while (const dirent* entry = readdir(directory)) {
     const std::string name = entry->d_name;
     if (name.find_first_not_of("0123456789") != std::string::npos) continue;
-    if (parentOf(name) == parent)
-      children.push_back(static_cast<pid_t>(std::strtol(name.c_str(), nullptr, 10)));
+    children[parentOf(name)].push_back(static_cast<pid_t>(std::strtol(name.c_str(), nullptr, 10)));
   }
   closedir(directory);
   return children;
+}
+
+// Kills the children that are not spared.
+struct Killed {
+  bool any = false;
+  bool anySpared = false;
+};
+Killed killChildren(pid_t awaited, const Sessions& spared) {
+  Killed killed;
+  const std::vector<pid_t> children = childrenOfAll()[getpid()];
+  for (const pid_t child : children) {
+    if (child != awaited && spared.contains(getsid(child))) {
+      killed.anySpared = true;
+    } else {
+      killed.any = true;
+      kill(child, SIGKILL);
+    }
+  }
+  return killed;
 }
 
 // Takes away the ends of children that have ended.
@@ -60,12 +81,30 @@ void reapEndedChildren(pid_t awaited, EndedChildren& ended) {
 
 bool adoptOrphans() { return prctl(PR_SET_CHILD_SUBREAPER, 1, 0, 0, 0) == 0; }
 
-EndedChildren endAllChildren(pid_t awaited) {
+Sessions sessionsOfFamily() {
+  const Children children = childrenOfAll();
+  Sessions sessions;
+  std::vector<pid_t> toVisit = {getpid()};
+  while (!toVisit.empty()) {
+    const pid_t process = toVisit.back();
+    toVisit.pop_back();
+    if (const pid_t session = getsid(process); session >= 0) sessions.insert(session);
+    if (const auto found = children.find(process); found != children.end())
+      toVisit.insert(toVisit.end(), found->second.begin(), found->second.end());
+  }
+  return sessions;
+}
+
+EndedChildren endAllChildren(pid_t awaited, const Sessions& spared) {
   const auto deadline = std::chrono::steady_clock::now() + Seconds(10);
   EndedChildren ended;
   reapEndedChildren(awaited, ended);
   while (!ended.all && std::chrono::steady_clock::now() < deadline) {
-    for (const pid_t child : childrenOf(getpid())) kill(child, SIGKILL);
+    const Killed killed = killChildren(awaited, spared);
+    if (!killed.any && killed.anySpared) {
+      ended.all = true;
+      break;
+    }
     poll(nullptr, 0, 1);  // a killed process ends a moment later
     reapEndedChildren(awaited, ended);
   }

@@ -1,4 +1,5 @@
 """Whatever a migrator does, the host ends in time, says what happened, and leaves nothing behind."""
+import json
 import shutil
 import signal
 import subprocess
@@ -88,6 +89,25 @@ class FaultyBundles(hosttest.HostTestCase):
         for number in numbers:
             with self.assertRaises(ProcessLookupError):
                 hosttest.os.kill(number, 0)
+
+    def test_one_whose_host_has_children_from_before(self):
+        """They are not the migrator's, and live on, whatever their sessions; what it leaves is ended as ever."""
+        script = ('sleep 300 >&- 2>&- & echo $! > "$0"; setsid sleep 300 >&- 2>&- & echo $! >> "$0"; '
+                  'sh -c "sleep 300 >&- 2>&- & echo \\$!" >> "$0"; exec "$@"')
+        numbers = self.directory / "numbers"
+        process = self.start("--json", "--quiet", "--bundle", hosttest.BUNDLES / "LeavesAWriter.migrator",
+                             prefix=("bash", "-c", script, str(numbers)))
+        output, errors = process.communicate(timeout=100)
+        earlier = [int(line) for line in numbers.read_text(encoding="ascii").splitlines()]
+        for number in earlier:
+            self.addCleanup(hosttest.os.kill, number, 9)
+        self.assertEqual(0, process.returncode, output + errors)
+        self.assertEqual(3, len(earlier))
+        for number in earlier:
+            hosttest.os.kill(number, 0)
+        report = json.loads(output)
+        with self.assertRaises(ProcessLookupError):
+            hosttest.os.kill(int(report["log"][0].removeprefix("left ")), 0)
 
     def check_that_nobody_is_left(self, name, code, result, limit=60):
         run = self.check(name, code, result, limit)

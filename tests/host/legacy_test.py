@@ -19,17 +19,17 @@ COPY = hosttest.SETTINGS + ".before-migration-1"
 QUILLNET = {"Class": "QuillnetAccount", "UniqueIdentifier": "Q", "AccountName": "ada", "QuillnetStatus": 1,
             "Dataclasses": ["Contacts"]}
 PLAIN = {"Class": "IMAPAccount", "UniqueIdentifier": "M", "AccountName": "Post", "Dataclasses": ["Mail"]}
-RECORDS = [record("contacts", None, "local", card("local", "Lo")),
-           record("contacts", hosttest.SERVICE, "new", card("new", "Nora"))]
+LOCAL_RECORDS = [record("contacts", None, "local", card("local", "Lo"))]
+SERVICE_RECORDS = [record("contacts", hosttest.SERVICE, "new", card("new", "Nora"))]
 
 
 class LegacyTestCase(hosttest.HostTestCase):
     def setUp(self):
         super().setUp()
-        self.make_image(RECORDS)
+        self.make_image(LOCAL_RECORDS)
         self.write_agent_name("ada")
         self.place(os.environ["ACCOUNT_MIGRATOR"])
-        self.write_settings(account("N", "Mail", ("Mail",), Class="IMAPAccount"))
+        self.write_settings(account("M", "Mail", ("Mail",), Class="IMAPAccount"))
 
     def place(self, bundle):
         shutil.rmtree(self.image / MIGRATOR, ignore_errors=True)
@@ -57,6 +57,7 @@ class LegacyTestCase(hosttest.HostTestCase):
 
 class LegacyStepNeeded(LegacyTestCase):
     def test_accounts_of_a_legacy_file_are_made_and_then_migrated(self):
+        self.make_image(SERVICE_RECORDS)
         before = self.bytes_of(hosttest.SETTINGS)
         self.write_legacy(PLAIN, QUILLNET)
         legacy = self.bytes_of(MAIL)
@@ -76,6 +77,30 @@ class LegacyStepNeeded(LegacyTestCase):
         self.assertEqual(before, self.bytes_of(COPY))
         self.assertEqual(0o600, (self.image / COPY).stat().st_mode & 0o7777)
         self.assertEqual(legacy, self.bytes_of(MAIL))
+
+    def test_accounts_that_only_the_settings_before_had_are_left_behind_with_their_records(self):
+        self.make_image(SERVICE_RECORDS)
+        self.write_settings(account("Q", "Quillnet", ("Contacts",), status=1), account("N", "Mail"))
+        self.write_legacy(PLAIN)
+        run = self.run_legacy()
+        self.assertEqual((3, "left behind", True), (run.code, run.report["outcome"], run.report["balanced"]))
+        self.assertEqual(
+            ["The Quillnet account q@example.net of the settings file from before is not in the new one; "
+             f"{self.image / COPY} still has it.",
+             f"The Mail account n@example.net of the settings file from before is not in the new one; "
+             f"{self.image / COPY} still has it.",
+             "1 record of contacts in the store Quillnet:ada belongs to no account of the new settings file and "
+             "would not be migrated."], run.report["reasons"])
+        self.assertEqual(["M"], self.identifiers())
+        self.assertEqual([card("new", "Nora").encode()], self.contents("contacts", hosttest.SERVICE))
+
+    def test_records_of_lost_settings_are_left_behind(self):
+        self.make_image(SERVICE_RECORDS)
+        (self.image / hosttest.SETTINGS).unlink()
+        self.write_legacy(PLAIN)
+        run = self.run_legacy()
+        self.assertEqual((3, "left behind"), (run.code, run.report["outcome"]))
+        self.assertIn("in the store Quillnet:ada belongs to no account", run.report["reasons"][0])
 
     def test_the_text_says_what_was_made_and_kept(self):
         self.write_legacy(PLAIN)
@@ -113,12 +138,12 @@ class LegacyStepNeeded(LegacyTestCase):
             while not any("->" in line and f":{lock_number(lock)} " in line
                           for line in pathlib.Path("/proc/locks").read_text(encoding="ascii").splitlines()):
                 self.assertIsNone(process.poll())
-            self.write_settings(account("O", "Mail"))
+            self.write_settings(account("N", "Mail"), account("O", "Mail"))
         run = self.finish(process)
         self.assertEqual((0, "done", "replaced"),
                          (run.code, run.report["legacy"]["result"], run.report["legacy"]["settings"]), run.output)
         self.assertEqual([], [line for line in run.report["log"] if line.startswith("AccountMigrator")])
-        self.assertEqual(["O"], self.identifiers())
+        self.assertEqual(["N", "O"], self.identifiers())
 
 
 def lock_number(file):
@@ -133,7 +158,7 @@ class LegacyStepNotNeeded(LegacyTestCase):
         self.assertEqual({"result": "not needed", "mail_accounts": False, "data_access": False,
                           "older_version": False, "settings": "untouched", "kept_copies": []}, run.report["legacy"])
         self.assertFalse((self.image / LOCK).exists())
-        self.assertEqual(["N"], self.identifiers())
+        self.assertEqual(["M"], self.identifiers())
 
     def test_needs_no_migrator(self):
         shutil.rmtree(self.image / MIGRATOR)
@@ -192,8 +217,15 @@ class LegacyStepNotAskedFor(LegacyTestCase):
 
 
 class LegacyStepRefused(LegacyTestCase):
+    def plant_leftovers(self):
+        """What killed programs have left, which a run that starts removes."""
+        for name in ("tmp/fileAb12Zz", "var/mobile/Library/Preferences/.new-77-com.vantor.accountsettings.plist"):
+            (self.image / name).write_bytes(b"bplist00")
+            (self.image / name).chmod(0o600)
+
     def check_refusal(self, *words):
         self.write_legacy(PLAIN)
+        self.plant_leftovers()
         with self.unchanged_image():
             run = self.run_legacy()
         self.assert_refused(run, *words)
@@ -232,6 +264,7 @@ class LegacyStepFailed(LegacyTestCase):
     """A step that fails ends the run, and the image has its settings and records as before."""
 
     def check_failure(self, code, behaviour, *words, arguments=()):
+        self.make_image(SERVICE_RECORDS)
         self.script(behaviour)
         self.write_legacy(PLAIN, QUILLNET)
         before = self.bytes_of(hosttest.SETTINGS)

@@ -1,0 +1,53 @@
+#include "host/DiscardedAccounts.h"
+
+#include <set>
+#include <utility>
+
+#include "host/AccountComparison.h"
+
+namespace host {
+namespace {
+
+using deviceimage::Dataclass;
+using deviceimage::dataclassName;
+
+std::string sentenceFor(const AccountReport& account, const std::string& keptCopy) {
+  return "The " + account.type + " account " +
+         (account.displayName.empty() ? account.identifier : account.displayName) +
+         " of the settings file from before is not in the new one" +
+         (keptCopy.empty() ? "." : "; " + keptCopy + " still has it.");
+}
+
+std::string sentenceFor(const ObservedStore& store) {
+  const std::size_t count = store.records.size();
+  return std::to_string(count) + (count == 1 ? " record of " : " records of ") +
+         std::string(dataclassName(store.dataclass)) + " in the store " + *store.account +
+         (count == 1 ? " belongs" : " belong") +
+         " to no account of the new settings file and would not be migrated.";
+}
+
+}  // namespace
+
+std::vector<std::string> leftByNewSettings(const Settings& before, const Observation& now,
+                                           const deviceimage::SyncAgent& agent,
+                                           const std::string& keptCopy) {
+  std::vector<std::string> sentences;
+  // An account without an identifier gets one when the file is brought up to date.
+  const AccountRights rights = {{"Identifier"}, {}, {}};
+  const AccountComparison accounts =
+      compareAccounts(before.accounts, now.settings.accounts, Selection{}, rights);
+  for (const AccountReport& account : accounts.accounts)
+    if (account.outcome == AccountOutcome::dropped)
+      sentences.push_back(sentenceFor(account, keptCopy));
+  std::set<std::string> owned;  // a store's name counts whatever it holds
+  for (const propertylist::Dictionary& account : now.settings.accounts)
+    for (const Dataclass dataclass : deviceimage::kDataclasses)
+      if (auto store = agent.storeIdentifier(account, dataclass)) owned.insert(std::move(*store));
+  for (const ObservedStore& store : now.stores)
+    if (store.account && !store.retired && !store.records.empty() &&
+        !owned.contains(*store.account))
+      sentences.push_back(sentenceFor(store));
+  return sentences;
+}
+
+}  // namespace host
