@@ -17,6 +17,10 @@ enum class MessageKind : char {
   succeeded = 's',  // performMigration answered true
   failed = 'f',     // performMigration answered false
   notLoaded = 'x',  // the bundle could not be loaded; the text says why
+  waiting = 'w',    // the process waits for a lock that another program may hold
+  begun = 'b',      // and has it
+  notNeeded = 'u',  // there was nothing to do any more
+  notBegun = 'y',   // what must come before the migrator failed; the text says why
   raised = 'r'      // the migrator raised; the text says what
 };
 

@@ -28,13 +28,20 @@ struct ChildOptions {
 
 // Installs the services of the image at `imagePath`, does the work, passes every line of the log
 // and whatever is thrown on to the host, and gives the exit status of the process. Nothing of the
-// program's own may have been set up before.
+// program's own may have been set up before. Does nothing and gives 2 in a process that was not
+// started by a host: one without the channel, or without the image's lock held at its place.
 int workForHost(const std::string& imagePath, const ChildWork& work,
                 const ChildOptions& options = {});
 
 // Each tells the host and gives the exit status.
 int tellEnd(bool hasSucceeded);
 int tellNotLoaded(std::string_view why);
+int tellNotNeeded();                     // another program has done the work
+int tellNotBegun(std::string_view why);  // what must come before the migrator failed
+// Around the wait for a lock that another program may hold: a process that is ended for its time
+// meanwhile counts as busy.
+void tellWaiting();
+void tellBegun();
 void tellName(std::string_view name);  // what the migrator calls itself; before the end
 
 }  // namespace host

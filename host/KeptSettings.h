@@ -2,6 +2,7 @@
 
 #include <sys/stat.h>
 
+#include <map>
 #include <string>
 #include <vector>
 
@@ -17,32 +18,40 @@ enum class SettingsFate {
   lost        // it was gone, and could not be put back: the copy is all there is
 };
 
-// A copy of the settings file, made before a migration that discards or replaces the file: beside
-// it, under the first free name "com.vantor.accountsettings.plist.before-migration-<n>" (n from 1),
-// with mode 0600. A copy of the same content that is there already will do. The image outlives the
-// object, and its lock is held.
+// Copies the settings file, before a migration that discards or replaces it: beside it, under the
+// first free name "com.vantor.accountsettings.plist.before-migration-<n>" (n from 1), with mode
+// 0600. A copy of the same content, with that mode and the right owner, that is there already will
+// do; it becomes the newest one. Gives why the file, which is there, could not be copied; empty
+// when all is well, also without a file.
+std::string keepSettings(const deviceimage::DeviceImage& image);
+
+// What becomes of the settings file and its copies over a migration. The image outlives the object,
+// and its lock is held.
 class KeptSettings {
  public:
-  explicit KeptSettings(const deviceimage::DeviceImage& image);
+  // Looks at what is there. `keepsNow`: and copies the file; else somebody else does it later.
+  explicit KeptSettings(const deviceimage::DeviceImage& image, bool keepsNow = true);
 
-  // Why the settings file, which is there, could not be copied; empty when all is well.
+  // What keepSettings gave.
   const std::string& error() const { return _error; }
-  // The path of the copy; empty when there is none.
+  // After settle, the path of the copy that was made, or made the newest, since the object was
+  // made; empty when there is none.
   std::string copy() const { return _copy.empty() ? _copy : _image.absolutePath(_copy); }
-  // After the migration, whatever came of it. A file that is gone is put back as it was; the copy
-  // of one that is there as before is removed, if this object made it.
+  // After the migration, whatever came of it. A file that is missing is put back from the newest
+  // copy, also when it was missing before: a run that was killed may have left it so. The copy of
+  // one that is put back, or is there as before, is removed when it was made since the object was.
   SettingsFate settle();
 
  private:
-  void _keep();
+  void _findCopy();
   void _removeCopy();
   SettingsFate _putBack();
 
   const deviceimage::DeviceImage& _image;
-  deviceimage::FileContent _content;  // of the settings file before
+  bool _existed = false;
   struct stat _file = {};
-  std::string _copy;          // its name; empty when there is none
-  bool _wasMadeHere = false;  // and not found
+  std::map<std::string, timespec> _copiesBefore;  // when each was written, by name
+  std::string _copy;                              // its name; empty when there is none
   std::string _error;
 };
 

@@ -5,6 +5,7 @@
 
 #include "QuillnetAccountTypeRemoval/AccountsDataMigrator.h"
 #include "host/ChildProcess.h"
+#include "host/KeptSettings.h"
 #include "host/LegacyStep.h"
 #include "platform/Services.h"
 
@@ -34,17 +35,20 @@ MadeMigrator makeMigrator(const DeviceImage& image) {
   return made;
 }
 
-// Under the lock. The settings file goes before the migrator comes, which takes legacy files to be
-// all there is; it goes as late as can be.
+// Under the lock, so that the copy is of the file that goes. The settings file goes before the
+// migrator comes, which takes legacy files to be all there is; it goes as late as can be.
 int migrate(const DeviceImage& image) {
   const LegacyNeed need = legacyNeedOf(image);
-  if (!need.any()) return tellEnd(true);  // somebody else has migrated meanwhile
+  if (!need.any()) return tellNotNeeded();
   const MadeMigrator made = makeMigrator(image);
   if (!made.migrator) return tellNotLoaded(made.error);
+  const std::string settings = image.settingsFile();
+  if (const std::string error = keepSettings(image); !error.empty())
+    return tellNotBegun(settings + " cannot be copied: " + error);
   if (need.mailAccounts || need.dataAccess) {
     const platform::Status removed = image.removeFile(DeviceImage::kSettingsFile);
     if (!removed.isSuccess() && removed.code != ENOENT)
-      return tellNotLoaded(removed.error->description);
+      return tellNotBegun(settings + " cannot be removed: " + removed.error->description);
   }
   return tellEnd(made.migrator->executeMigrationSteps());
 }
@@ -58,10 +62,12 @@ bool isLegacyProcess(int argumentCount, char** arguments) {
 int migrateLegacyInThisProcess(char** arguments) {
   return workForHost(arguments[2], [](const DeviceImage& image) {
     platform::ExclusiveFileLock& locks = platform::services().exclusiveFileLock;
+    tellWaiting();
     const platform::HeldFileLockPtr lock = locks.lockByName(kMigrationLock);
     if (!lock)
-      return tellNotLoaded("the lock " + image.temporaryDirectory() + "/" +
-                           std::string(kMigrationLock) + " could not be made");
+      return tellNotBegun("the lock " + image.temporaryDirectory() + "/" +
+                          std::string(kMigrationLock) + " could not be made");
+    tellBegun();
     const int status = migrate(image);
     locks.unlock(lock);
     return status;

@@ -10,14 +10,19 @@ namespace {
 
 using deviceimage::DeviceImage;
 
-std::string sentenceFor(SettingsFate fate, const DeviceImage& image) {
+std::string sentenceFor(const LegacyReport& report, const DeviceImage& image) {
   const std::string path = image.settingsFile();
-  switch (fate) {
+  switch (report.settings) {
     case SettingsFate::untouched:
-      return path + " is as it was.";
+      return path + (report.settingsBefore.exists ? " is as it was." : " is missing, as it was.");
     case SettingsFate::replaced:
-      return path + " is a new one; what was there before is kept beside it.";
+      return path + " is a new one" +
+             (report.keptCopy.empty()
+                  ? "."
+                  : "; what was there before is kept beside it as " + report.keptCopy + ".");
     case SettingsFate::putBack:
+      if (!report.settingsBefore.exists)
+        return path + " was missing; the newest copy was put back.";
       return path + " was put back as it was.";
     case SettingsFate::lost:
       return path +
@@ -41,7 +46,7 @@ void judge(const DeviceImage& image, LegacyReport& report) {
     report.reasons = doubtsAbout(image, report.settings, report.settingsBefore);
   else
     report.reasons.push_back(std::move(sentence));
-  if (!report.isDone()) report.reasons.push_back(sentenceFor(report.settings, image));
+  if (!report.isDone()) report.reasons.push_back(sentenceFor(report, image));
 }
 
 }  // namespace
@@ -67,7 +72,8 @@ std::string_view nameOf(SettingsFate fate) {
 
 std::string describe(const LegacyReport& report) {
   if (!report.isDone() || !report.migrator) return std::string(resultOf(report));
-  if (report.settings == SettingsFate::untouched) return "migrated by another program meanwhile";
+  if (report.migrator->ending == Ending::notNeeded || report.settings == SettingsFate::untouched)
+    return "migrated by another program meanwhile";
   if (report.need.olderVersion) return "brought to version " + std::to_string(kPresentVersion);
   std::string text = "built from the legacy ";
   if (report.need.mailAccounts) text += "mail accounts";
@@ -83,7 +89,7 @@ LegacyReport runLegacyStep(const DeviceImage& image, const LegacyTask& task,
   if (report.need.any()) report.reasons = reasonsAgainstAccountMigrator(image);
   if (report.need.any() && report.isDone()) {
     report.settingsBefore = readSettings(image);
-    KeptSettings kept(image);
+    KeptSettings kept(image, !task.childKeepsSettings);
     if (kept.error().empty()) {
       report.migrator = runMigrator({std::string(kAccountMigratorName),
                                      {task.childArgument, image.rootPath()},

@@ -25,6 +25,8 @@ struct LegacyReport {
   std::vector<std::string> reasons;       // sentences: why it was refused, or what went wrong
   // Whether nothing is left to be done.
   bool isDone() const { return reasons.empty(); }
+  // Whether the migrator of this step has made the settings file.
+  bool hasMadeSettings() const { return migrator && migrator->ending == Ending::succeeded; }
 };
 
 // The words for programs: "not needed", "done", "failed" or "refused"; and "untouched", "replaced",
@@ -40,12 +42,16 @@ struct LegacyTask {
   std::string childArgument;
   int lockDescriptor = -1;  // the image's lock, which is held
   std::chrono::seconds limit{0};
+  // Whether that process copies the settings file itself, with keepSettings, once it has the
+  // migration lock. Else the file is copied before the process is started.
+  bool childKeepsSettings = false;
 };
 
 // Has the image's accounts data migrator make a settings file of what older systems left, when
 // there is something to migrate: in a process of its own, as runMigrator says. Refuses before
 // anything is changed when that migrator is missing or not to be trusted. The settings file is
-// copied first; one that is gone after a failure is put back. The legacy files are not touched.
+// copied first; one that is gone after a failure is put back, from the newest copy. The legacy
+// files are not touched.
 LegacyReport runLegacyStep(const deviceimage::DeviceImage& image, const LegacyTask& task,
                            Interruption& interruption, const LineSink& sink);
 

@@ -41,7 +41,10 @@ Selection selectionOf(const std::shared_ptr<const DeviceImage>& image,
 RunOutcome outcomeAfter(Ending ending) {
   switch (ending) {
     case Ending::notLoaded:
+    case Ending::notBegun:
       return RunOutcome::refused;
+    case Ending::busy:
+      return RunOutcome::busy;
     case Ending::raised:
     case Ending::crashed:
     case Ending::left:
@@ -50,6 +53,7 @@ RunOutcome outcomeAfter(Ending ending) {
     case Ending::interrupted:
       return RunOutcome::interrupted;
     case Ending::succeeded:  // but there is no fit settings file
+    case Ending::notNeeded:  // nor here
     case Ending::failed:
     case Ending::notStarted:
       return RunOutcome::failed;
@@ -125,7 +129,7 @@ void MigrationHost::_runUnderLock(const RunOptions& options, int lockDescriptor)
   if (!before.error.empty()) return _refuse(before.error);
   const Selection selection = selectionOf(_image, _bundles);
   const deviceimage::SyncAgent agent(*_image);
-  if (_report.legacy && _report.legacy->migrator)
+  if (_report.legacy && _report.legacy->hasMadeSettings())
     _leftByLegacy =
         leftByNewSettings(_report.legacy->settingsBefore, before, agent, _report.legacy->keptCopy);
   removeStaleTemporaryFiles(*_image);
@@ -153,8 +157,8 @@ bool MigrationHost::_migrateLegacy(const RunOptions& options, int lockDescriptor
     }
   }
   _report.legacy =
-      runLegacyStep(*_image, {kMigrateLegacyArgument, lockDescriptor, options.limit}, _interruption,
-                    [this](std::string_view line) { _keepLogLine(line); });
+      runLegacyStep(*_image, {kMigrateLegacyArgument, lockDescriptor, options.limit, true},
+                    _interruption, [this](std::string_view line) { _keepLogLine(line); });
   if (_report.legacy->isDone()) return true;
   append(_report.reasons, _report.legacy->reasons);
   _report.outcome = _interruption.requested()  ? RunOutcome::interrupted

@@ -98,6 +98,19 @@ class Watch {
       case MessageKind::failed:
         _answer = Ending::failed;
         return;
+      case MessageKind::waiting:
+        _waits = true;
+        return;
+      case MessageKind::begun:
+        _waits = false;
+        return;
+      case MessageKind::notNeeded:
+        _answer = Ending::notNeeded;
+        return;
+      case MessageKind::notBegun:
+        _answer = Ending::notBegun;
+        _outcome.detail = text;
+        return;
       case MessageKind::notLoaded:
         _answer = Ending::notLoaded;
         _outcome.detail = text;
@@ -156,13 +169,14 @@ class Watch {
     const int status = ended.status.value_or(0);
     if (_stopped || !ended.all) {
       _outcome.ending = _stopped.value_or(Ending::left);
+      if (_outcome.ending == Ending::timedOut && _waits) _outcome.ending = Ending::busy;
       if (!ended.all) _outcome.detail = "processes that it started could not be ended";
     } else if (WIFSIGNALED(status)) {
       _outcome.ending = Ending::crashed;
       _outcome.detail =
           "signal " + std::to_string(WTERMSIG(status)) + ", " + strsignal(WTERMSIG(status));
     } else if (_answer && (WEXITSTATUS(status) == 0 || *_answer == Ending::notLoaded ||
-                           *_answer == Ending::raised)) {
+                           *_answer == Ending::notBegun || *_answer == Ending::raised)) {
       _outcome.ending = *_answer;
     } else {
       _outcome.ending = Ending::left;
@@ -178,6 +192,7 @@ class Watch {
   MigratorOutcome _outcome;
   std::optional<Ending> _answer;
   std::optional<Ending> _stopped;
+  bool _waits = false;
   bool _channelIsOpen = true;
   bool _outputIsOpen = true;
 };
@@ -188,7 +203,15 @@ std::string sentenceFor(const MigratorOutcome& migrator) {
   const std::string detail = migrator.detail.empty() ? "." : " (" + migrator.detail + ").";
   switch (migrator.ending) {
     case Ending::succeeded:
+    case Ending::notNeeded:
       return {};
+    case Ending::notBegun:
+      return migrator.name + " was not run" + detail;
+    case Ending::busy:
+      return migrator.name +
+             " was not run, because another program migrates the settings; wait until it has "
+             "ended" +
+             detail;
     case Ending::failed:
       return migrator.name + " reports that its migration failed" + detail;
     case Ending::notLoaded:

@@ -15,6 +15,9 @@ namespace host {
 enum class Ending {
   succeeded,    // performMigration answered true, and the process ended as it should
   failed,       // performMigration answered false
+  notNeeded,    // another program had done the work
+  notBegun,     // what must come before the migrator failed; none of its code was run
+  busy,         // it ran past its limit while it waited for a lock of another program
   notLoaded,    // no code of the migrator's own was run but that of its loading
   raised,       // an exception came out of it
   crashed,      // a signal ended its process

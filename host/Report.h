@@ -17,9 +17,10 @@ enum class RunOutcome {
   failed = 1,              // an unexpected failure
   leftBehind = 3,          // done, but records or accounts were left behind
   verificationFailed = 5,  // what was there before is not all accounted for
-  refused = 7,             // a check before the start refused; nothing was written
+  refused = 7,             // a check before the start refused; nothing was written but by a legacy
+                           // step before
   migratorFailed = 8,      // a migrator crashed, raised, left or ran past its limit
-  busy = 11,               // another run holds the image
+  busy = 11,               // another run holds the image, or another program its settings
   interrupted = 130
 };
 

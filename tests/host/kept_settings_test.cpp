@@ -4,6 +4,7 @@
 #include <gtest/gtest.h>
 #include <sys/resource.h>
 
+#include <chrono>
 #include <csignal>
 #include <filesystem>
 #include <fstream>
@@ -81,10 +82,48 @@ TEST_F(KeptSettingsOfAnImage, GoWhenTheFileIsUntouched) {
 TEST_F(KeptSettingsOfAnImage, OfAnEarlierMigrationStay) {
   write(copy("1"), "earlier");
   write(copy("3"), "before");
+  files::permissions(copy("3"), files::perms(0600));
   KeptSettings kept(*image.image);
   EXPECT_EQ(copies(), (Names{copy("1"), copy("3")}));  // the third does
   EXPECT_EQ(kept.settle(), SettingsFate::untouched);
   EXPECT_EQ(copies(), (Names{copy("1"), copy("3")}));
+}
+
+TEST_F(KeptSettingsOfAnImage, AreMadeAnewWhereOthersMayReadTheEqualOne) {
+  write(copy("1"), "before");
+  files::permissions(copy("1"), files::perms(0666));
+  const KeptSettings kept(*image.image);
+  EXPECT_EQ(copies(), (Names{copy("1"), copy("2")}));
+  EXPECT_EQ(files::status(copy("2")).permissions(), files::perms(0600));
+}
+
+TEST_F(KeptSettingsOfAnImage, AreRegularFilesOnly) {
+  files::create_directory(copy("1"));
+  files::create_symlink(settings(), copy("2"));
+  const KeptSettings kept(*image.image);
+  EXPECT_EQ(copies(), Names{copy("3")});
+}
+
+TEST_F(KeptSettingsOfAnImage, ArePutBackFromTheNewestWhenAKilledRunHasLeftNoFile) {
+  write(copy("1"), "newest");
+  write(copy("2"), "earlier");
+  files::last_write_time(copy("2"), files::last_write_time(copy("1")) - std::chrono::hours(1));
+  files::remove(settings());
+  KeptSettings kept(*image.image);
+  EXPECT_EQ(kept.settle(), SettingsFate::putBack);
+  EXPECT_EQ(contentOf(settings()), "newest");
+  EXPECT_EQ(copies(), (Names{copy("1"), copy("2")}));
+}
+
+TEST_F(KeptSettingsOfAnImage, ArePutBackAsTheyWereWhenTheyWereCopied) {
+  KeptSettings kept(*image.image, false);
+  EXPECT_EQ(copies(), Names());
+  replace();
+  EXPECT_EQ(keepSettings(*image.image), "");
+  files::remove(settings());
+  EXPECT_EQ(kept.settle(), SettingsFate::putBack);
+  EXPECT_EQ(contentOf(settings()), "after");
+  EXPECT_EQ(copies(), Names());
 }
 
 TEST_F(KeptSettingsOfAnImage, TakeTheFirstFreeNumber) {

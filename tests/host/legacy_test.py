@@ -3,6 +3,7 @@ The accounts data migrator is the sample one, or one that fails as it is told.""
 import fcntl
 import os
 import pathlib
+import plistlib
 import re
 import shutil
 import signal
@@ -50,6 +51,17 @@ class LegacyTestCase(hosttest.HostTestCase):
 
     def run_legacy(self, *arguments):
         return self.run_host("--legacy", "--json", "--quiet", *arguments)
+
+    def run_while_another_writes(self, write):
+        """A run whose step waits for the lock of another program, which writes and frees it."""
+        with open(self.image / LOCK, "a", encoding="ascii") as lock:
+            fcntl.flock(lock, fcntl.LOCK_EX)
+            process = self.start("--legacy", "--json", "--quiet")
+            while not any("->" in line and f":{lock_number(lock)} " in line
+                          for line in pathlib.Path("/proc/locks").read_text(encoding="ascii").splitlines()):
+                self.assertIsNone(process.poll())
+            write()
+        return self.finish(process)
 
     def names(self):
         return sorted(path.name for path in (self.image / hosttest.SETTINGS).parent.glob("*before-migration*"))
@@ -130,20 +142,27 @@ class LegacyStepNeeded(LegacyTestCase):
         self.assertEqual("done", run.report["legacy"]["result"])
         self.assertEqual([], run.report["migrators"])
 
-    def test_it_is_decided_again_under_the_lock(self):
+    def test_what_another_program_migrated_meanwhile_is_not_migrated_again(self):
         self.write_plist(hosttest.SETTINGS, {"Version": 11, "Accounts": [account("N", "Mail")]})
-        with open(self.image / LOCK, "a", encoding="ascii") as lock:
-            fcntl.flock(lock, fcntl.LOCK_EX)
-            process = self.start("--legacy", "--json", "--quiet")
-            while not any("->" in line and f":{lock_number(lock)} " in line
-                          for line in pathlib.Path("/proc/locks").read_text(encoding="ascii").splitlines()):
-                self.assertIsNone(process.poll())
-            self.write_settings(account("N", "Mail"), account("O", "Mail"))
-        run = self.finish(process)
-        self.assertEqual((0, "done", "replaced"),
-                         (run.code, run.report["legacy"]["result"], run.report["legacy"]["settings"]), run.output)
+        run = self.run_while_another_writes(lambda: self.write_settings(account("O", "Mail")))
+        self.assertEqual((0, "done", "not needed"),
+                         (run.code, run.report["legacy"]["result"], run.report["legacy"]["migrator"]["result"]))
         self.assertEqual([], [line for line in run.report["log"] if line.startswith("AccountMigrator")])
-        self.assertEqual(["N", "O"], self.identifiers())
+        self.assertEqual((["O"], []), (self.identifiers(), self.names()))
+
+    def test_what_another_program_wrote_meanwhile_is_kept(self):
+        self.write_legacy(PLAIN)
+        run = self.run_while_another_writes(lambda: self.write_settings(account("O", "Mail")))
+        self.assertEqual("replaced", run.report["legacy"]["settings"], run.output)
+        self.assertEqual(["com.vantor.accountsettings.plist.before-migration-1"], self.names())
+        self.assertEqual("O", plistlib.loads(self.bytes_of(COPY))["Accounts"][0]["Identifier"])
+
+    def test_what_another_program_wrote_meanwhile_is_put_back(self):
+        self.script("answers false")
+        self.write_legacy(PLAIN)
+        run = self.run_while_another_writes(lambda: self.write_settings(account("O", "Mail")))
+        self.assertEqual((1, "put back"), (run.code, run.report["legacy"]["settings"]), run.output)
+        self.assertEqual((["O"], []), (self.identifiers(), self.names()))
 
 
 def lock_number(file):
@@ -260,6 +279,40 @@ class LegacyStepRefused(LegacyTestCase):
         self.assertEqual((11, before), (process.returncode, self.bytes_of(hosttest.SETTINGS)))
 
 
+    def test_when_the_lock_cannot_be_made(self):
+        (self.image / LOCK).mkdir()
+        run = self.check_refusal_by_the_step("Account Migrator was not run", LOCK, "could not be made")
+        self.assertEqual("not begun", run.report["legacy"]["migrator"]["result"])
+
+    def check_refusal_by_the_step(self, *words):
+        self.write_legacy(PLAIN)
+        before = self.bytes_of(hosttest.SETTINGS)
+        run = self.run_legacy()
+        self.assert_refused(run, *words)
+        self.assertEqual((before, []), (self.bytes_of(hosttest.SETTINGS), self.names()))
+        return run
+
+    def test_when_another_program_migrates_for_longer_than_the_limit(self):
+        self.write_legacy(PLAIN)
+        before = self.bytes_of(hosttest.SETTINGS)
+        with open(self.image / LOCK, "a", encoding="ascii") as lock:
+            fcntl.flock(lock, fcntl.LOCK_EX)
+            run = self.run_legacy("--timeout", 1)
+        self.assertEqual((11, "busy", "busy"), (run.code, run.report["outcome"],
+                                                run.report["legacy"]["migrator"]["result"]), run.output)
+        self.assertIn("another program migrates the settings", run.report["reasons"][0])
+        self.assertEqual((before, []), (self.bytes_of(hosttest.SETTINGS), self.names()))
+
+    def test_in_a_process_that_no_host_started(self):
+        self.write_legacy(PLAIN)
+        self.assertEqual(0, self.run_host("--quiet").code)  # makes the image's lock file
+        with self.unchanged_image():
+            ended = subprocess.run([hosttest.HOST, "--migrate-legacy-settings-in-this-process", self.image],
+                                   capture_output=True, check=False)
+        self.assertEqual((2, b"this argument is for processes that the program itself starts\n"),
+                         (ended.returncode, ended.stderr))
+
+
 class LegacyStepFailed(LegacyTestCase):
     """A step that fails ends the run, and the image has its settings and records as before."""
 
@@ -316,6 +369,27 @@ class LegacyStepFailed(LegacyTestCase):
         process.send_signal(signal.SIGTERM)
         self.assertEqual(130, self.finish(process).code)
         self.assertEqual((before, []), (self.bytes_of(hosttest.SETTINGS), self.names()))
+
+    def test_after_a_kill_puts_the_settings_back(self):
+        before = self.bytes_of(hosttest.SETTINGS)
+        process = self.start_staying()
+        process.kill()
+        process.communicate(timeout=100)
+        with open(self.image / hosttest.LOCK, "a", encoding="ascii") as lock:
+            fcntl.flock(lock, fcntl.LOCK_EX)
+        self.script("answers false")
+        run = self.run_legacy()
+        self.assertEqual((1, "put back"), (run.code, run.report["legacy"]["settings"]), run.output)
+        self.assertIn("was missing; the newest copy was put back.", run.report["reasons"][1])
+        self.assertEqual(before, self.bytes_of(hosttest.SETTINGS))
+
+    def test_where_there_was_nothing_to_keep(self):
+        self.script("writes, answers false")
+        self.write_legacy(PLAIN)
+        (self.image / hosttest.SETTINGS).unlink()
+        run = self.run_legacy()
+        self.assertEqual((1, "replaced"), (run.code, run.report["legacy"]["settings"]), run.output)
+        self.assertEqual(f"{self.image / hosttest.SETTINGS} is a new one.", run.report["reasons"][1])
 
     def test_by_a_kill_leaves_the_copy_and_the_next_run_completes(self):
         before = self.bytes_of(hosttest.SETTINGS)

@@ -44,6 +44,12 @@ std::string_view wordFor(host::Ending ending) {
       return "done";
     case host::Ending::failed:
       return "failed";
+    case host::Ending::notNeeded:
+      return "not needed";
+    case host::Ending::notBegun:
+      return "not begun";
+    case host::Ending::busy:
+      return "busy";
     case host::Ending::notLoaded:
       return "not loaded";
     case host::Ending::raised:
