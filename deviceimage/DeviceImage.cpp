@@ -34,11 +34,18 @@ std::vector<std::string> componentsOf(std::string_view relative) {
   }
 }
 
-bool isBelowHome(std::string_view relative) {
+bool isBelow(std::string_view relative, std::string_view directory) {
+  return relative.size() > directory.size() && relative.starts_with(directory) &&
+         relative[directory.size()] == '/';
+}
+
+// Whether what is new there is the device's user's: a file in tmp/ may be a lock, which a program
+// of that user takes tomorrow.
+bool isOfMobile(std::string_view relative) {
   if (relative.starts_with('/')) relative.remove_prefix(1);
   return relative == DeviceImage::kHomeDirectory ||
-         (relative.starts_with(DeviceImage::kHomeDirectory) &&
-          relative[DeviceImage::kHomeDirectory.size()] == '/');
+         isBelow(relative, DeviceImage::kHomeDirectory) ||
+         isBelow(relative, DeviceImage::kTemporaryDirectory);
 }
 
 platform::Status failure(int code, std::string_view what, std::string_view relative) {
@@ -128,7 +135,7 @@ DeviceImage::Parent DeviceImage::_openParent(std::string_view relative, bool mak
 }
 
 platform::Status DeviceImage::_handOver(int descriptor, std::string_view relative) const {
-  if (::geteuid() != 0 || !isBelowHome(relative)) return platform::Status::success();
+  if (::geteuid() != 0 || !isOfMobile(relative)) return platform::Status::success();
   const std::optional<uid_t> user = userNumber("mobile");
   const std::optional<gid_t> group = groupNumber("mobile");
   // Without a "mobile" there is nobody to give it to; the checks before a migration say so.

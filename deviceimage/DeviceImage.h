@@ -61,8 +61,8 @@ struct ImageProblem {
 // operation walks such a name one component at a time and follows no link, so that nothing outside
 // the image is read or written, whatever the image holds; a name with "..", an empty component or a
 // NUL byte is refused with EINVAL, a link on the way with ELOOP or ENOTDIR. Directories are made
-// with mode 0700, files with 0600. When root works on an image, what it makes under var/mobile
-// belongs to the image's user "mobile".
+// with mode 0700, files with 0600. When root works on an image, what it makes under var/mobile and
+// in tmp/ belongs to the image's user "mobile".
 //
 // The object holds the image's directory open. Any thread may use it.
 class DeviceImage {
@@ -173,7 +173,7 @@ class DeviceImage {
  private:
   DeviceImage(std::string rootPath, int rootDescriptor);
   Parent _openParent(std::string_view relative, bool makeMissing) const;
-  // Gives what root has just made under var/mobile to the image's user.
+  // Gives what root has just made under var/mobile or in tmp/ to the image's user.
   platform::Status _handOver(int descriptor, std::string_view relative) const;
   platform::Status _populate() const;
   platform::Status _placeFile(std::string_view relative, std::span<const std::uint8_t> bytes,

@@ -38,7 +38,8 @@ class ImageLock {
 
 // The device's named locks, as files in the image's tmp/ with the lock's name. Each lock object is
 // an open file of its own, so that two in one process exclude each other too. The files are never
-// removed, since a removed one would let two holders in. A name that is no plain file name, and a
+// removed, since a removed one would let two holders in; one that root makes belongs to "mobile",
+// whose programs take the lock too. A name that is no plain file name, and a
 // directory or link in the file's place, give no lock.
 class ImageFileLocks : public platform::ExclusiveFileLock {
  public:

@@ -1,4 +1,5 @@
 #include <gtest/gtest.h>
+#include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -93,6 +94,18 @@ TEST(ImageFileLocks, ExcludeEachOtherWithinOneProcess) {
   EXPECT_TRUE(second.get());
   locks.unlock(first);
   locks.unlock(nullptr);
+}
+
+TEST(ImageFileLocks, BelongToMobileAlsoWhenRootIsTheFirstToTakeThem) {
+  if (::geteuid() != 0) GTEST_SKIP() << "only root makes files for others";
+  const TemporaryImage made;
+  ImageFileLocks locks(made.image);
+  ASSERT_NE(locks.lockByName(kName), nullptr);
+  struct stat status {};
+  ASSERT_EQ(::stat(made.path("tmp/AccountMigrationInProgress").c_str(), &status), 0);
+  EXPECT_EQ(status.st_uid, 501U);
+  EXPECT_EQ(status.st_gid, 501U);
+  EXPECT_EQ(status.st_mode & 07777U, 0600U);
 }
 
 TEST(ImageFileLocks, AreAnotherThanTheImagesOwn) {

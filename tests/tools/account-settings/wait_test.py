@@ -66,6 +66,15 @@ class WaitForMigration(SettingsTest):
             fcntl.flock(file, fcntl.LOCK_EX)
             self.succeed("wait-for-migration")
 
+    @unittest.skipUnless(os.geteuid() == 0, "only root can work as two users")
+    def test_by_root_leaves_the_lock_to_the_device_s_user(self):
+        os.chmod(self.directory, 0o755)
+        for path in (self.image, *self.image.rglob("*")):
+            os.chown(path, 501, 501)
+        self.succeed("wait-for-migration")
+        ended = self.run_on_image("wait-for-migration", user=501, group=501, extra_groups=[], cwd="/")
+        self.assertEqual((ended.returncode, ended.stdout, ended.stderr), (0, b"no migration runs\n", b""))
+
     def test_returns_when_the_migration_has_ended(self):
         holder = self.start_holder()
         waiter = self.start_waiter("--timeout", "1000")
