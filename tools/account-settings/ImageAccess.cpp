@@ -44,13 +44,8 @@ void useTemporaryDirectory(const DeviceImage& image) {
   ::setenv("TMPDIR", image.temporaryDirectory().c_str(), 1);
 }
 
-// What ASSAccountsManager::waitForMigrationToFinish does, which returns as well when the lock
-// cannot be made.
-void waitForOtherMigrations(const DeviceImage& image) {
-  if (const auto lock = ASSAccountsManager::createAndLockMigrationLock()) {
-    ASSAccountsManager::releaseMigrationLock(lock);
-    return;
-  }
+platform::HeldFileLockPtr holdMigrationLock(const DeviceImage& image) {
+  if (auto lock = ASSAccountsManager::createAndLockMigrationLock()) return lock;
   const deviceimage::OpenedFile file =
       image.openFile(accountsettings::kAccountMigrationLockFilename, O_RDWR);
   const deviceimage::Descriptor closing(file.descriptor);
@@ -61,6 +56,12 @@ void waitForOtherMigrations(const DeviceImage& image) {
           "that you may write",
           image.absolutePath(accountsettings::kAccountMigrationLockFilename),
           file.status.isSuccess() ? "the file cannot be locked" : file.status.error->description));
+}
+
+// What ASSAccountsManager::waitForMigrationToFinish does, which returns as well when the lock
+// cannot be made.
+void waitForOtherMigrations(const DeviceImage& image) {
+  ASSAccountsManager::releaseMigrationLock(holdMigrationLock(image));
 }
 
 }  // namespace tools

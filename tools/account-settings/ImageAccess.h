@@ -4,6 +4,7 @@
 
 #include "deviceimage/DeviceImage.h"
 #include "deviceimage/ImageLock.h"
+#include "platform/ExclusiveFileLock.h"
 
 // What commands do before they work on an image. Each ends the command when it cannot.
 namespace tools {
@@ -16,8 +17,10 @@ std::unique_ptr<deviceimage::ImageLock> takeLock(const deviceimage::DeviceImage&
 // settings file, which must be on the same file system.
 void useTemporaryDirectory(const deviceimage::DeviceImage& image);
 
-// Returns when no program holds the image's migration lock, however long that takes. The image's
-// services are installed.
+// The lock under which every program migrates the image's settings; waits for it, however long that
+// takes. The image's services are installed.
+platform::HeldFileLockPtr holdMigrationLock(const deviceimage::DeviceImage& image);
+// Returns when no program holds that lock.
 void waitForOtherMigrations(const deviceimage::DeviceImage& image);
 
 }  // namespace tools

@@ -1,13 +1,17 @@
 #include <fcntl.h>
 #include <fmt/format.h>
+#include <unistd.h>
 
+#include <cerrno>
 #include <memory>
 #include <optional>
+#include <string>
 
 #include "QuillnetAccountTypeRemoval/ASSAccountsManager.h"
 #include "QuillnetAccountTypeRemoval/ProcessLookup.h"
 #include "deviceimage/Descriptor.h"
 #include "deviceimage/DeviceImageServices.h"
+#include "platform/posix/LinuxProcessTable.h"
 #include "tools/account-settings/Commands.h"
 #include "tools/account-settings/Options.h"
 #include "tools/account-settings/Shown.h"
@@ -22,12 +26,21 @@ using deviceimage::DeviceImage;
 
 constexpr const char* kDaemonName = "tallowd";
 
-// The image's process table, which remembers what became of the signal that the library may send.
+// The image's process table, which remembers what the library, to which a table
+// that cannot be read is one without the daemon, keeps to itself.
 class WatchedProcessTable : public platform::ProcessTable {
  public:
   explicit WatchedProcessTable(platform::ProcessTable& table) : _table(table) {}
-  Sized sizeOfTable() override { return _table.sizeOfTable(); }
-  Filled fillTable(std::size_t capacity) override { return _table.fillTable(capacity); }
+  Sized sizeOfTable() override {
+    Sized sized = _table.sizeOfTable();
+    lookup = sized.status;
+    return sized;
+  }
+  Filled fillTable(std::size_t capacity) override {
+    Filled filled = _table.fillTable(capacity);
+    lookup = filled.status;
+    return filled;
+  }
   pid_t ownProcessIdentifier() override { return _table.ownProcessIdentifier(); }
   platform::Status sendSignal(pid_t process, int signal) override {
     sent = _table.sendSignal(process, signal);
@@ -35,6 +48,7 @@ class WatchedProcessTable : public platform::ProcessTable {
   }
 
   std::optional<platform::Status> sent;
+  platform::Status lookup = platform::Status::success();  // how the last look at the table ended
 
  private:
   platform::ProcessTable& _table;
@@ -70,13 +84,29 @@ struct Result {
   pid_t asked = -1;  // the process that was there at the beginning
   pid_t now = -1;    // the one that is there at the end
   std::optional<platform::Status> signal;
+  pid_t unseen = -1;  // one by that name of which nobody shows whether it runs from the image
 };
 
 const char* outcomeOf(const Result& result) {
-  if (result.asked < 0) return "not running";
+  if (result.asked < 0) return result.unseen < 0 ? "not running" : "unknown";
   if (result.now == result.asked) return "still running";
   if (result.now >= 0) return "restarted";
   return result.signal && result.signal->isSuccess() ? "killed" : "left";
+}
+
+// A process that is named as the daemon and whose executable this user may not look at; -1 when
+// there is none.
+pid_t findUnseenDaemon() {
+  platform::LinuxProcessTable everything;
+  for (const platform::ProcessTable::Process& process :
+       everything.fillTable(everything.sizeOfTable().count).processes) {
+    const std::string link = "/proc/" + std::to_string(process.identifier) + "/exe";
+    char byte = 0;
+    if (process.commandName == kDaemonName && ::readlink(link.c_str(), &byte, 1) < 0 &&
+        errno == EACCES)
+      return process.identifier;
+  }
+  return -1;
 }
 
 // To the library a table that cannot be read is one without the daemon.
@@ -110,11 +140,20 @@ Result stopDaemon(const ImagePtr& image) {
   requireProcessTable(services.processTable());
   Result result;
   result.asked = findProcessIDByName(kDaemonName);
-  if (result.asked < 0) return result;
+  if (result.asked < 0) {
+    result.unseen = findUnseenDaemon();
+    return result;
+  }
   requireNotifications(*image);
   accountsettings::ASSAccountsManager::killDataAccessIfNecessary();
   result.now = findProcessIDByName(kDaemonName);
   result.signal = services.processTable().sent;
+  const platform::Status& lookup = services.processTable().lookup;
+  if (!lookup.isSuccess())
+    throw CommandFailure(ExitCode::unexpectedFailure,
+                         fmt::format("the data-access daemon, process {}, was asked to leave, but "
+                                     "whether it has cannot be seen: {}; repeat the command",
+                                     result.asked, lookup.error->description));
   return result;
 }
 
@@ -138,10 +177,22 @@ void print(const DeviceImage& image, const Result& result, bool json) {
     fmt::print("the data-access daemon, process {}, did not leave and was killed\n", result.asked);
 }
 
+std::string aboutSignal(const Result& result) {
+  if (!result.signal) return {};  // a look at the processes failed when it was to be sent
+  if (result.signal->isSuccess()) return " and sent signal 9";
+  return "; " + result.signal->error->description;
+}
+
 ExitCode run(const LookOptions& options) {
   const ImagePtr image = openImage(options.image);
   const Result result = stopDaemon(image);
   print(*image, result, options.json);
+  if (result.unseen >= 0)
+    throw CommandFailure(ExitCode::refused,
+                         fmt::format("process {} is named as the data-access daemon, but this user "
+                                     "may not see whether it runs from the image; nothing was "
+                                     "done; repeat the command as that process's user or as root",
+                                     result.unseen));
   if (result.now < 0) return ExitCode::done;
   if (result.now != result.asked)
     throw CommandFailure(ExitCode::daemonRuns,
@@ -149,14 +200,10 @@ ExitCode run(const LookOptions& options) {
                                      "runs as process {}; stop what starts it, and repeat the "
                                      "command",
                                      result.asked, result.now));
-  const bool isKilled = !result.signal || result.signal->isSuccess();
-  throw CommandFailure(
-      ExitCode::daemonRuns,
-      fmt::format(
-          "the data-access daemon, process {}, still runs although it was asked to leave{}; "
-          "end it as its own user or as root",
-          result.asked,
-          isKilled ? " and sent signal 9" : "; " + result.signal->error->description));
+  throw CommandFailure(ExitCode::daemonRuns,
+                       fmt::format("the data-access daemon, process {}, still runs although it was "
+                                   "asked to leave{}; end it as its own user or as root",
+                                   result.asked, aboutSignal(result)));
 }
 
 }  // namespace
@@ -168,7 +215,8 @@ void addStopDaemonCommand(CLI::App& app, ExitCode& outcome) {
   addLookOptions(*command, *options);
   command->footer(
       "Asks the daemon to leave, kills it when it has not left after five seconds, and gives up\n"
-      "after five more. Exit code 0 when no daemon runs any more, 10 when one does.\n\n"
+      "after five more. Exit code 0 when no daemon runs any more, 10 when one does, 7\n"
+      "when this user may not see whether one does.\n\n"
       "Example:\n  account-settings stop-daemon --image my-device");
   command->callback([options, &outcome] { outcome = run(*options); });
 }

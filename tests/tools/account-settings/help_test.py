@@ -23,7 +23,7 @@ class Help(unittest.TestCase):
         self.assertEqual(re.findall(r"^  ([a-z-]+)  ", text.split("Subcommands:")[1], re.MULTILINE), COMMANDS)
         self.assertIn("Example:", text)
         for code in ["0 done", "1 unexpected", "2 wrong", "6 a settings file", "7 refused", "9 the time", "10 the data",
-                     "11 another"]:
+                     "11 another", "130 interrupted"]:
             self.assertIn(code, text)
 
     def test_of_each_command_gives_an_example(self):
@@ -46,6 +46,20 @@ class Help(unittest.TestCase):
                 self.assertEqual((ended.returncode, ended.stdout), (2, b""))
                 self.assertIn(b"--help", ended.stderr)
 
+    def test_of_an_image_may_stand_before_every_command(self):
+        more = {"show": ["A"], "enable": ["A", "mail"], "disable": ["A", "mail"], "set": ["A", "B", "C"],
+                "unset": ["A", "B"], "insert": ["/dev/null"], "delete": ["A"], "add-child": ["A", "/dev/null"],
+                "remove-child": ["A"]}  # fmt: skip
+        for command in COMMANDS:
+            if command in ("convert", "explain-merge"):
+                continue
+            for image in (["--image", "/nowhere"], ["--image=/nowhere"]):
+                with self.subTest(command, image=image):
+                    behind = run(command, *image, *more.get(command, []))
+                    before = run(*image, command, *more.get(command, []))
+                    self.assertNotIn(before.returncode, (0, 2))
+                    self.assertEqual((before.returncode, before.stderr), (behind.returncode, behind.stderr))
+
     def test_the_man_page_knows_every_command_and_option(self):
         for command in COMMANDS:
             self.assertRegex(MAN_PAGE, rf"\.(Cm|It Cm)( enable [|,])? {command}\b")
@@ -55,7 +69,7 @@ class Help(unittest.TestCase):
 
     def test_the_man_page_knows_every_exit_code(self):
         codes = re.findall(r"^\.It (\d+)$", MAN_PAGE, re.MULTILINE)
-        self.assertEqual(codes, ["0", "1", "2", "6", "7", "9", "10", "11"])
+        self.assertEqual(codes, ["0", "1", "2", "6", "7", "9", "10", "11", "130"])
 
 
 if __name__ == "__main__":

@@ -50,6 +50,20 @@ class LegacyTest(SettingsTest):
         (self.image / "tmp/behaviour").write_text(behaviour + "\n")
 
 
+    def assert_says_as_json(self, code: int, reason: str, *arguments) -> None:
+        ended = self.run_on_image("migrate-legacy", "--json", *arguments)
+        answer = json.loads(ended.stdout)
+        self.assertEqual((ended.returncode, answer["result"], answer["settings"], answer["kept_copies"]),
+                         (code, "refused", "untouched", []))
+        self.assertIn(reason, answer["reasons"][0])
+
+    def holders(self) -> list:
+        """The processes that hold or wait for the migration lock, as the kernel's table has them."""
+        inode = str(self.lock_file.stat().st_ino)
+        table = [line.replace("->", "").split() for line in Path("/proc/locks").read_text().splitlines()]
+        return [int(row[4]) for row in table if row[5].split(":")[2] == inode]
+
+
 class Migrating(LegacyTest):
     def test_says_that_there_is_nothing_to_migrate(self):
         before = self.state()
@@ -57,6 +71,7 @@ class Migrating(LegacyTest):
         self.assertEqual(self.answer("migrate-legacy"), {
             "image": str(self.image), "result": "not needed", "mail_accounts": False, "data_access": False,
             "older_version": False, "settings": "untouched", "accounts": 2, "kept_copies": [], "reasons": [], "log": [],
+            "log_was_cut": False,
         })  # fmt: skip
         self.assertEqual(self.state(), before)
 
@@ -93,6 +108,7 @@ class Migrating(LegacyTest):
         self.assertEqual(answer, {
             "image": str(self.image), "result": "done", "mail_accounts": True, "data_access": False,
             "older_version": False, "settings": "replaced", "accounts": 1, "kept_copies": [], "reasons": [],
+            "log_was_cut": False,
         })  # fmt: skip
         self.assertEqual(len(log), 3)
         self.assertEqual(self.identifiers(), ["L1"])
@@ -125,6 +141,7 @@ class Migrating(LegacyTest):
         with open(self.image / "var/run/image.lock", "a") as file:
             fcntl.flock(file, fcntl.LOCK_EX)
             self.assertIn("another run holds", self.fail_with(11, "migrate-legacy", "--wait", "0"))
+            self.assert_says_as_json(11, "another run holds", "--wait", "0")
         self.assertEqual(self.state(), before)
 
     def test_gives_up_when_another_program_migrates(self):
@@ -134,19 +151,41 @@ class Migrating(LegacyTest):
             before = self.state()
             self.assertIn("another program migrates the settings; nothing was changed",
                           self.fail_with(11, "migrate-legacy", "--wait", "0.2"))
+            self.assert_says_as_json(11, "another program migrates the settings", "--wait", "0.2")
             self.assertEqual(self.state(), before)
 
 
+    def test_keeps_what_another_program_saved_while_it_waited_for_the_lock(self):
+        self.write_legacy_mail("L1")
+        with open(self.lock_file, "a") as file:
+            fcntl.flock(file, fcntl.LOCK_EX)
+            process = subprocess.Popen([TOOL, "migrate-legacy", "--image", self.image, "--wait", "1000"],
+                                       stdout=subprocess.PIPE, stderr=subprocess.PIPE)
+            while process.pid not in self.holders():
+                self.assertIsNone(process.poll())
+            self.write({"Version": 12, "Accounts": [MAIL], "newer": True})
+        process.communicate(timeout=100)
+        self.assertEqual(process.returncode, 0)
+        self.assertEqual([plistlib.loads(copy.read_bytes()) for copy in self.copies()],
+                         [{"Version": 12, "Accounts": [MAIL], "newer": True}])
+
+    def test_believes_only_the_library_s_own_line_of_a_failure(self):
+        self.write_legacy_mail("L1")
+        self.use_scripted_migrator("writes, says [me] Accounts migration failed")
+        self.assertEqual(self.answer("migrate-legacy")["result"], "done")
+
+
 class Refusing(LegacyTest):
-    def assert_refused(self, *words) -> None:
+    def assert_refused(self, *words, makes_lock=False) -> None:
         before = self.state()
         said = self.fail_with(7, "migrate-legacy")
         for word in words:
             self.assertIn(str(word), said)
         after = self.state()
-        for path in (self.lock_file, self.image / "tmp"):
-            after.pop(path, None)
-            before.pop(path, None)
+        if makes_lock:
+            for path in (self.lock_file, self.image / "tmp"):
+                after.pop(path, None)
+                before.pop(path, None)
         self.assertEqual(after, before)
 
     def setUp(self):
@@ -181,24 +220,25 @@ class Refusing(LegacyTest):
         elsewhere = self.directory / "elsewhere.plist"
         shutil.move(self.settings_file, elsewhere)
         self.settings_file.symlink_to(elsewhere)
-        self.assert_refused(self.settings_file, "cannot be copied, so that nothing was done")
+        self.assert_refused(self.settings_file, "cannot be copied, so that nothing was done", makes_lock=True)
         self.assertTrue(elsewhere.exists())
 
     def test_without_a_temporary_directory_changes_nothing(self):
         (self.image / "tmp").rmdir()
+        self.assert_says_as_json(7, "is no directory")
         self.assert_refused(self.image / "tmp", "is no directory")
 
 
 class Failing(LegacyTest):
     """A migrator that fails leaves the settings as they were, whatever it did."""
 
-    def check_failure(self, behaviour: str, *words, settings="put back", arguments=()) -> dict:
+    def check_failure(self, behaviour: str, *words, settings="put back", arguments=(), code=1) -> dict:
         self.use_scripted_migrator(behaviour)
         before = self.settings_file.read_bytes()
         legacy = self.mail_file.read_bytes() if self.mail_file.exists() else None
         ended = self.run_on_image("migrate-legacy", "--json", *arguments)
         said = ended.stderr.decode()
-        self.assertEqual(ended.returncode, 1, said)
+        self.assertEqual(ended.returncode, code, said)
         for word in words:
             self.assertIn(word, said)
         answer = json.loads(ended.stdout)
@@ -229,7 +269,8 @@ class Failing(LegacyTest):
 
     def test_by_taking_too_long(self):
         self.write_legacy_mail("L1")
-        self.check_failure("stays", "ran past its limit", "was put back", arguments=("--timeout", "1"))
+        self.check_failure("stays", "ran past its limit", "was put back", "with a longer --timeout",
+                           arguments=("--timeout", "1"), code=9)
 
     def test_by_writing_nothing(self):
         self.write_legacy_mail("L1")
@@ -240,8 +281,9 @@ class Failing(LegacyTest):
         (Path(self.image) / MIGRATOR / "AccountMigrator.so").write_bytes(b"no code")
         before = self.settings_file.read_bytes()
         ended = self.run_on_image("migrate-legacy")
-        self.assertEqual(ended.returncode, 1)
-        self.assertIn(b"was put back as it was", ended.stderr)
+        self.assertEqual(ended.returncode, 7)
+        self.assertIn(b"Account Migrator could not be loaded", ended.stderr)
+        self.assertIn(b"was put back", ended.stderr)
         self.assertEqual(self.settings_file.read_bytes(), before)
 
     def test_with_an_older_version_leaves_the_file_alone(self):
@@ -282,10 +324,25 @@ class Failing(LegacyTest):
         process = self.start()
         process.send_signal(signal.SIGINT)
         said = process.communicate(timeout=100)[1]
-        self.assertEqual(process.returncode, 1)
+        self.assertEqual(process.returncode, 130)
         self.assertIn(b"stopped because the run was interrupted", said)
         self.assertEqual(self.settings_file.read_bytes(), before)
         self.assertEqual(self.copies(), [])
+
+    def test_holds_the_migration_lock_until_the_settings_are_back(self):
+        self.write_legacy_mail("L1")
+        process = self.start()
+        self.assertEqual(self.holders(), [process.pid])  # not the migrator's process, which ends before
+        process.send_signal(signal.SIGINT)
+        process.communicate(timeout=100)
+        self.assertEqual(self.holders(), [])
+
+    def test_does_not_migrate_by_the_migrator_s_argument_alone(self):
+        self.write_legacy_mail("L1")
+        before = self.state()
+        ended = run("--migrate-legacy-settings-in-this-process", self.image, stdin=subprocess.DEVNULL)
+        self.assertNotEqual(ended.returncode, 0)
+        self.assertEqual(self.state(), before)
 
     def test_by_a_kill_leaves_the_copy_and_the_next_run_completes(self):
         self.write_legacy_mail("L1")

@@ -100,6 +100,23 @@ class StopDaemon(SettingsTest):
         self.assertIsNone(daemon.poll())
         self.assertEqual(self.log(), [ASKED, KILLED, GIVEN_UP])
 
+    @unittest.skipUnless(os.geteuid() == 0, "only root can work as another user")
+    def test_is_refused_when_the_user_may_not_see_whether_it_is_the_daemon(self):
+        os.chmod(self.directory, 0o755)
+        for path in (self.image, *self.image.rglob("*")):
+            path.chmod(0o755)
+        daemon = self.start_daemon("ignores")
+        nobody = {"user": 65534, "group": 65534, "extra_groups": [], "cwd": "/"}
+        ended = self.run_on_image("stop-daemon", **nobody)
+        self.assertEqual((ended.returncode, ended.stdout), (7, b""))
+        self.assertEqual(ended.stderr.decode(),
+                         f"account-settings: process {daemon.pid} is named as the data-access daemon, but this user may "
+                         "not see whether it runs from the image; nothing was done; repeat the command as that "
+                         "process's user or as root\n")
+        answer = json.loads(self.run_on_image("stop-daemon", "--json", **nobody).stdout)
+        self.assertEqual((answer["outcome"], answer["process"], answer["running"]), ("unknown", None, None))
+        self.assertIsNone(daemon.poll())
+
     def test_is_refused_when_the_daemon_could_not_be_asked(self):
         self.notifications.unlink()
         self.notifications.symlink_to("/dev/null")
