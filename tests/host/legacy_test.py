@@ -52,15 +52,15 @@ class LegacyTestCase(hosttest.HostTestCase):
     def run_legacy(self, *arguments):
         return self.run_host("--legacy", "--json", "--quiet", *arguments)
 
-    def run_while_another_writes(self, write):
-        """A run whose step waits for the lock of another program, which writes and frees it."""
+    def run_while_another_writes(self):
+        """A run whose step waits for the lock of another program, which writes the account O and frees it."""
         with open(self.image / LOCK, "a", encoding="ascii") as lock:
             fcntl.flock(lock, fcntl.LOCK_EX)
             process = self.start("--legacy", "--json", "--quiet")
-            while not any("->" in line and f":{lock_number(lock)} " in line
+            while not any("->" in line and f":{os.fstat(lock.fileno()).st_ino} " in line
                           for line in pathlib.Path("/proc/locks").read_text(encoding="ascii").splitlines()):
                 self.assertIsNone(process.poll())
-            write()
+            self.write_settings(account("O", "Mail"))
         return self.finish(process)
 
     def names(self):
@@ -144,7 +144,7 @@ class LegacyStepNeeded(LegacyTestCase):
 
     def test_what_another_program_migrated_meanwhile_is_not_migrated_again(self):
         self.write_plist(hosttest.SETTINGS, {"Version": 11, "Accounts": [account("N", "Mail")]})
-        run = self.run_while_another_writes(lambda: self.write_settings(account("O", "Mail")))
+        run = self.run_while_another_writes()
         self.assertEqual((0, "done", "not needed"),
                          (run.code, run.report["legacy"]["result"], run.report["legacy"]["migrator"]["result"]))
         self.assertEqual([], [line for line in run.report["log"] if line.startswith("AccountMigrator")])
@@ -152,7 +152,7 @@ class LegacyStepNeeded(LegacyTestCase):
 
     def test_what_another_program_wrote_meanwhile_is_kept(self):
         self.write_legacy(PLAIN)
-        run = self.run_while_another_writes(lambda: self.write_settings(account("O", "Mail")))
+        run = self.run_while_another_writes()
         self.assertEqual("replaced", run.report["legacy"]["settings"], run.output)
         self.assertEqual(["com.vantor.accountsettings.plist.before-migration-1"], self.names())
         self.assertEqual("O", plistlib.loads(self.bytes_of(COPY))["Accounts"][0]["Identifier"])
@@ -160,14 +160,9 @@ class LegacyStepNeeded(LegacyTestCase):
     def test_what_another_program_wrote_meanwhile_is_put_back(self):
         self.script("answers false")
         self.write_legacy(PLAIN)
-        run = self.run_while_another_writes(lambda: self.write_settings(account("O", "Mail")))
+        run = self.run_while_another_writes()
         self.assertEqual((1, "put back"), (run.code, run.report["legacy"]["settings"]), run.output)
         self.assertEqual((["O"], []), (self.identifiers(), self.names()))
-
-
-def lock_number(file):
-    """The file's number as /proc/locks has it."""
-    return os.fstat(file.fileno()).st_ino
 
 
 class LegacyStepNotNeeded(LegacyTestCase):
@@ -281,16 +276,12 @@ class LegacyStepRefused(LegacyTestCase):
 
     def test_when_the_lock_cannot_be_made(self):
         (self.image / LOCK).mkdir()
-        run = self.check_refusal_by_the_step("Account Migrator was not run", LOCK, "could not be made")
-        self.assertEqual("not begun", run.report["legacy"]["migrator"]["result"])
-
-    def check_refusal_by_the_step(self, *words):
         self.write_legacy(PLAIN)
         before = self.bytes_of(hosttest.SETTINGS)
         run = self.run_legacy()
-        self.assert_refused(run, *words)
+        self.assert_refused(run, "Account Migrator was not run", LOCK, "could not be made")
+        self.assertEqual("not begun", run.report["legacy"]["migrator"]["result"])
         self.assertEqual((before, []), (self.bytes_of(hosttest.SETTINGS), self.names()))
-        return run
 
     def test_when_another_program_migrates_for_longer_than_the_limit(self):
         self.write_legacy(PLAIN)
@@ -350,8 +341,7 @@ class LegacyStepFailed(LegacyTestCase):
         self.write_legacy(PLAIN)
         (self.image / MIGRATOR / "AccountMigrator.so").write_bytes(b"no code")
         before = self.bytes_of(hosttest.SETTINGS)
-        run = self.run_legacy()
-        self.assert_refused(run, "could not be loaded")
+        self.assert_refused(self.run_legacy(), "could not be loaded")
         self.assertEqual((before, []), (self.bytes_of(hosttest.SETTINGS), self.names()))
 
     def start_staying(self):
@@ -363,6 +353,13 @@ class LegacyStepFailed(LegacyTestCase):
         self.assertFalse((self.image / hosttest.SETTINGS).exists())
         return process
 
+    def leave_a_killed_run(self):
+        process = self.start_staying()
+        process.kill()
+        process.communicate(timeout=100)
+        with open(self.image / hosttest.LOCK, "a", encoding="ascii") as lock:
+            fcntl.flock(lock, fcntl.LOCK_EX)  # until the step's process, which dies with the host, has ended
+
     def test_by_an_interruption(self):
         before = self.bytes_of(hosttest.SETTINGS)
         process = self.start_staying()
@@ -372,11 +369,7 @@ class LegacyStepFailed(LegacyTestCase):
 
     def test_after_a_kill_puts_the_settings_back(self):
         before = self.bytes_of(hosttest.SETTINGS)
-        process = self.start_staying()
-        process.kill()
-        process.communicate(timeout=100)
-        with open(self.image / hosttest.LOCK, "a", encoding="ascii") as lock:
-            fcntl.flock(lock, fcntl.LOCK_EX)
+        self.leave_a_killed_run()
         self.script("answers false")
         run = self.run_legacy()
         self.assertEqual((1, "put back"), (run.code, run.report["legacy"]["settings"]), run.output)
@@ -393,11 +386,7 @@ class LegacyStepFailed(LegacyTestCase):
 
     def test_by_a_kill_leaves_the_copy_and_the_next_run_completes(self):
         before = self.bytes_of(hosttest.SETTINGS)
-        process = self.start_staying()
-        process.kill()
-        process.communicate(timeout=100)
-        with open(self.image / hosttest.LOCK, "a", encoding="ascii") as lock:
-            fcntl.flock(lock, fcntl.LOCK_EX)  # until the step's process, which dies with the host, has ended
+        self.leave_a_killed_run()
         self.assertEqual(before, self.bytes_of(COPY))
         self.place(os.environ["ACCOUNT_MIGRATOR"])
         run = self.run_legacy()
