@@ -1,4 +1,6 @@
 // Looking whether the databases are sound.
+#include <sqlite3.h>
+
 #include "deviceimage/ContentHash.h"
 #include "deviceimage/Database.h"
 #include "deviceimage/RecordStores.h"
@@ -26,6 +28,19 @@ void checkHashes(Database& database, std::vector<std::string>& problems) {
                          "\") has another content than its hash says");
 }
 
+// Whether the failure tells nothing of the file. What is no file cannot be opened at any time.
+bool mayPass(int code, const FileLook& look) {
+  switch (code & 0xFF) {  // the kind of an SQLite code
+    case SQLITE_IOERR:
+    case SQLITE_NOMEM:
+      return true;
+    case SQLITE_CANTOPEN:
+      return look.kind == FileLook::Kind::file;
+    default:
+      return false;
+  }
+}
+
 }  // namespace
 
 std::vector<DatabaseReport> RecordStores::checkDatabases(const std::set<std::string>& leaveOut) {
@@ -36,15 +51,19 @@ std::vector<DatabaseReport> RecordStores::checkDatabases(const std::set<std::str
     DatabaseReport report;
     report.path = DeviceImage::databaseFile(type);
     if (leaveOut.contains(report.path)) continue;
+    const FileLook look = _databases->image().lookAt(report.path);
+    report.exists = look.kind != FileLook::Kind::nothing;
     const platform::Status status = statusOf([&] {
-      report.exists = _databases->image().lookAt(report.path).kind != FileLook::Kind::nothing;
       if (Database* const database = _databases->find(type)) {
         checkIntegrity(*database, report.problems);
         if (report.problems.empty()) checkHashes(*database, report.problems);
       }
       return platform::Status::success();
     });
-    if (!status.isSuccess()) report.problems.push_back(status.error->description);
+    if (!status.isSuccess()) {
+      report.problems.push_back(status.error->description);
+      report.mayPass = mayPass(status.code, look);
+    }
     reports.push_back(std::move(report));
   }
   return reports;

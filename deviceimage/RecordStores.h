@@ -85,6 +85,9 @@ struct DatabaseReport {
   std::string path;                   // relative to the image
   bool exists = false;                // a database that is not there holds no stores, and is fine
   std::vector<std::string> problems;  // empty: integrity, references and hashes are as they must be
+  // What went wrong is not the file's: reading failed, or the process had no memory or descriptor
+  // left. Another look may find it sound.
+  bool mayPass = false;
 };
 
 // The image's records as tools and reports see them: every store, retired ones too. Programs that

@@ -33,7 +33,7 @@ SyncAgent::SyncAgent(const DeviceImage& image) {
 
 std::optional<std::string> SyncAgent::quillnetStoreIdentifier() const {
   if (!_accountName) return std::nullopt;
-  return "Quillnet:" + *_accountName;
+  return std::string(kQuillnetStorePrefix) + *_accountName;
 }
 
 std::optional<std::string> SyncAgent::storeIdentifier(const propertylist::Dictionary& account,

@@ -22,6 +22,7 @@ class SyncAgent {
  public:
   static constexpr std::string_view kApplication = "com.vantor.OTASyncAgent";
   static constexpr std::string_view kAccountNameKey = "AccountName";
+  static constexpr std::string_view kQuillnetStorePrefix = "Quillnet:";
 
   // Reads the agent's preferences anew. What cannot be read counts as absent.
   explicit SyncAgent(const DeviceImage& image);

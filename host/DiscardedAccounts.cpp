@@ -23,29 +23,35 @@ std::string sentenceFor(const ObservedStore& store) {
   return std::to_string(count) + (count == 1 ? " record of " : " records of ") +
          std::string(dataclassName(store.dataclass)) + " in the store " + *store.account +
          (count == 1 ? " belongs" : " belong") +
-         " to no account of the new settings file and would not be migrated.";
+         " to no account of the settings file and cannot be migrated.";
 }
 
 }  // namespace
 
-std::vector<std::string> leftByNewSettings(const Settings& before, const Observation& now,
-                                           const deviceimage::SyncAgent& agent,
+std::vector<std::string> leftByNewSettings(const Settings& before, const Settings& now,
                                            const std::string& keptCopy) {
   std::vector<std::string> sentences;
   // An account without an identifier gets one when the file is brought up to date.
   const AccountRights rights = {{"Identifier"}, {}, {}};
   const AccountComparison accounts =
-      compareAccounts(before.accounts, now.settings.accounts, Selection{}, rights);
+      compareAccounts(before.accounts, now.accounts, Selection{}, rights);
   for (const AccountReport& account : accounts.accounts)
     if (account.outcome == AccountOutcome::dropped)
       sentences.push_back(sentenceFor(account, keptCopy));
+  return sentences;
+}
+
+std::vector<std::string> recordsWithoutAccount(const Observation& now,
+                                               const deviceimage::SyncAgent& agent,
+                                               std::string_view prefix) {
   std::set<std::string> owned;  // a store's name counts whatever it holds
   for (const propertylist::Dictionary& account : now.settings.accounts)
     for (const Dataclass dataclass : deviceimage::kDataclasses)
       if (auto store = agent.storeIdentifier(account, dataclass)) owned.insert(std::move(*store));
+  std::vector<std::string> sentences;
   for (const ObservedStore& store : now.stores)
-    if (store.account && !store.retired && !store.records.empty() &&
-        !owned.contains(*store.account))
+    if (store.account && store.account->starts_with(prefix) && !store.retired &&
+        !store.records.empty() && !owned.contains(*store.account))
       sentences.push_back(sentenceFor(store));
   return sentences;
 }

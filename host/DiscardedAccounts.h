@@ -1,6 +1,7 @@
 #pragma once
 
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "deviceimage/SyncAgent.h"
@@ -9,11 +10,16 @@
 
 namespace host {
 
-// What a settings file that was made anew has left out, one sentence each: the accounts that only
-// the one before had, and the records in active stores of which no account is there any more.
-// `keptCopy` is the path of the copy of the one before; empty without one.
-std::vector<std::string> leftByNewSettings(const Settings& before, const Observation& now,
-                                           const deviceimage::SyncAgent& agent,
+// The accounts that only the settings file from before has, when another one was made in its place:
+// one sentence each. `keptCopy` is the path of the copy of the one before; empty without one.
+std::vector<std::string> leftByNewSettings(const Settings& before, const Settings& now,
                                            const std::string& keptCopy);
+
+// The records in active stores whose names begin with `prefix` and of which no account is there
+// (any more), so that no migrator moves them: one sentence a store. A run that failed half way, or
+// left a database alone, leaves such.
+std::vector<std::string> recordsWithoutAccount(const Observation& now,
+                                               const deviceimage::SyncAgent& agent,
+                                               std::string_view prefix);
 
 }  // namespace host

@@ -23,7 +23,7 @@ std::string sentenceFor(const LegacyReport& report, const DeviceImage& image) {
     case SettingsFate::putBack:
       if (!report.settingsBefore.exists)
         return path + " was missing; the newest copy was put back.";
-      return path + " was put back as it was.";
+      return path + " was put back with what it held.";
     case SettingsFate::lost:
       return path +
              " is gone and could not be put back; bring back the copy that is kept beside "

@@ -123,15 +123,24 @@ void MigrationHost::_runUnderLock(const RunOptions& options, int lockDescriptor)
     _refuse(std::move(reason));
   if (!_report.reasons.empty()) return;
   _leftAlone = findUnusableDatabases(_image);
+  for (const UnusableDatabase& database : _leftAlone)
+    if (database.mayPass) _refuse(_image->absolutePath(database.path) + ": " + database.why + ".");
+  if (!_report.reasons.empty()) return;
 
   _listener.stageBegan("Looking at the image before");
   const Observation before = observe(_image, _leftAlone);
   if (!before.error.empty()) return _refuse(before.error);
   const Selection selection = selectionOf(_image, _bundles);
   const deviceimage::SyncAgent agent(*_image);
-  if (_report.legacy && _report.legacy->hasMadeSettings())
-    _leftByLegacy =
-        leftByNewSettings(_report.legacy->settingsBefore, before, agent, _report.legacy->keptCopy);
+  const bool isMadeAnew = _report.legacy && _report.legacy->hasMadeSettings();
+  if (isMadeAnew)
+    _leftWithoutAccount = leftByNewSettings(_report.legacy->settingsBefore, before.settings,
+                                            _report.legacy->keptCopy);
+  // What other services left behind on their own is no matter of this run.
+  append(_leftWithoutAccount,
+         recordsWithoutAccount(
+             before, agent,
+             isMadeAnew ? std::string_view() : deviceimage::SyncAgent::kQuillnetStorePrefix));
   removeStaleTemporaryFiles(*_image);
   _image->removeLeftovers();
   if (!_interruption.requested()) _runMigrators(options, lockDescriptor);
@@ -216,7 +225,7 @@ void MigrationHost::_compare(const Observation& before, const Observation& after
                                                selection, rightsOf(_bundles));
   _report.accounts = std::move(accounts.accounts);
   append(contradictions, accounts.contradictions);
-  std::vector<std::string> leftBehind = std::move(_leftByLegacy);
+  std::vector<std::string> leftBehind = std::move(_leftWithoutAccount);
   append(leftBehind, accounts.leftBehind);
   if (after.error.empty()) {
     RecordAccounting records = accountForRecords(before, after, selection, agent);

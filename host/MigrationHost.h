@@ -67,8 +67,8 @@ class MigrationHost {
   std::vector<MigratorBundle> _bundles;
   std::vector<UnusableDatabase> _leftAlone;
   MigrationReport _report;
-  std::size_t _logSize = 0;                // bytes
-  std::vector<std::string> _leftByLegacy;  // sentences: what the legacy step has left behind
+  std::size_t _logSize = 0;                      // bytes
+  std::vector<std::string> _leftWithoutAccount;  // sentences: what no migrator can move
   bool _isAnythingLeftBehind = false;
 };
 

@@ -48,6 +48,11 @@ std::vector<UnusableDatabase> findUnusableDatabases(
   for (const DatabaseReport& database : stores.checkDatabases()) {
     if (database.problems.empty())
       findUnwritable(*image, database.path, found);
+    else if (database.mayPass)
+      found.push_back({database.path,
+                       "it cannot be looked at now: " + database.problems.front() +
+                           "; mend that, and run the host again",
+                       false, true});
     else
       found.push_back({database.path, "it is damaged or in use: " + database.problems.front() +
                                           "; bring back a sound copy, or wait for who uses it"});

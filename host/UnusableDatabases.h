@@ -15,6 +15,9 @@ struct UnusableDatabase {
   std::string path;         // relative to the image
   std::string why;          // the rest of a sentence that begins with the path
   bool isReadable = false;  // only writing is impossible
+  // Nothing says that the database is unusable, only that it cannot be looked at now: leaving it
+  // alone would strand its records, whose account goes.
+  bool mayPass = false;
 };
 
 // Rolls back what a killed run may have left in the databases; then, which of them are damaged, of

@@ -101,8 +101,8 @@ class LegacyStepNeeded(LegacyTestCase):
              f"{self.image / COPY} still has it.",
              f"The Mail account n@example.net of the settings file from before is not in the new one; "
              f"{self.image / COPY} still has it.",
-             "1 record of contacts in the store Quillnet:ada belongs to no account of the new settings file and "
-             "would not be migrated."], run.report["reasons"])
+             "1 record of contacts in the store Quillnet:ada belongs to no account of the settings file and "
+             "cannot be migrated."], run.report["reasons"])
         self.assertEqual(["M"], self.identifiers())
         self.assertEqual([card("new", "Nora").encode()], self.contents("contacts", hosttest.SERVICE))
 
@@ -316,7 +316,7 @@ class LegacyStepFailed(LegacyTestCase):
         self.assertEqual(code, run.code, run.output)
         self.assertEqual(("failed", "put back"), (run.report["legacy"]["result"], run.report["legacy"]["settings"]))
         self.assertEqual(([], []), (run.report["migrators"], run.report["accounts"]))
-        for word in (*words, "was put back as it was"):
+        for word in (*words, "was put back with what it held"):
             self.assertIn(word, " ".join(run.report["reasons"]))
         self.assertEqual(before, self.bytes_of(hosttest.SETTINGS))
         self.assertEqual([], self.names())

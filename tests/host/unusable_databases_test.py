@@ -1,6 +1,9 @@
 """A database that cannot be used is left alone and told of; the others are migrated."""
+import os
+import shutil
 import sqlite3
 import subprocess
+import unittest
 
 import hosttest
 from hosttest import SERVICE, account, card, event, record
@@ -44,6 +47,30 @@ class UnusableDatabases(hosttest.HostTestCase):
                       "be used.", run.report["reasons"])
         self.assertEqual(["calendars"], [line["dataclass"] for line in run.report["dataclasses"]])
         self.assertTrue(any("is left alone" in line for line in run.report["log"]))
+
+    def test_one_that_was_brought_back_has_records_that_no_account_owns_any_more(self):
+        sound = self.contacts_file.read_bytes()
+        self.damage(100, 200)
+        self.check_that_contacts_are_left_alone("damaged")
+        self.contacts_file.write_bytes(sound)
+        for _ in range(2):  # nobody moves them meanwhile
+            run = self.run_host("--json", "--quiet")
+            self.assertEqual((3, "left behind"), (run.code, run.report["outcome"]))
+            self.assertEqual([f"1 record of contacts in the store {SERVICE} belongs to no account of "
+                              "the settings file and cannot be migrated."], run.report["reasons"])
+
+    @unittest.skipIf(shutil.which("strace") is None, "needs strace")
+    @unittest.skipIf(os.environ["SANITIZED"], "a sanitizer does not work under strace")
+    def test_one_that_cannot_be_read_at_the_moment_refuses_the_run(self):
+        before = (self.image / hosttest.SETTINGS).read_bytes()
+        run = self.run_host("--json", "--quiet", prefix=(
+            "strace", "-f", "-qq", "-o", os.devnull, "-P", str(self.contacts_file),
+            "-e", "inject=pread64:error=EIO"))
+        self.assertEqual((7, "refused"), (run.code, run.report["outcome"]))
+        self.assertEqual(1, len(run.report["reasons"]))
+        self.assertIn("cannot be looked at now", run.report["reasons"][0])
+        self.assertEqual(before, (self.image / hosttest.SETTINGS).read_bytes())
+        self.assertEqual(1, len(self.contents("calendars", SERVICE)))
 
     def test_one_with_another_content_than_its_hashes_say(self):
         with sqlite3.connect(self.contacts_file) as database:

@@ -42,7 +42,9 @@ ParsedCommandLine parseCommandLine(int argumentCount, char** arguments) {
                 "First make the settings file of what older systems left, if they did");
   run->add_flag("--json", command.json, "Print the report as JSON, and nothing else");
   run->add_option("--log", command.logFile, "Write the migrators' log lines to this file too");
-  run->add_option("--timeout", seconds, "Stop a migrator after this many seconds")
+  run->add_option("--timeout", seconds,
+                  "Stop a migrator after this many seconds; with --legacy, waiting for the "
+                  "migration lock counts")
       ->capture_default_str()
       ->check(CLI::Range(1LL, static_cast<long long>(kLongestLimit.count())));
   run->add_flag("--quiet", command.quiet, "Show no log lines and no progress");

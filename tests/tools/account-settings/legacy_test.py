@@ -255,7 +255,7 @@ class Failing(LegacyTest):
     def test_by_its_answer(self):
         self.write_legacy_mail("L1")
         answer = self.check_failure("answers false", "Account Migrator reports that its migration failed. "
-                                    f"{self.settings_file} was put back as it was.", "The legacy files are")
+                                    f"{self.settings_file} was put back with what it held.", "The legacy files are")
         self.assertEqual(answer["log"][2:], ["ScriptedMigrator: answers false",
                                              "[+[ASSAccountsManager _migrateAccountsIfNeeded]] Accounts migration failed"])
 
