@@ -29,10 +29,10 @@ class KeptSettingsOfAnImage : public testing::Test {
     return settings() + ".before-migration-" + number;
   }
   static void write(const std::string& path, const std::string& content) {
-    std::ofstream(path, std::ios::binary) << content;
+    std::ofstream(path, std::fstream::binary) << content;
   }
   static std::string contentOf(const std::string& path) {
-    std::ifstream stream(path, std::ios::binary);
+    std::ifstream stream(path, std::fstream::binary);
     return {std::istreambuf_iterator<char>(stream), {}};
   }
   // As a save does it.
