@@ -103,16 +103,15 @@ std::optional<CommandFailure> save(AccountStore& store, bool notify) {
   const std::optional<std::string> raised = raisedBySaving(store);
   const bool isSaved = settingsFileIdentity(store.image()) != before;
   if (raised) {
-    CommandFailure failure(
-        ExitCode::unexpectedFailure,
-        fmt::format("{}: the accounts were {}: {}; the account services are listed in "
-                    "{}/AccountCreators.plist; install what it names into the image, or leave "
-                    "--notify out",
-                    store.image().settingsFile(),
-                    isSaved ? "saved, but not every notifier was told" : "not saved", *raised,
-                    installedAccountResources()));
-    if (!isSaved) throw failure;
-    return failure;
+    const std::string text = fmt::format(
+        "{}: the accounts were {}: {}; the account services are listed in "
+        "{}/AccountCreators.plist; install what it names into the image, or leave "
+        "--notify out",
+        store.image().settingsFile(),
+        isSaved ? "saved, but not every notifier was told" : "not saved", *raised,
+        installedAccountResources());
+    if (!isSaved) throw CommandFailure(ExitCode::unexpectedFailure, text);
+    return CommandFailure(ExitCode::unexpectedFailure, text);
   }
   if (const auto line = failureLine(store)) failUnsaved(store, *line);
   if (!isSaved) failUnsaved(store, "The library said nothing.");
