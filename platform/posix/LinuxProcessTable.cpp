@@ -25,9 +25,9 @@ constexpr std::size_t kLongestName = 16;
 constexpr std::size_t kRoomToGrow = 64;
 constexpr std::string_view kDeletedMark = " (deleted)";
 
-// The numbers among the names of /proc; the errno when it cannot be listed.
-int listIdentifiers(std::vector<pid_t>& identifiers) {
-  const std::unique_ptr<DIR, int (*)(DIR*)> directory(::opendir(kProcesses), ::closedir);
+// The numbers among the names of a directory; the errno when it cannot be listed.
+int listIdentifiers(const char* path, std::vector<pid_t>& identifiers) {
+  const std::unique_ptr<DIR, int (*)(DIR*)> directory(::opendir(path), ::closedir);
   if (!directory) return errno;
   for (;;) {
     errno = 0;
@@ -41,8 +41,8 @@ int listIdentifiers(std::vector<pid_t>& identifiers) {
   }
 }
 
-std::string pathOf(pid_t process, const char* name) {
-  return std::string(kProcesses) + "/" + std::to_string(process) + "/" + name;
+std::string pathOf(pid_t process, std::string_view name) {
+  return std::string(kProcesses) + "/" + std::to_string(process) + "/" + std::string(name);
 }
 
 // The beginning of a file of the process, as much as is looked at; empty when it is gone.
@@ -55,10 +55,11 @@ std::string beginningOf(pid_t process, const char* name) {
   return {bytes.data(), count > 0 ? static_cast<std::size_t>(count) : 0};
 }
 
-// The executable's path; empty when it is not shown to the caller, or there is none.
-std::string executableOf(pid_t process) {
+// The path of the executable that `link` of the process leads to; empty when it is not shown to the
+// caller, or there is none.
+std::string executableOf(pid_t process, const std::string& link) {
   std::array<char, 4096> target{};
-  const ssize_t length = ::readlink(pathOf(process, "exe").c_str(), target.data(), target.size());
+  const ssize_t length = ::readlink(pathOf(process, link).c_str(), target.data(), target.size());
   std::string path(target.data(), length > 0 ? static_cast<std::size_t>(length) : 0);
   if (path.ends_with(kDeletedMark)) path.resize(path.size() - kDeletedMark.size());
   return path;
@@ -93,7 +94,16 @@ std::optional<State> stateIn(std::string_view line) {
   return state;
 }
 
-bool hasEnded(const State& state) { return state.letter == 'Z' || state.letter == 'X'; }
+// Where /proc/PROCESS tells the executable; empty when the process has ended. One whose first
+// thread alone has ended looks as if it had, and another of its threads has to be asked.
+std::string executableLink(pid_t process, const State& state) {
+  if (state.letter != 'Z' && state.letter != 'X') return "exe";
+  std::vector<pid_t> threads;
+  listIdentifiers(pathOf(process, "task").c_str(), threads);
+  const auto other =
+      std::find_if(threads.begin(), threads.end(), [&](pid_t thread) { return thread != process; });
+  return other == threads.end() ? std::string() : "task/" + std::to_string(*other) + "/exe";
+}
 
 std::string fileName(std::string_view path) {
   return std::string(path.substr(path.rfind('/') + 1)).substr(0, kLongestName);
@@ -120,14 +130,14 @@ bool hasNoDescriptors(int error) { return error == ENOSYS || error == EPERM; }
 
 ProcessTable::Sized LinuxProcessTable::sizeOfTable() {
   std::vector<pid_t> identifiers;
-  if (const int error = listIdentifiers(identifiers); error != 0)
+  if (const int error = listIdentifiers(kProcesses, identifiers); error != 0)
     return {systemFailure(error, "list", kProcesses), 0};
   return {Status::success(), identifiers.size() + kRoomToGrow};
 }
 
 ProcessTable::Filled LinuxProcessTable::fillTable(std::size_t capacity) {
   std::vector<pid_t> identifiers;
-  if (const int error = listIdentifiers(identifiers); error != 0)
+  if (const int error = listIdentifiers(kProcesses, identifiers); error != 0)
     return {systemFailure(error, "list", kProcesses), {}};
   std::sort(identifiers.begin(), identifiers.end());
   Filled filled;
@@ -135,8 +145,9 @@ ProcessTable::Filled LinuxProcessTable::fillTable(std::size_t capacity) {
   for (const pid_t process : identifiers) {
     const std::string line = beginningOf(process, "stat");
     const std::optional<State> state = stateIn(line);
-    if (!state || hasEnded(*state)) continue;  // gone since it was listed
-    const std::string executable = executableOf(process);
+    const std::string link = state ? executableLink(process, *state) : std::string();
+    if (link.empty()) continue;  // gone since it was listed
+    const std::string executable = executableOf(process, link);
     if (!liesBelow(executable, _directory)) continue;
     if (filled.processes.size() == capacity)
       return {Status::failure(ENOMEM, "the table of processes has grown past the room for it"), {}};

@@ -14,11 +14,12 @@ namespace platform {
 //
 // A process's command name is the file name of its executable, or of its first argument where the
 // executable is not shown to the caller, or the kernel's own short name where there is neither; cut
-// at 16 bytes. A process that has ended and waits for its parent is none.
+// at 16 bytes. A process of which every thread has ended, and which waits for its parent, is none.
 class PLATFORM_EXPORT LinuxProcessTable : public ProcessTable {
  public:
   // All processes, or only those whose executable is a file below `directory` (absolute, without
-  // links and without a "/" at its end unless it is "/").
+  // links and without a "/" at its end unless it is "/"). A process whose executable is not shown
+  // to the caller, such as another user's, is then none of them.
   LinuxProcessTable() = default;
   explicit LinuxProcessTable(std::string directory) : _directory(std::move(directory)) {}
 

@@ -3,6 +3,7 @@
 #include <poll.h>
 
 #include <algorithm>
+#include <cerrno>
 #include <cstdint>
 
 namespace platform {
@@ -32,6 +33,7 @@ PollRunLoop::Source PollRunLoop::addTimer(std::chrono::milliseconds interval, Ha
 }
 
 PollRunLoop::Source PollRunLoop::addDescriptor(int descriptor, Handler handler) {
+  if (descriptor < 0) return kNoSource;
   return _add({0, descriptor, {}, {}, std::move(handler)});
 }
 
@@ -66,6 +68,7 @@ PollRunLoop::Source PollRunLoop::_waitForSource(Instant end) {
       if (entry.descriptor < 0) wake = std::min(wake, entry.due);
     // poll passes over negative descriptors, those of the timers.
     const int ready = ::poll(descriptors.data(), descriptors.size(), timeoutUntil(wake));
+    const int failure = errno;
     const Instant now = steady_clock::now();
     for (std::size_t i = 0; i < entries.size(); ++i) {
       const bool isReady = entries[i].descriptor < 0 ? entries[i].due <= now
@@ -73,6 +76,8 @@ PollRunLoop::Source PollRunLoop::_waitForSource(Instant end) {
       if (isReady) return entries[i].source;
     }
     if (now >= end) return kNoSource;
+    // More descriptors than the process may have, or no memory: wait without them.
+    if (ready < 0 && failure != EINTR) std::this_thread::sleep_until(wake);
   }
 }
 

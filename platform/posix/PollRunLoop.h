@@ -13,7 +13,7 @@ namespace platform {
 
 // A run loop for each thread, over timers and descriptors. A source belongs to the thread that adds
 // it, and is served while that thread runs its loop. A handler may add and remove sources, and may
-// run the loop. Any thread.
+// run the loop, after it has read what made its descriptor ready. Any thread.
 class PLATFORM_EXPORT PollRunLoop : public RunLoop {
  public:
   using Handler = std::function<void()>;
@@ -23,7 +23,8 @@ class PLATFORM_EXPORT PollRunLoop : public RunLoop {
   // does not run lets beats pass by and makes up for none of them.
   Source addTimer(std::chrono::milliseconds interval, Handler handler);
   // Calls `handler` while the descriptor, which stays open until the source is removed, can be read
-  // without waiting, is at its end or has failed.
+  // without waiting, is at its end or has failed. A number below 0 is no descriptor: nothing is
+  // added, and -1 comes back.
   Source addDescriptor(int descriptor, Handler handler);
   // For the thread that added it, which does so before it ends: a later thread may have its name.
   // Nothing happens to a source that is not there.

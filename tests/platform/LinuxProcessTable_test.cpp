@@ -5,6 +5,8 @@
 
 #include <cerrno>
 #include <cstdint>
+#include <fstream>
+#include <string>
 #include <thread>
 
 #include "platform/posix/MonotonicClock.h"
@@ -105,6 +107,32 @@ TEST_F(LinuxProcesses, ThatWereNotListedAreNotSignalled) {
   LinuxProcessTable table;
   EXPECT_EQ(table.sendSignal(process, SIGKILL).code, ESRCH);
   EXPECT_EQ(nameOf(table, process), "tallowd");
+}
+
+// Starts a process that waits in another thread than its first, which has ended.
+pid_t startWithoutFirstThread() {
+  const pid_t process = ::fork();
+  if (process == 0) {
+    std::thread([] {
+      for (;;) ::pause();
+    }).detach();
+    ::syscall(SYS_exit, 0);
+  }
+  const std::string path = "/proc/" + std::to_string(process) + "/stat";
+  for (std::string line; line.find(") Z ") == std::string::npos;)
+    std::getline(std::ifstream(path), line);
+  return process;
+}
+
+TEST_F(LinuxProcesses, OfWhichOneThreadIsLeftAreListedAndSignalled) {
+  const pid_t process = startWithoutFirstThread();
+  const std::filesystem::path program = std::filesystem::read_symlink("/proc/self/exe");
+  LinuxProcessTable table(program.parent_path().string());
+  EXPECT_EQ(nameOf(table, process), program.filename().string().substr(0, 16));
+  EXPECT_EQ(table.sendSignal(process, SIGKILL).code, 0);
+  int status = 0;
+  ASSERT_EQ(::waitpid(process, &status, 0), process);
+  EXPECT_TRUE(WIFSIGNALED(status));
 }
 
 // Starts a process that waits, under a number that was another's.
