@@ -193,7 +193,8 @@ class ASSAccountsManager {
   // Removes the settings file, so that it is built from the legacy files. A failure is logged.
   static void removeNewAccountSettingsToMigrateOldAccountInformation();
   // Runs the device's accounts data migrator, under the migration lock, when there is something to
-  // migrate: once per process, whatever comes of it. Without that migrator's bundle nothing is
+  // migrate: once per process (where several copies of this library are loaded, once per copy),
+  // whatever comes of it. Without that migrator's bundle nothing is
   // said, and a removed settings file stays removed. The legacy files are not touched, so each
   // process that calls this while they are there has the settings built anew from them, and what
   // was changed since is gone: a device calls it once, after an upgrade, or its migrator moves the

@@ -7,7 +7,8 @@
 
 namespace accountsdatamigrator {
 
-// The catalogue of account types that lies beside this code. An account of any other type would be
+// The catalogue of account types: the one beside this code, or the calling program's own where it
+// names a folder of resources. An account of any other type would be
 // gone at the account settings library's next save.
 class AccountTypes {
  public:

@@ -3,14 +3,13 @@
 #include <algorithm>
 #include <array>
 #include <cstdint>
-#include <set>
 #include <span>
 #include <string_view>
 #include <utility>
 
 #include "QuillnetAccountTypeRemoval/AccountConstants.h"
+#include "accountsdatamigrator/LegacyIdentifiers.h"
 #include "platform/Services.h"
-#include "propertylist/Writing.h"
 
 namespace accountsdatamigrator {
 
@@ -26,11 +25,13 @@ constexpr std::string_view kLegacyDisplayName = "AccountName";
 constexpr std::string_view kLegacyDataclasses = "Dataclasses";
 constexpr std::string_view kLegacyHost = "Hostname";
 constexpr std::string_view kDataclassPrefix = "com.vantor.Dataclass.";
+constexpr std::size_t kLongestDataclass = 256;
 
 // What the account settings keep under these names is not what a legacy entry has there.
-constexpr std::array<std::string_view, 8> kKeysNotTaken = {
-    kLegacyIdentifier, kLegacyDisplayName, kLegacyDataclasses,      kAccountChildAccounts,
-    kAccountType,      kAccountTypeString, kAccountShortTypeString, kAccountSupportedDataclasses};
+constexpr std::array<std::string_view, 9> kKeysNotTaken = {
+    kLegacyIdentifier,     kLegacyDisplayName,           kLegacyDataclasses,
+    kAccountType,          kAccountTypeString,           kAccountShortTypeString,
+    kAccountChildAccounts, kAccountSupportedDataclasses, kAccountEnabledDataclasses};
 
 struct NamedType {
   std::string_view name;
@@ -74,22 +75,42 @@ constexpr List kMailList = {"MailAccounts", kMailClasses, kMailHosts};
 constexpr List kOutgoingList = {"OutgoingAccounts", kMailClasses, {}};
 constexpr List kDataAccessList = {"Accounts", kDataAccessClasses, {}};
 
-// 128 bits of a digest in the form of a UUID of version 8, which is for such.
-std::string identifierFrom(std::span<const std::uint8_t> bytes) {
-  std::array<std::uint64_t, 2> halves = {0xCBF29CE484222325U, 0x84222325CBF29CE4U};
-  for (const std::uint8_t byte : bytes)
-    for (std::uint64_t& half : halves) half = (half ^ byte) * 0x100000001B3U + (half >> 47U);
-  halves[0] = (halves[0] & ~std::uint64_t{0xF000}) | 0x8000U;
-  halves[1] = (halves[1] & (~std::uint64_t{0} >> 2U)) | (std::uint64_t{1} << 63U);
-  std::string text;
-  for (const std::uint64_t half : halves)
-    for (int shift = 60; shift >= 0; shift -= 4) {
-      if (text.size() == 8 || text.size() == 13 || text.size() == 18 || text.size() == 23)
-        text += '-';
-      text += "0123456789ABCDEF"[(half >> static_cast<unsigned>(shift)) & 0xFU];
-    }
-  return text;
+// A dataclass by its short or its whole name; empty for a name that is longer than any.
+std::string wholeDataclass(const std::string& name) {
+  if (name.size() > kLongestDataclass) return {};
+  return name.starts_with(kDataclassPrefix) ? name : std::string(kDataclassPrefix) + name;
 }
+
+// The lines about one file's entries. A file can have very many that are wrong in one way, and its
+// size says little of how many, since entries may be shared: after kMaximum lines there is but one
+// more, with their number.
+class Remarks {
+ public:
+  Remarks(const std::string& path, std::string_view list) : _path(path), _list(list) {}
+  Remarks(const Remarks&) = delete;
+  Remarks& operator=(const Remarks&) = delete;
+  ~Remarks() {
+    if (_count > kMaximum)
+      platform::logToSystem("AccountMigrator: %@: \"%@\": and %ld more of such lines", _path, _list,
+                            _count - kMaximum);
+  }
+
+  // `what` is a format for `arguments`, what is said of the entry at hand.
+  template <typename... Arguments>
+  void add(std::string_view what, const Arguments&... arguments) {
+    if (++_count > kMaximum) return;
+    platform::logToSystem("AccountMigrator: %@: \"%@\"[%ld]" + std::string(what), _path, _list,
+                          entry, arguments...);
+  }
+
+  std::int64_t entry = 0;  // the index of the entry at hand
+
+ private:
+  static constexpr std::int64_t kMaximum = 100;
+  const std::string& _path;
+  std::string_view _list;
+  std::int64_t _count = 0;
+};
 
 // Makes accounts, one after the other, with identifiers that differ.
 class Builder {
@@ -124,28 +145,29 @@ class Builder {
       platform::logToSystem("AccountMigrator: %@: \"%@\" is no array", path, list.name);
       return false;
     }
-    for (std::size_t index = 0; index < entries->size(); ++index) {
-      _place = path + ": \"" + std::string(list.name) + "\"[" + std::to_string(index) + "]";
-      if (const Dictionary* const entry = (*entries)[index].asDictionary())
-        _addEntry(*entry, list);
+    Remarks remarks(path, list.name);
+    for (const Value& each : *entries) {
+      if (const Dictionary* const entry = each.asDictionary())
+        _addEntry(*entry, list, remarks);
       else
-        _leaveOut("it is no dictionary");
+        remarks.add(" is left out: it is no dictionary");
+      ++remarks.entry;
     }
     return true;
   }
 
-  void _addEntry(const Dictionary& entry, const List& list) {
+  void _addEntry(const Dictionary& entry, const List& list, Remarks& remarks) {
     const std::string* const className = propertylist::findString(entry, kAccountClass);
-    if (className == nullptr) return _leaveOut("it has no string \"Class\"");
+    if (className == nullptr) return remarks.add(" is left out: it has no string \"Class\"");
     std::string_view type = typeFor(list.classes, *className);
     const std::string* const host = propertylist::findString(entry, kLegacyHost);
     if (type == kMailAccountType && *className == "IMAPAccount" && host != nullptr)
       if (const std::string_view ofHost = typeFor(list.hosts, *host); !ofHost.empty())
         type = ofHost;
-    if (type.empty()) return _leaveOut("its class \"" + *className + "\" is not known");
+    if (type.empty()) return remarks.add(" is left out: its class \"%@\" is not known", *className);
     if (!_types.knows(type))
-      return _leaveOut("the catalogue lacks its type \"" + std::string(type) + "\"");
-    const std::string identifier = _identifierFor(entry);
+      return remarks.add(" is left out: the catalogue lacks its type \"%@\"", type);
+    const std::string identifier = _identifierFor(entry, remarks);
     Dictionary account = entry;
     for (const std::string_view key : kKeysNotTaken) account.remove(key);
     account.set(kAccountIdentifier, identifier);
@@ -153,48 +175,42 @@ class Builder {
     const Value* const name = entry.find(kLegacyDisplayName);
     if (name != nullptr && !account.contains(kAccountDisplayName))
       account.set(kAccountDisplayName, *name);
-    account.set(kAccountEnabledDataclasses, _dataclassesFor(entry, type));
+    account.set(kAccountEnabledDataclasses, _dataclassesFor(entry, type, remarks));
     _accounts.emplace_back(std::move(account));
   }
 
-  void _leaveOut(std::string_view why) const {
-    platform::logToSystem("AccountMigrator: %@ is left out: %@", _place, why);
-  }
-
   // The entry's own when it has one that is still free, else one that follows from its content.
-  std::string _identifierFor(const Dictionary& entry) {
+  std::string _identifierFor(const Dictionary& entry, Remarks& remarks) {
     for (const std::string_view key : {kAccountIdentifier, kLegacyIdentifier}) {
-      const std::string* const own = propertylist::findString(entry, key);
-      if (own == nullptr || own->empty()) continue;
-      if (_identifiers.insert(*own).second) return *own;
-      platform::logToSystem("AccountMigrator: %@ gets a new identifier: \"%@\" is taken", _place,
-                            *own);
-      break;
+      const Value* const value = entry.find(key);
+      if (value == nullptr) continue;
+      const std::string* const own = value->asString();
+      if (own != nullptr && !own->empty() && _identifiers.take(*own)) return *own;
+      if (own != nullptr && !own->empty()) {
+        remarks.add(" gets a new identifier: \"%@\" is taken", *own);
+        break;
+      }
+      remarks.add(" has no use for its \"%@\": it is no text", key);
     }
-    propertylist::Bytes bytes =
-        propertylist::writeBinaryPropertyList(entry).value_or(propertylist::Bytes());
-    for (;;) {
-      std::string made = identifierFrom(bytes);
-      if (_identifiers.insert(made).second) return made;
-      bytes.push_back(0);  // an entry with equal content came before
-    }
+    return _identifiers.make(entry);
   }
 
   // Those that the entry lists and the type can have; without a list, all that the type can have.
-  Array _dataclassesFor(const Dictionary& entry, std::string_view type) const {
+  Array _dataclassesFor(const Dictionary& entry, std::string_view type, Remarks& remarks) const {
     const Array possible = _types.dataclassesOf(type);
-    const Array* const listed = propertylist::findArray(entry, kLegacyDataclasses);
-    if (listed == nullptr) return possible;
+    const Value* const given = entry.find(kLegacyDataclasses);
+    if (given == nullptr) return possible;
+    const Array* const listed = given->asArray();
+    if (listed == nullptr) {
+      remarks.add(" has no dataclass enabled: its \"%@\" is no array", kLegacyDataclasses);
+      return {};
+    }
     Array enabled;
     for (const Value& value : *listed) {
       const std::string* const name = value.asString();
-      const std::string dataclass = name == nullptr ? std::string()
-                                    : name->starts_with(kDataclassPrefix)
-                                        ? *name
-                                        : std::string(kDataclassPrefix) + *name;
+      const std::string dataclass = name == nullptr ? std::string() : wholeDataclass(*name);
       if (!possible.contains(dataclass))
-        platform::logToSystem("AccountMigrator: %@: dataclass %@ is left out: type \"%@\" has none",
-                              _place, value, type);
+        remarks.add(": dataclass %@ is left out: type \"%@\" has none", value, type);
       else if (!enabled.contains(dataclass))
         enabled.append(dataclass);
     }
@@ -203,8 +219,7 @@ class Builder {
 
   const AccountTypes& _types;
   std::vector<Value> _accounts;
-  std::set<std::string, std::less<>> _identifiers;
-  std::string _place;  // of the entry at hand
+  LegacyIdentifiers _identifiers;
 };
 
 }  // namespace

@@ -371,6 +371,24 @@ TEST_F(LegacySettings, WhatAnotherProcessMigratedMeanwhileIsNotMigratedAgain) {
   EXPECT_EQ(linesWithoutAddresses(), (Lines{kElevenIsOld, found("0", "0")}));
 }
 
+// What the first decision found must not be acted on: with the lock in hand only the second counts.
+TEST_F(LegacySettings, ALegacyFileThatAnotherProcessMovedAwayMeanwhileRemovesNothing) {
+  makeFile(mailAccountsPath());
+  writeVersion(11);
+  device.fileLock.decideBy([&](const std::string& call) {
+    if (call.starts_with("lockByName")) {
+      std::filesystem::remove(mailAccountsPath());
+      writeVersion(12);
+    }
+    return std::nullopt;
+  });
+  ASSAccountsManager::_migrateAccountsIfNeeded();
+  EXPECT_NE(device.readSettingsBytes(), std::nullopt);
+  EXPECT_EQ(migrator.made, 0);
+  EXPECT_FALSE(device.fileLock.isHeld("AccountMigrationInProgress"));
+  EXPECT_EQ(linesWithoutAddresses(), (Lines{found("1", "0")}));
+}
+
 TEST_F(LegacySettings, AMigratorThatCannotBeMadeIsLogged) {
   writeVersion(11);
   migrator.makesNone = true;

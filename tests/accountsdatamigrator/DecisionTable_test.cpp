@@ -93,6 +93,23 @@ TEST_F(DecisionTable, AMailFileHidesAMissingVersion) {
   EXPECT_EQ(identifiers(), Lines{"M1"});
 }
 
+TEST_F(DecisionTable, ANewerVersionIsLeftAlone) {
+  writeSettings(13);
+  const auto before = bytesOf(kSettingsFile);
+  migrate();
+  EXPECT_EQ(log(), Lines());
+  EXPECT_EQ(bytesOf(kSettingsFile), before);
+  EXPECT_FALSE(lockFileExists());
+}
+
+TEST_F(DecisionTable, UnreadableSettingsAreLeftAlone) {
+  writeBytes(kSettingsFile, "rubbish");
+  migrate();
+  EXPECT_EQ(log(), Lines());
+  EXPECT_EQ(bytesOf(kSettingsFile), "rubbish");
+  EXPECT_FALSE(lockFileExists());
+}
+
 TEST_F(DecisionTable, AnOutdatedVersionIsBroughtUpToDate) {
   writeSettings(11);
   migrate();

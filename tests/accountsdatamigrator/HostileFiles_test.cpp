@@ -1,5 +1,6 @@
 // Legacy files that no migration can be made from.
 #include <filesystem>
+#include <set>
 
 #include "propertylist/Reading.h"
 #include "tests/accountsdatamigrator/LegacyImage.h"
@@ -32,6 +33,47 @@ TEST_F(HostileFiles, AreLoggedAndNothingIsWritten) {
     }
   }
   EXPECT_GT(count, 50U);
+}
+
+std::set<std::string> identifiersOf(const Array& accounts) {
+  std::set<std::string> found;
+  for (const propertylist::Value& account : accounts)
+    found.insert(*propertylist::findString(*account.asDictionary(), "Identifier"));
+  return found;
+}
+
+TEST_F(HostileFiles, WithVeryManyEqualEntriesAreBuiltFrom) {
+  constexpr std::size_t kCount = 20'000;
+  const Dictionary entry = {{"Class", "IMAPAccount"}};
+  write(kMailFile, {{"MailAccounts", Array(std::vector<propertylist::Value>(kCount, entry))}});
+  ASSERT_TRUE(execute());
+  EXPECT_EQ(identifiersOf(accounts()).size(), kCount);
+}
+
+TEST_F(HostileFiles, WithALongTextThatManyEntriesShareAreBuiltFrom) {
+  constexpr int kCount = 20'000;
+  const propertylist::Value shared = std::string(4'000'000, 'u');
+  std::vector<propertylist::Value> entries;
+  for (int port = 0; port < kCount; ++port)
+    entries.push_back(Dictionary{{"Class", "IMAPAccount"}, {"Username", shared}, {"Port", port}});
+  write(kMailFile, {{"MailAccounts", Array(std::move(entries))}});
+  ASSERT_TRUE(execute());
+  EXPECT_EQ(identifiersOf(accounts()).size(), std::size_t{kCount});
+}
+
+TEST_F(HostileFiles, GetABoundedNumberOfLines) {
+  const propertylist::Value shared = std::string(4'000'000, 'c');
+  const Dictionary unknown = {{"Class", shared}};
+  const Dictionary odd = {{"Class", "IMAPAccount"},
+                          {"Dataclasses", Array(std::vector<propertylist::Value>(300, shared))}};
+  std::vector<propertylist::Value> entries(20'000, unknown);
+  entries.insert(entries.end(), 100, odd);
+  write(kMailFile, {{"MailAccounts", Array(std::move(entries))}});
+  ASSERT_TRUE(execute());
+  ASSERT_EQ(log().size(), 102U);
+  EXPECT_EQ(log()[100], "AccountMigrator: IMAGE/" + std::string(kMailFile) +
+                            ": \"MailAccounts\": and 49900 more of such lines");
+  EXPECT_EQ(accounts().size(), 100U);
 }
 
 TEST_F(HostileFiles, OneOfThemLeavesTheOtherFilesAccountsUnwrittenToo) {

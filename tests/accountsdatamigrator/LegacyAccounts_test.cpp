@@ -131,6 +131,23 @@ TEST_F(LegacyAccounts, OfOneIdentifierAreToldApart) {
                                        ": \"Accounts\"[0] gets a new identifier: \"I\" is taken"));
 }
 
+TEST_F(LegacyAccounts, WithKeysOfAnotherKindGoWithoutThemAndSaySo) {
+  write(kMailFile, {{"MailAccounts", Array{Dictionary{{"Class", "IMAPAccount"},
+                                                      {"UniqueIdentifier", 7},
+                                                      {"Enabled Dataclasses", Array{"x"}},
+                                                      {"Dataclasses", "Mail"}}}}});
+  ASSERT_TRUE(execute());
+  const std::string place =
+      "AccountMigrator: IMAGE/" + std::string(kMailFile) + ": \"MailAccounts\"[0]";
+  EXPECT_EQ(log(), (Lines{place + " has no use for its \"UniqueIdentifier\": it is no text",
+                          place + " has no dataclass enabled: its \"Dataclasses\" is no array",
+                          "AccountMigrator: built IMAGE/" + std::string(kSettingsFile) +
+                              " with 1 accounts"}));
+  const Dictionary account = *accounts()[0].asDictionary();
+  EXPECT_EQ(propertylist::findString(account, "Identifier")->size(), 36U);
+  EXPECT_EQ(*account.find("Enabled Dataclasses"), propertylist::Value(Array()));
+}
+
 TEST_F(LegacyAccounts, AreTheSameEachTimeThatTheyAreMade) {
   const Dictionary nameless = {{"Class", "IMAPAccount"}, {"Username", "ada"}};
   write(kMailFile, {{"MailAccounts", Array{nameless, nameless}}});

@@ -18,7 +18,9 @@ TEST_F(OlderSettings, GiveAccountsAndChildrenWithoutIdentifierOne) {
   write(
       kSettingsFile,
       {{"Version", 7},
-       {"Accounts", Array{Dictionary{{"Type", "Exchange"}, {"ChildAccounts", Array{Dictionary()}}},
+       {"Accounts", Array{Dictionary{{"Type", "Exchange"},
+                                     {"Identifier", 7},
+                                     {"ChildAccounts", Array{Dictionary{{"Type", "OnMyDevice"}}}}},
                           Dictionary{{"Type", "OnMyDevice"}}}}});
   migrate();
   const Dictionary first = *accounts()[0].asDictionary();
