@@ -9,7 +9,9 @@ namespace {
 
 struct Registry {
   std::mutex mutex;
-  std::map<std::string, RuntimeClass*, std::less<>> classes;
+  // Of one name the first is answered. The others are kept too: whoever made them may have no
+  // other place that holds them.
+  std::multimap<std::string, RuntimeClass*, std::less<>> classes;
 };
 
 // Made at the first use, because bundles register while they are loaded, and never destroyed,
@@ -30,8 +32,9 @@ void registerClass(RuntimeClass& registered) {
 
 RuntimeClass* registeredClass(std::string_view name) {
   const std::lock_guard lock(registry().mutex);
-  const auto found = registry().classes.find(name);
-  return found == registry().classes.end() ? nullptr : found->second;
+  const auto& classes = registry().classes;
+  const auto found = classes.lower_bound(name);
+  return found == classes.end() || found->first != name ? nullptr : found->second;
 }
 
 }  // namespace platform

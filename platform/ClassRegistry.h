@@ -42,7 +42,8 @@ class PLATFORM_EXPORT ClassRegistry {
   virtual std::optional<std::string> loadLibrary(const std::string& path) = 0;
 };
 
-// Registers `registered` for the whole process; the name must be new, else the first one stays.
+// Registers `registered` for the whole process. Of one name the first is answered; a later one is
+// kept as long and never answered.
 // `registered` is never destroyed: it is answered until the process is gone, also to what runs at
 // its exit. So make it with new; an object of static storage is destroyed before that. Code bundles
 // call it while they are loaded, so it works before any service is installed.

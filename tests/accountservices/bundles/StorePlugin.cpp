@@ -26,6 +26,6 @@ class StorePluginClass : public platform::RuntimeClass, public StorePlugin {
   }
 };
 
-StorePluginClass storePlugin;
+auto& storePlugin = *new StorePluginClass;
 
 }  // namespace
