@@ -146,8 +146,8 @@ void ASSAccountsManager::removeNewAccountSettingsToMigrateOldAccountInformation(
 }
 
 void ASSAccountsManager::_migrateAccountsIfNeeded() {
-  // Not an exchange: two threads that come at once both go on, and decide again one after the other,
-  // as two processes do.
+  // Not an exchange: two threads that come at once both go on, and decide again one after the
+  // other, as two processes do.
   if (migrationAttempted) return;
   migrationAttempted = true;
   bool oldMailAccounts = false;
