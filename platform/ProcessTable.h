@@ -33,8 +33,8 @@ class PLATFORM_EXPORT ProcessTable {
   // The table, when it fits into `capacity` entries; a failure when it has grown past them.
   virtual Filled fillTable(std::size_t capacity) = 0;
   virtual pid_t ownProcessIdentifier() = 0;
-  // Sends signal number `signal` to a process of the last fillTable. Fails for a number that was not
-  // listed then, and must not hit a process that has taken the number over since.
+  // Sends signal number `signal` to a process of the last fillTable. Fails for a number that was
+  // not listed then, and must not hit a process that has taken the number over since.
   virtual Status sendSignal(pid_t process, int signal) = 0;
 };
 
