@@ -1,6 +1,7 @@
 // PosixFileServices::setAsideUnreadableFile: what a save is about to replace without having
 // understood it stays beside it under another name, an aside.
 
+#include <dirent.h>
 #include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -8,11 +9,12 @@
 #include <algorithm>
 #include <array>
 #include <cerrno>
-#include <filesystem>
+#include <memory>
+#include <optional>
 #include <set>
 #include <span>
+#include <string>
 #include <string_view>
-#include <system_error>
 
 #include "platform/posix/NumberedNames.h"
 #include "platform/posix/PosixFileServices.h"
@@ -36,19 +38,27 @@ std::string asideName(const std::string& path, unsigned number) {
   return path + std::string(kMark) + std::to_string(number);
 }
 
-// The numbers of the asides of `path`, whoever made them.
+struct DirectoryCloser {
+  void operator()(DIR* directory) const { ::closedir(directory); }
+};
+
+// The numbers of the asides of `path`, whoever made them. std::filesystem's iterator would end the
+// process when memory runs out.
 Status findAsides(const std::string& path, std::set<unsigned>& numbers) {
-  const std::filesystem::path whole(path);
-  const std::filesystem::path directory = whole.has_parent_path() ? whole.parent_path() : ".";
-  const std::string prefix = whole.filename().string() + std::string(kMark);
-  std::error_code error;
-  for (std::filesystem::directory_iterator entry(directory, error), end; !error && entry != end;
-       entry.increment(error)) {
-    const std::string name = entry->path().filename();
-    if (const std::optional<unsigned> number = numberAfter(prefix, name)) numbers.insert(*number);
+  const std::size_t slash = path.rfind('/');
+  const std::string directory =
+      slash == std::string::npos ? "." : path.substr(0, slash == 0 ? 1 : slash);
+  const std::string prefix =
+      path.substr(slash == std::string::npos ? 0 : slash + 1) + std::string(kMark);
+  const std::unique_ptr<DIR, DirectoryCloser> entries(::opendir(directory.c_str()));
+  if (entries == nullptr) return systemFailure(errno, "open", directory);
+  errno = 0;
+  while (const dirent* const entry = ::readdir(entries.get())) {
+    if (const std::optional<unsigned> number = numberAfter(prefix, entry->d_name))
+      numbers.insert(*number);
+    errno = 0;
   }
-  if (error) return systemFailure(error.value(), "read", directory);
-  return Status::success();
+  return errno == 0 ? Status::success() : systemFailure(errno, "read", directory);
 }
 
 // A file that is open for reading, if it can be: without waiting, following a link, or taking a

@@ -1,6 +1,9 @@
-// A library for LD_PRELOAD that lets allocations fail, counted from the call of beginToFail on.
+// A library for LD_PRELOAD that lets allocations fail, counted from the call of beginToFail to that
+// of endOfFailing.
 //   FAILING_AT=N      the N-th fails (from 1); with FAILING_ON=1 all from there on
-//   FAILING_COUNT=F   the number of allocations is written to the file F in the end
+//   FAILING_COUNT=F   the numbers of allocations, and of those that failed, are written to the file
+//   F
+//                     in the end
 #include <atomic>
 #include <cerrno>
 #include <cstddef>
@@ -17,6 +20,7 @@ namespace {
 
 std::atomic<bool> hasBegun = false;
 std::atomic<long> count = 0;
+std::atomic<long> failures = 0;
 long failingAt = 0;
 bool failsOn = false;
 
@@ -24,6 +28,7 @@ bool isToFail() {
   if (!hasBegun) return false;
   const long number = ++count;
   if (failingAt == 0 || number < failingAt || (number > failingAt && !failsOn)) return false;
+  ++failures;
   errno = ENOMEM;
   return true;
 }
@@ -34,7 +39,7 @@ struct CountWriter {
     const char* name = std::getenv("FAILING_COUNT");
     std::FILE* file = name != nullptr ? std::fopen(name, "w") : nullptr;
     if (file == nullptr) return;
-    std::fprintf(file, "%ld\n", count.load());
+    std::fprintf(file, "%ld %ld\n", count.load(), failures.load());
     std::fclose(file);
   }
 } countWriter;
@@ -49,6 +54,7 @@ EXPORTED void beginToFail() {
   failsOn = std::getenv("FAILING_ON") != nullptr;
   hasBegun = true;
 }
+EXPORTED void endOfFailing() { hasBegun = false; }
 
 EXPORTED void* malloc(std::size_t size) { return isToFail() ? nullptr : __libc_malloc(size); }
 EXPORTED void* calloc(std::size_t number, std::size_t size) {

@@ -1,21 +1,27 @@
 // Loads, changes and saves the settings of a device image, for tests that fail or kill it on the
 // way.
-//   fault_saver once IMAGE          changes the name of account "A" and saves
-//   fault_saver twice IMAGE         the same, and saves again
-//   fault_saver many IMAGE ID N     N times: loads, counts up in the account ID, saves
-//   fault_saver add IMAGE ID N      N times, each under the migration lock: loads, adds an account,
-//   saves fault_saver read IMAGE N        reads the settings file N times fault_saver until IMAGE
-//   ID      as many, until it is killed
+//   fault_saver once IMAGE           changes the name of account "A" and saves
+//   fault_saver twice IMAGE          the same, and saves again; anew when the first try came to
+//                                    nothing
+//   fault_saver insert IMAGE         adds account "New" to what could be loaded, and saves
+//   fault_saver insert-twice IMAGE   the same, and saves again
+//   fault_saver many IMAGE ID N      N times: loads, counts up in the account ID, saves
+//   fault_saver until IMAGE ID       as many, until it is killed
+//   fault_saver add IMAGE ID N       N times, each under the migration lock: loads, adds an
+//   account,
+//                                    saves
 // The exit code says what happened, since a fault may hit any output: see Outcome. It is a sum.
-#include <sys/stat.h>
-#include <unistd.h>
-
+//   SAVER_BEFORE_SAVE=C   the shell runs C after the first load
+//   SAVER_LOG=F           what is logged is appended to the file F
 #include <cstdlib>
 #include <filesystem>
+#include <fstream>
+#include <functional>
 #include <iterator>
 #include <limits>
 #include <new>
 #include <string>
+#include <string_view>
 
 #include "QuillnetAccountTypeRemoval/ASSAccountsManager.h"
 #include "deviceimage/DeviceImageServices.h"
@@ -24,9 +30,11 @@
 
 // Of the library that lets allocations fail, when it is there.
 extern "C" void beginToFail() __attribute__((weak));
+extern "C" void endOfFailing() __attribute__((weak));
 
 namespace {
 
+using accountsettings::AccountsManagerPtr;
 using accountsettings::ASSAccountsManager;
 using propertylist::Dictionary;
 
@@ -37,41 +45,71 @@ enum Outcome {
   kDescriptorsLeaked = 8,
   kNotLoaded = 16,  // nothing was saved
   kWrongUsage = 32,
-  kTorn = 64,          // a reader met no whole file
-  kOutOfMemory = 128,  // the library threw; alone
+  kOutOfMemory = 64,  // the library threw; nothing is known of the first save
 };
 
 int logLines = 0;
+
+void noteLogLine(std::string_view line) {
+  ++logLines;
+  if (const char* name = std::getenv("SAVER_LOG"))
+    std::ofstream(name, std::ios::app) << line << '\n';
+}
 
 std::ptrdiff_t countOfDescriptors() {
   std::error_code error;
   return std::distance(std::filesystem::directory_iterator("/proc/self/fd", error), {});
 }
 
-int saveOnce(bool again) {
+AccountsManagerPtr loadAndRename() {
+  AccountsManagerPtr store = ASSAccountsManager::init();
+  const accountsettings::AccountPtr account = store->accountWithIdentifier("A");
+  if (account == nullptr) return nullptr;
+  account->setDisplayName("changed");
+  return store;
+}
+
+AccountsManagerPtr loadAndInsert() {
+  AccountsManagerPtr store = ASSAccountsManager::init();
+  store->insertAccount(accountsettings::ASSBasicAccount::initWithProperties(
+      Dictionary{{"Identifier", "New"}, {"Type", "CalDAV"}, {"Class", "CalDAVAccount"}}));
+  return store;
+}
+
+// Loads and changes when there is no store yet, and saves, after the shell has run the command.
+int tryToSave(AccountsManagerPtr& store, const std::function<AccountsManagerPtr()>& loadAndChange,
+              const char* command) {
+  try {
+    if (store == nullptr) store = loadAndChange();
+    if (store == nullptr) return kNotLoaded;
+    if (command != nullptr && std::system(command) != 0) return kWrongUsage;
+    logLines = 0;
+    store->saveAllAccounts();
+    return (logLines > 0 ? kSaveFailed : 0) + (logLines > 1 ? kSavedLinesAreMany : 0);
+  } catch (const platform::InternalConsistencyFailure&) {
+    return kNotLoaded;  // a resource of the library could not be read
+  } catch (const std::bad_alloc&) {
+    return kOutOfMemory;
+  }
+}
+
+int save(const std::function<AccountsManagerPtr()>& loadAndChange, bool again) {
   // Both ways make the same calls up to the end of the first save, so that a fault hits the same
   // one.
   const std::ptrdiff_t before = countOfDescriptors();
+  AccountsManagerPtr store;
   if (beginToFail != nullptr) beginToFail();
-  const accountsettings::AccountsManagerPtr store = ASSAccountsManager::init();
-  const accountsettings::AccountPtr account = store->accountWithIdentifier("A");
-  if (account == nullptr) return kNotLoaded;
-  account->setDisplayName("changed");
-  logLines = 0;
-  store->saveAllAccounts();
-  int outcome = logLines == 0 ? 0 : kSaveFailed;
-  if (logLines > 1) outcome += kSavedLinesAreMany;
+  int outcome = tryToSave(store, loadAndChange, std::getenv("SAVER_BEFORE_SAVE"));
+  if (endOfFailing != nullptr) endOfFailing();
   if (!again) return outcome;
-  logLines = 0;
-  store->saveAllAccounts();
-  if (logLines > 0) outcome += kSecondSaveFailed;
+  if (tryToSave(store, loadAndChange, nullptr) != 0) outcome += kSecondSaveFailed;
   if (countOfDescriptors() != before) outcome += kDescriptorsLeaked;
   return outcome;
 }
 
 int saveMany(const std::string& identifier, long count) {
   for (long i = 0; i < count; ++i) {
-    const accountsettings::AccountsManagerPtr store = ASSAccountsManager::init();
+    const AccountsManagerPtr store = ASSAccountsManager::init();
     const accountsettings::AccountPtr account = store->accountWithIdentifier(identifier);
     if (account == nullptr) return kNotLoaded;
     account->setAccountPropertyForKey(propertylist::Value(i), "Count");
@@ -83,7 +121,7 @@ int saveMany(const std::string& identifier, long count) {
 int addMany(const std::string& identifier, long count) {
   for (long i = 0; i < count; ++i) {
     const platform::HeldFileLockPtr lock = ASSAccountsManager::createAndLockMigrationLock();
-    const accountsettings::AccountsManagerPtr store = ASSAccountsManager::init();
+    const AccountsManagerPtr store = ASSAccountsManager::init();
     store->insertAccount(accountsettings::ASSBasicAccount::initWithProperties(
         Dictionary{{"Identifier", identifier + "-" + std::to_string(i)},
                    {"Type", "CalDAV"},
@@ -94,16 +132,6 @@ int addMany(const std::string& identifier, long count) {
   return logLines == 0 ? 0 : kSaveFailed;
 }
 
-int readMany(long count) {
-  const std::string path = ASSAccountsManager::fullPathToAccountSettingsPlist();
-  for (long i = 0; i < count; ++i) {
-    const propertylist::FileReadResult read =
-        platform::services().fileServices.readPropertyListFile(path);
-    if (!read.value || read.value->asDictionary() == nullptr) return kTorn;
-  }
-  return 0;
-}
-
 int run(int count, char** arguments) {
   if (count < 3) return kWrongUsage;
   const std::string work = arguments[1];
@@ -111,12 +139,12 @@ int run(int count, char** arguments) {
   if (opened.image == nullptr) return kNotLoaded;
   deviceimage::ServiceOptions options;
   options.writesLog = false;
-  options.logSink = [](std::string_view) { ++logLines; };
+  options.logSink = noteLogLine;
   options.resourceDirectory = RESOURCES;
   const deviceimage::DeviceImageServices services(opened.image, options);
   platform::install(services.services());
-  if (work == "once" || work == "twice") return saveOnce(work == "twice");
-  if (work == "read" && count == 4) return readMany(std::atol(arguments[3]));
+  if (work == "once" || work == "twice") return save(loadAndRename, work == "twice");
+  if (work == "insert" || work == "insert-twice") return save(loadAndInsert, work != "insert");
   if (work == "until" && count == 4)
     return saveMany(arguments[3], std::numeric_limits<long>::max());
   if (count < 5) return kWrongUsage;
@@ -127,12 +155,4 @@ int run(int count, char** arguments) {
 
 }  // namespace
 
-int main(int count, char** arguments) {
-  try {
-    return run(count, arguments);
-  } catch (const platform::InternalConsistencyFailure&) {
-    return kNotLoaded;  // a resource of the library could not be read
-  } catch (const std::bad_alloc&) {
-    return kOutOfMemory;
-  }
-}
+int main(int count, char** arguments) { return run(count, arguments); }

@@ -83,9 +83,6 @@ class Copy:
 
 
 def bad_cases(row, make, found, directory):
-    if row in save_rows.ROWS:
-        cases, judge = make(save_rows.Images(found, directory))
-        return matrix.judge_all(cases, judge)
     return make(found, directory, False)[1]
 
 

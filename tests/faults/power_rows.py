@@ -6,8 +6,8 @@ import subprocess
 
 import matrix
 import migration_rows
-import save_rows
 from settings_image import SettingsImage
+from starting_points import Images
 
 CUT = pathlib.Path(__file__).resolve().parent / "power_cut.sh"
 # The size, what makes it, and how it is mounted. The second has no notion of a file that replaces another.
@@ -76,7 +76,7 @@ def cut_saves(found, directory, is_full):
     once the save is done."""
     place = directory / "s4"
     place.mkdir()
-    images = save_rows.Images(found, place)
+    images = Images(found, place)
     calls = images.calls if is_full else images.calls[::7] + images.calls[-1:]
     first = images.images[0]
     bases = file_systems(FILE_SYSTEMS, place, first.root)
