@@ -106,6 +106,7 @@ install(
   FILES_MATCHING
   PATTERN "*.md"
   PATTERN "*.json"
+  PATTERN "*.svg"
   PATTERN "man" EXCLUDE)
 install(
   DIRECTORY examples/notifier examples/rename-account

@@ -8,6 +8,10 @@ BUILD_PACKAGES=(g++ cmake ninja-build pkg-config python3 binutils
 CHECK_PACKAGES=(git clang-14 clang-tidy-14 clang-format-14 libclang-rt-14-dev shellcheck mandoc
   strace e2fsprogs xfsprogs btrfs-progs)
 
+# For bench/run alone: the measuring, and what we are measured against.
+# shellcheck disable=SC2034
+BENCH_PACKAGES=(libbenchmark-dev rapidjson-dev libsimdjson-dev libpugixml-dev libexpat1-dev)
+
 # need_packages PACKAGE... installs what is missing when we are root, and otherwise says what to install.
 need_packages() {
   local missing=() package
