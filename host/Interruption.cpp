@@ -24,6 +24,7 @@ Interruption::Interruption() {
 
 Interruption::~Interruption() {
   if (!_signals.isOpen()) return;
+  requested();  // takes those that came meanwhile, which would end the process now
   const sigset_t signals = stoppingSignals();
   sigprocmask(SIG_UNBLOCK, &signals, nullptr);
 }

@@ -10,6 +10,7 @@ namespace host {
 class Interruption {
  public:
   Interruption();
+  // Signals that came after the last look are dropped.
   ~Interruption();
   Interruption(const Interruption&) = delete;
   Interruption& operator=(const Interruption&) = delete;

@@ -1,7 +1,11 @@
 #include "host/LegacySettings.h"
 
+#include <fcntl.h>
+#include <sys/stat.h>
+
 #include <cstdint>
 
+#include "deviceimage/Descriptor.h"
 #include "host/BundleTrust.h"
 #include "host/Settings.h"
 
@@ -21,6 +25,16 @@ bool isThere(const DeviceImage& image, std::string_view file) {
   return image.lookAt(file).kind != FileLook::Kind::nothing;
 }
 
+// Whether there is something at the name, or where it leads as a link: what the account settings
+// library goes by.
+bool leadsSomewhere(const DeviceImage& image, std::string_view file) {
+  const DeviceImage::Parent parent = image.openParent(file);
+  if (!parent.status.isSuccess()) return false;
+  const deviceimage::Descriptor directory(parent.descriptor);
+  struct stat status = {};
+  return ::fstatat(directory.number(), parent.name.c_str(), &status, 0) == 0;
+}
+
 bool isOlder(const DeviceImage& image) {
   const auto version = image.readProperty(DeviceImage::kSettingsFile, "Version");
   return version && static_cast<std::uint64_t>(integerValue(&*version)) <
@@ -31,8 +45,8 @@ bool isOlder(const DeviceImage& image) {
 
 LegacyNeed legacyNeedOf(const DeviceImage& image) {
   LegacyNeed need;
-  need.mailAccounts = isThere(image, kMailAccounts);
-  need.dataAccess = isThere(image, kDataAccess);
+  need.mailAccounts = leadsSomewhere(image, kMailAccounts);
+  need.dataAccess = leadsSomewhere(image, kDataAccess);
   need.olderVersion = !need.mailAccounts && !need.dataAccess && isOlder(image);
   return need;
 }
