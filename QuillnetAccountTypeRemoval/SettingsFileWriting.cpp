@@ -42,14 +42,16 @@ class TemporaryFile {
     if (_isThere) _descriptor = opened.descriptor;
     return opened.status.code;
   }
-  // Fills the file, gives it to its owner and brings it to the disk, in this order. The descriptor
-  // is closed in every case.
+  // Fills the file, gives it to its owner and brings it to the disk, in this order. False also when
+  // somebody put something else in its place meanwhile, which a rename would make the settings. The
+  // descriptor is closed in every case.
   bool complete(const propertylist::Bytes& bytes, uid_t user, gid_t group) {
     const bool complete = _files.writeAll(_descriptor, bytes).isSuccess() &&
                           _files.setOwner(_descriptor, user, group).isSuccess() &&
                           _files.makePrivate(_descriptor).isSuccess() &&
                           _files.synchronizeFile(_descriptor).isSuccess();
-    return close() && complete;
+    const bool isNamed = complete && _files.checkName(_descriptor, _path).isSuccess();
+    return close() && isNamed;
   }
   bool moveTo(const std::string& target) {
     _isThere = !_files.renameFileToFile(_path, target).isSuccess();

@@ -99,6 +99,12 @@ platform::FileServices::Opened ImageFileServices::createPrivateFile(const std::s
   return opened;
 }
 
+Status ImageFileServices::checkName(int descriptor, const std::string& path) {
+  return _withReached(path, [&](const std::string& reached) {
+    return PosixFileServices::checkName(descriptor, reached);
+  });
+}
+
 Status ImageFileServices::renameFileToFile(const std::string& from, const std::string& to) {
   Status outcome = _withReached(from, [&](const std::string& reachedFrom) {
     return _withReached(to, [&](const std::string& reachedTo) {

@@ -26,6 +26,7 @@ class ImageFileServices final : public platform::PosixFileServices {
   propertylist::FileReadResult readPropertyListFile(const std::string& path) override;
   bool fileExists(const std::string& path) override;
   Opened createPrivateFile(const std::string& path) override;
+  platform::Status checkName(int descriptor, const std::string& path) override;
   platform::Status renameFileToFile(const std::string& from, const std::string& to) override;
   platform::Status synchronizeDirectoryOfFile(const std::string& path) override;
   platform::Status removeFile(const std::string& path) override;

@@ -37,6 +37,9 @@ class SettingsInMemory final : public platform::FileServices {
   platform::Status synchronizeFile(int /*descriptor*/) override {
     return platform::Status::success();
   }
+  platform::Status checkName(int /*descriptor*/, const std::string& /*path*/) override {
+    return platform::Status::success();
+  }
   platform::Status closeFile(int /*descriptor*/) override { return platform::Status::success(); }
   platform::Status renameFileToFile(const std::string& /*from*/,
                                     const std::string& /*to*/) override {

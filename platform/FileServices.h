@@ -42,6 +42,9 @@ class PLATFORM_EXPORT FileServices {
   // Waits until the file's content is on the disk. A failure is final: calling again proves
   // nothing.
   virtual Status synchronizeFile(int descriptor) = 0;
+  // Fails with ESTALE when `path` names no longer the open file, because somebody who may write in
+  // its directory put something else there. Links are not followed.
+  virtual Status checkName(int descriptor, const std::string& path) = 0;
   // Closes the descriptor, also when it reports a failure.
   virtual Status closeFile(int descriptor) = 0;
   // Moves `from` over `to` in one step.

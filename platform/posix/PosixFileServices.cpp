@@ -64,6 +64,16 @@ Status PosixFileServices::synchronizeFile(int descriptor) {
   return Status::success();
 }
 
+Status PosixFileServices::checkName(int descriptor, const std::string& path) {
+  struct stat open = {};
+  struct stat named = {};
+  if (::fstat(descriptor, &open) != 0) return systemFailure(errno, "look at an open file");
+  if (::lstat(path.c_str(), &named) != 0) return systemFailure(errno, "look at", path);
+  if (open.st_dev != named.st_dev || open.st_ino != named.st_ino)
+    return systemFailure(ESTALE, "find the open file at", path);
+  return Status::success();
+}
+
 Status PosixFileServices::closeFile(int descriptor) {
   if (::close(descriptor) != 0) return systemFailure(errno, "close");
   return Status::success();

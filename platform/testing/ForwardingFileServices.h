@@ -25,6 +25,9 @@ class ForwardingFileServices : public FileServices {
   }
   Status makePrivate(int descriptor) override { return _next.makePrivate(descriptor); }
   Status synchronizeFile(int descriptor) override { return _next.synchronizeFile(descriptor); }
+  Status checkName(int descriptor, const std::string& path) override {
+    return _next.checkName(descriptor, path);
+  }
   Status closeFile(int descriptor) override { return _next.closeFile(descriptor); }
   Status renameFileToFile(const std::string& from, const std::string& to) override {
     return _next.renameFileToFile(from, to);

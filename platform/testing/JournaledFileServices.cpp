@@ -48,6 +48,11 @@ Status JournaledFileServices::synchronizeFile(int descriptor) {
                    [&] { return PosixFileServices::synchronizeFile(descriptor); });
 }
 
+Status JournaledFileServices::checkName(int descriptor, const std::string& path) {
+  return _answered("checkName", {path},
+                   [&] { return PosixFileServices::checkName(descriptor, path); });
+}
+
 Status JournaledFileServices::closeFile(int descriptor) {
   const auto answer = _received("closeFile", {});
   Status closed = PosixFileServices::closeFile(descriptor);

@@ -21,6 +21,7 @@ class JournaledFileServices : public PosixFileServices, public FakeService {
   Status setOwner(int descriptor, uid_t user, gid_t group) override;
   Status makePrivate(int descriptor) override;
   Status synchronizeFile(int descriptor) override;
+  Status checkName(int descriptor, const std::string& path) override;
   Status closeFile(int descriptor) override;
   Status renameFileToFile(const std::string& from, const std::string& to) override;
   Status synchronizeDirectoryOfFile(const std::string& path) override;

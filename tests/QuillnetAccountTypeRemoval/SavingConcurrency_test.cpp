@@ -65,6 +65,9 @@ class LoadingBetweenCalls : public platform::JournaledFileServices {
   Status synchronizeFile(int descriptor) override {
     return _checked(JournaledFileServices::synchronizeFile(descriptor));
   }
+  Status checkName(int descriptor, const std::string& path) override {
+    return _checked(JournaledFileServices::checkName(descriptor, path));
+  }
   Status closeFile(int descriptor) override {
     return _checked(JournaledFileServices::closeFile(descriptor));
   }
@@ -95,7 +98,7 @@ TEST(SavingConcurrency, BetweenAnyTwoStepsOfASaveTheFileIsWhole) {
   for (const AccountPtr& account : *store->allBasicAccounts())
     account->setAccountPropertyForKey(2, "n");
   store->saveAllAccounts();
-  EXPECT_EQ(files.seen, (std::vector<Value>{1, 1, 1, 1, 1, 1, 2, 2}));
+  EXPECT_EQ(files.seen, (std::vector<Value>{1, 1, 1, 1, 1, 1, 1, 2, 2}));
   device.use<platform::FileServices>(device.fileServices);
 }
 

@@ -97,14 +97,35 @@ TEST_F(SavingFaults, WhicheverFileCallFailsTheFileIsTheOldOrTheNewOneWhole) {
   EXPECT_EQ(walked,
             (Lines{"readPropertyListFile: saved", "temporaryFileName: not saved",
                    "createPrivateFile: not saved", "writeAll: not saved", "setOwner: not saved",
-                   "makePrivate: not saved", "synchronizeFile: not saved", "closeFile: not saved",
-                   "renameFileToFile: not saved", "synchronizeDirectoryOfFile: saved"}));
+                   "makePrivate: not saved", "synchronizeFile: not saved", "checkName: not saved",
+                   "closeFile: not saved", "renameFileToFile: not saved",
+                   "synchronizeDirectoryOfFile: saved"}));
+}
+
+TEST_F(SavingFaults, FileOfAnotherInTheTemporaryFilesPlaceNeverBecomesTheSettings) {
+  namespace fs = std::filesystem;
+  const fs::path secret = fs::path(device.settingsPath()).replace_filename("secret");
+  fs::copy_file(device.settingsPath(), secret);
+  device.fileServices.decideBy([&](const std::string& call) -> std::optional<PlannedAnswer> {
+    if (call.starts_with("synchronizeFile")) {
+      const fs::path temporary = fs::temp_directory_path() / device.temporaryFiles().at(0);
+      fs::remove(temporary);
+      fs::create_symlink(secret, temporary);
+    }
+    return std::nullopt;
+  });
+  store->saveAllAccounts();
+  device.fileServices.decideBy(nullptr);
+  EXPECT_FALSE(fs::is_symlink(device.settingsPath()));
+  expectFailedSave();
+  store->saveAllAccounts();  // left alone
+  expectSaved();
 }
 
 TEST_F(SavingFaults, MemoryThatRunsOutInAFileCallFailsTheSaveAndLeavesNothing) {
   for (const char* call :
        {"readPropertyListFile", "temporaryFileName", "createPrivateFile", "writeAll", "setOwner",
-        "makePrivate", "synchronizeFile", "renameFileToFile"}) {
+        "makePrivate", "synchronizeFile", "checkName", "renameFileToFile"}) {
     SCOPED_TRACE(call);
     loadAndChange();
     const std::ptrdiff_t descriptors = countOfOpenDescriptors();

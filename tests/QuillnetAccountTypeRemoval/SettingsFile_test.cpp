@@ -91,12 +91,13 @@ TEST_F(SettingsFile, IsReplacedInExactlyTheseSteps) {
   device.userDatabase.alsoNoteCallsIn(&journal);
   store->saveAllAccounts();
   for (std::string& call : journal) call = neutral(call, device);
-  EXPECT_EQ(journal, (CallJournal{"readPropertyListFile(SETTINGS)", "userIdentifierForName(mobile)",
-                                  "groupIdentifierForName(mobile)", "temporaryFileName()",
-                                  "createPrivateFile(TEMPORARY)", "writeAll(all bytes)",
-                                  "setOwner(501, 502)", "makePrivate()", "synchronizeFile()",
-                                  "closeFile()", "renameFileToFile(TEMPORARY, SETTINGS)",
-                                  "synchronizeDirectoryOfFile(SETTINGS)"}));
+  EXPECT_EQ(journal,
+            (CallJournal{
+                "readPropertyListFile(SETTINGS)", "userIdentifierForName(mobile)",
+                "groupIdentifierForName(mobile)", "temporaryFileName()",
+                "createPrivateFile(TEMPORARY)", "writeAll(all bytes)", "setOwner(501, 502)",
+                "makePrivate()", "synchronizeFile()", "checkName(TEMPORARY)", "closeFile()",
+                "renameFileToFile(TEMPORARY, SETTINGS)", "synchronizeDirectoryOfFile(SETTINGS)"}));
   EXPECT_EQ(identifiersOf(device.savedAccounts()), (Lines{"1"}));
   EXPECT_TRUE(device.journal.empty());
   device.fileServices.alsoNoteCallsIn(nullptr);

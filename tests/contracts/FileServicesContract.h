@@ -122,9 +122,24 @@ TEST_P(FileServicesContract, FailsWithTheReasonOnADescriptorThatIsNotOpen) {
   EXPECT_EQ(service().setOwner(-1, 0, 0).code, EBADF);
   EXPECT_EQ(service().makePrivate(-1).code, EBADF);
   EXPECT_EQ(service().synchronizeFile(-1).code, EBADF);
+  EXPECT_EQ(service().checkName(-1, path("file")).code, EBADF);
   const platform::Status closed = service().closeFile(-1);
   EXPECT_EQ(closed.code, EBADF);
   EXPECT_TRUE(closed.error.has_value());
+}
+
+TEST_P(FileServicesContract, NoticesWhenANameIsNoLongerThatOfTheOpenFile) {
+  const auto created = service().createPrivateFile(path("file"));
+  ASSERT_TRUE(created.status.isSuccess());
+  EXPECT_TRUE(service().checkName(created.descriptor, path("file")).isSuccess());
+  std::filesystem::rename(path("file"), path("moved"));
+  EXPECT_EQ(service().checkName(created.descriptor, path("file")).code, ENOENT);
+  write(path("file"), "");
+  EXPECT_EQ(service().checkName(created.descriptor, path("file")).code, ESTALE);
+  std::filesystem::remove(path("file"));
+  std::filesystem::create_symlink(path("moved"), path("file"));
+  EXPECT_EQ(service().checkName(created.descriptor, path("file")).code, ESTALE);
+  EXPECT_TRUE(service().closeFile(created.descriptor).isSuccess());
 }
 
 TEST_P(FileServicesContract, PutsOneFileInThePlaceOfAnother) {
