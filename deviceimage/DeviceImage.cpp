@@ -191,7 +191,8 @@ FileLook DeviceImage::lookAt(std::string_view relative) const {
   if (::fstatat(directory.number(), parent.name.c_str(), &status, AT_SYMLINK_NOFOLLOW) != 0)
     return {errno == ENOENT ? Kind::nothing : Kind::other, 0};
   if (S_ISREG(status.st_mode)) return {Kind::file, status.st_size};
-  return {S_ISDIR(status.st_mode) ? Kind::directory : Kind::other, 0};
+  if (!S_ISDIR(status.st_mode)) return {Kind::other, 0};
+  return {Kind::directory, 0, (status.st_mode & (S_IWOTH | S_ISVTX)) == S_IWOTH};
 }
 
 bool DeviceImage::exists(std::string_view relative) const {

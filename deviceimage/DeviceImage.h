@@ -47,6 +47,9 @@ struct FileLook {
   enum class Kind { nothing, file, directory, other };  // a link is "other", also on the way there
   Kind kind = Kind::nothing;
   std::int64_t size = 0;  // bytes, of a file
+  // Whether everybody may put other things in the place of a directory's files: a mode that lets
+  // others write, without the sticky bit.
+  bool isOpenToOthers = false;
 };
 
 // Something about an image's files that stands in the way, and what to do about it.

@@ -83,6 +83,10 @@ void checkTemporaryDirectory(const DeviceImage& image, Reasons& reasons) {
                       "; make it, with mode 0700.");
     return;
   }
+  if (image.lookAt(DeviceImage::kTemporaryDirectory).isOpenToOthers)
+    reasons.push_back("Everybody may replace the files in " + path +
+                      ", the new settings too; take that right from others (chmod o-w), or make "
+                      "the directory sticky (chmod +t).");
   const Place preferences = placeOf(image.preferencesDirectory());
   if (preferences.isDirectory && !areOnOneMount(temporary, preferences))
     reasons.push_back(path + " is not on the file system of " + image.settingsFile() +

@@ -49,6 +49,12 @@ class ImageChecks(hosttest.HostTestCase):
         (self.image / "tmp").rmdir()
         self.check_refusal(f"{self.image}/tmp", "is no directory", "make it")
 
+    def test_a_temporary_directory_in_which_everybody_may_replace_files(self):
+        (self.image / "tmp").chmod(0o777)
+        self.check_refusal("Everybody may replace the files", f"{self.image}/tmp", "chmod o-w")
+        (self.image / "tmp").chmod(0o1777)
+        self.assertEqual(0, self.run_host("--quiet").code)
+
     def test_a_temporary_directory_that_is_a_file(self):
         (self.image / "tmp").rmdir()
         (self.image / "tmp").write_text("")

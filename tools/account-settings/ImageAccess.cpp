@@ -37,10 +37,17 @@ std::unique_ptr<ImageLock> takeLock(const DeviceImage& image, double wait) {
 }
 
 void useTemporaryDirectory(const DeviceImage& image) {
-  if (image.lookAt(DeviceImage::kTemporaryDirectory).kind != deviceimage::FileLook::Kind::directory)
+  const deviceimage::FileLook look = image.lookAt(DeviceImage::kTemporaryDirectory);
+  if (look.kind != deviceimage::FileLook::Kind::directory)
     throw CommandFailure(ExitCode::refused,
                          fmt::format("{} is no directory; nothing was changed; make it",
                                      image.temporaryDirectory()));
+  if (look.isOpenToOthers)
+    throw CommandFailure(
+        ExitCode::refused,
+        fmt::format("everybody may replace the files in {}, the new settings too; nothing was "
+                    "changed; take that right from others (chmod o-w)",
+                    image.temporaryDirectory()));
   ::setenv("TMPDIR", image.temporaryDirectory().c_str(), 1);
 }
 

@@ -228,6 +228,10 @@ class Refusing(LegacyTest):
         self.assert_says_as_json(7, "is no directory")
         self.assert_refused(self.image / "tmp", "is no directory")
 
+    def test_a_temporary_directory_in_which_everybody_may_replace_files_changes_nothing(self):
+        (self.image / "tmp").chmod(0o777)
+        self.assert_refused(self.image / "tmp", "everybody may replace the files")
+
 
 class Failing(LegacyTest):
     """A migrator that fails leaves the settings as they were, whatever it did."""
