@@ -1,6 +1,7 @@
 // A library for LD_PRELOAD that does what others who may write somewhere do at the worst moment.
 //   MEDDLER_NAMES=A:B   the names that tempnam proposes, in turn; after the last one, its own
 //   MEDDLER_LINK=PATH   the name of a file that is about to be given away becomes a link to PATH
+//   MEDDLER_LATER=PATH  the same when its bytes are about to be brought to the disk
 //   MEDDLER_GROW=PATH   the file grows by a MiB before each read of it, without end
 //   MEDDLER_SWAP=A:B    A and B change places before each opening, so that no look at a path holds
 #include <dlfcn.h>
@@ -42,12 +43,29 @@ EXPORTED char* tempnam(const char* directory, const char* prefix) {
   return name;
 }
 
+namespace {
+
+void replaceByLink(int descriptor, const char* target) {
+  if (target == nullptr) return;
+  const std::string name = nameOf(descriptor);
+  if (unlink(name.c_str()) != 0 || symlink(target, name.c_str()) != 0) std::abort();
+}
+
+bool isRegular(int descriptor) {
+  struct stat status = {};
+  return fstat(descriptor, &status) == 0 && S_ISREG(status.st_mode);
+}
+
+}  // namespace
+
 EXPORTED int fchown(int descriptor, uid_t user, gid_t group) noexcept {
-  if (const char* target = std::getenv("MEDDLER_LINK")) {
-    const std::string name = nameOf(descriptor);
-    if (unlink(name.c_str()) != 0 || symlink(target, name.c_str()) != 0) std::abort();
-  }
+  replaceByLink(descriptor, std::getenv("MEDDLER_LINK"));
   return original<decltype(fchown)>("fchown")(descriptor, user, group);
+}
+
+EXPORTED int fsync(int descriptor) {
+  if (isRegular(descriptor)) replaceByLink(descriptor, std::getenv("MEDDLER_LATER"));
+  return original<decltype(fsync)>("fsync")(descriptor);
 }
 
 EXPORTED ssize_t read(int descriptor, void* buffer, std::size_t size) {
@@ -77,20 +95,27 @@ mode_t modeAmong(int flags, __builtin_va_list& arguments) {
 
 }  // namespace
 
-EXPORTED int openat(int directory, const char* path, int flags, ...) {
-  __builtin_va_list arguments;
-  __builtin_va_start(arguments, flags);
-  const mode_t mode = modeAmong(flags, arguments);
-  __builtin_va_end(arguments);
-  swapPlaces();
-  return original<int(int, const char*, int, ...)>("openat")(directory, path, flags, mode);
-}
+// SQLite takes those whose names end in 64.
+#define EXPORTED_OPENAT(name)                                                              \
+  EXPORTED int name(int directory, const char* path, int flags, ...) {                     \
+    __builtin_va_list arguments;                                                           \
+    __builtin_va_start(arguments, flags);                                                  \
+    const mode_t mode = modeAmong(flags, arguments);                                       \
+    __builtin_va_end(arguments);                                                           \
+    swapPlaces();                                                                          \
+    return original<int(int, const char*, int, ...)>(#name)(directory, path, flags, mode); \
+  }
+#define EXPORTED_OPEN(name)                                                \
+  EXPORTED int name(const char* path, int flags, ...) {                    \
+    __builtin_va_list arguments;                                           \
+    __builtin_va_start(arguments, flags);                                  \
+    const mode_t mode = modeAmong(flags, arguments);                       \
+    __builtin_va_end(arguments);                                           \
+    swapPlaces();                                                          \
+    return original<int(const char*, int, ...)>(#name)(path, flags, mode); \
+  }
 
-EXPORTED int open(const char* path, int flags, ...) {
-  __builtin_va_list arguments;
-  __builtin_va_start(arguments, flags);
-  const mode_t mode = modeAmong(flags, arguments);
-  __builtin_va_end(arguments);
-  swapPlaces();
-  return original<int(const char*, int, ...)>("open")(path, flags, mode);
-}
+EXPORTED_OPENAT(openat)
+EXPORTED_OPENAT(openat64)
+EXPORTED_OPEN(open)
+EXPORTED_OPEN(open64)

@@ -1,36 +1,39 @@
 """Programs that are wrong on purpose: row Q3 of docs/reliability.md. Each control changes a copy of the sources,
-builds what its row needs and expects the row to have bad cases; a row that stays green proves nothing."""
+builds what its row needs and expects the row to have bad cases of the kind that the change brings about; a row
+that stays green proves nothing. First the same copy has to pass unchanged."""
 
 import collections
 import os
 import pathlib
+import re
 import shutil
 import subprocess
-
-import matrix
-import save_rows
+import time
 
 TOP = pathlib.Path(__file__).resolve().parents[2]
 HOST = ["device-image", "migration-host", "QuillnetAccountRemoval", "bundle_resources"]
 
-# `changes` are (file, what stands there, what stands there instead), each for every place in the file.
-Control = collections.namedtuple("Control", "name row targets changes")
+# `changes` are (file, what stands there, what stands there instead), each for every place in the file; `sign` is
+# what the row says of the cases that the change makes bad.
+Control = collections.namedtuple("Control", "name row sign targets changes")
 CONTROLS = [
-    Control("a writer that writes in place", "S3", ["fault_saver", "device-image"], [
+    Control("a writer that writes in place", "S3", "neither the old nor the new one|is gone",
+            ["fault_saver", "device-image"], [
         ("platform/posix/PosixFileServices.cpp", "if (std::rename(from.c_str(), to.c_str()) != 0)",
          "if (!(std::ofstream(to, std::ofstream::trunc) << std::ifstream(from).rdbuf()) ||"
          " std::remove(from.c_str()) != 0)"),
         ("platform/posix/PosixFileServices.cpp", "#include <cstdio>", "#include <cstdio>\n#include <fstream>")]),
-    Control("a merge that prefers the disk", "R4", ["fault_merges"], [
+    Control("a merge that prefers the disk", "R4", "over", ["fault_merges"], [
         ("QuillnetAccountTypeRemoval/ASSAccountsManagerSaving.cpp",
          "changedInMemory ? Dictionary::Entry(disk.key(), *now) : disk", "changedInMemory ? disk : disk")]),
-    Control("a merge that does not know what it has merged", "M1", HOST, [
+    Control("a merge that does not know what it has merged", "M1", "doubled", HOST, [
         ("deviceimage/RecordPlacer.cpp", "if (_isThere(candidate)) {", "if (false && _isThere(candidate)) {"),
         ("deviceimage/Schema.h", "  UNIQUE (store, kind, base_uid, content_hash),\n", "")]),
-    Control("a reader without a limit of depth", "R1", ["fault_lists"], [
+    Control("a reader without a limit of depth", "R1", "depth.*Segmentation fault", ["fault_lists"], [
         ("propertylist/BinaryReader.cpp", "> kMaximumDepth", "> std::size_t{1} << 40U"),
         ("propertylist/BinaryReader.cpp", ">= kMaximumDepth", ">= std::size_t{1} << 40U")]),
-    Control("a writer without fsync", "S4", ["fault_saver", "device-image"], [
+    Control("a writer without fsync", "S4", "neither the old nor the new one|is lost|is gone",
+            ["fault_saver", "device-image"], [
         ("QuillnetAccountTypeRemoval/SettingsFileWriting.cpp",
          "_files.makePrivate(_descriptor).isSuccess() &&\n"
          "                          _files.synchronizeFile(_descriptor).isSuccess();",
@@ -82,29 +85,41 @@ class Copy:
             shutil.copy(TOP / name, self.top / name)
 
 
-def bad_cases(row, make, found, directory):
-    return make(found, directory, False)[1]
+def run_row(control, make, found, place):
+    """All bad cases, and those that show the sign of the control. The row prints what it has to say."""
+    place.mkdir()
+    _, bad = make(found, place, False)
+    shutil.rmtree(place)
+    return bad, [text for _, text in bad if re.search(control.sign, text)]
 
 
 def try_controls(rows, directory):
+    """A case for each control unchanged, and one for it changed."""
     (directory / "copy").mkdir()
     copy = Copy(directory / "copy")
-    green, count = [], 0
-    for number, control in enumerate(CONTROLS):
+    wrong, count = [], 0
+    unchanged = copy.build(sorted({target for control in CONTROLS for target in control.targets}))
+    for control in CONTROLS:
         if control.row not in rows:
             print(f"     Q3 {control.name}: skipped, this needs row {control.row}", flush=True)
             continue
+        begin = time.monotonic()
         count += 1
-        copy.change(control.changes)
-        place = directory / f"control{number}"
-        place.mkdir()
         _, make = rows[control.row]
-        bad = bad_cases(control.row, make, copy.build(control.targets), place)
+        bad, _ = run_row(control, make, unchanged, directory / "unchanged")
+        if bad:
+            wrong.append((control.name, f"row {control.row} is red without any change: {bad[0]}"))
+            continue
+        copy.change(control.changes)
+        bad, signs = run_row(control, make, copy.build(control.targets), directory / "changed")
         copy.restore(control.changes)
-        print(f"     Q3 {control.name}: row {control.row} has {len(bad)} bad cases", flush=True)
-        if not bad:
-            green.append((control.name, f"row {control.row} stays green"))
-    return count, green
+        copy.build(control.targets)
+        print(f"     Q3 {control.name}: row {control.row} has {len(bad)} bad cases, such as {bad[:1]};"
+              f" {time.monotonic() - begin:.0f} s", flush=True)
+        if not signs:
+            wrong.append((control.name, f"row {control.row} does not notice"))
+    shutil.rmtree(directory / "copy")
+    return count, wrong
 
 
 def rows_about(rows):

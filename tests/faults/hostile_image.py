@@ -26,7 +26,8 @@ def as_other():
 
 class HostileImage:
     """An image with the accounts "A" and "Q1", of which Q1 is to be retired, and a folder outside of it
-    with a secret. Whoever comes to the machine can walk to both."""
+    with a secret. Whoever comes to the machine can walk to both. `old` and `expected` are the settings before and
+    after a save that nobody disturbs."""
 
     def __init__(self, found, directory):
         self.found = found
@@ -37,6 +38,11 @@ class HostileImage:
         self._base = self.directory / "base"
         self.directory.mkdir()
         self._make()
+        self.reset()
+        self.old = self.settings.read_bytes()
+        if self.save() != 0:
+            raise SystemExit("a save fails that nobody disturbs")
+        self.expected = self.settings.read_bytes()
         self.reset()
 
     def _make(self):
@@ -68,6 +74,13 @@ class HostileImage:
     @property
     def settings(self):
         return self.root / PREFERENCES / NAME
+
+    def wrong_settings(self, content):
+        """What is wrong with the settings file, which is to have this content."""
+        status = self.settings.lstat()
+        if not stat.S_ISREG(status.st_mode) or stat.S_IMODE(status.st_mode) != 0o600 or status.st_uid != 501:
+            return f"the settings file is of mode {status.st_mode:o} and user {status.st_uid}"
+        return "" if self.settings.read_bytes() == content else "the settings file has other content"
 
     def open_to_others(self):
         """Makes every directory passable, and tmp sticky and writable for all, as on many a machine."""

@@ -3,13 +3,18 @@
 import fcntl
 import os
 import pathlib
+import plistlib
 import re
 import shutil
+import signal
 import subprocess
 
-from hostile_image import OTHER_USER, as_other
+from hostile_image import OTHER_USER, SECRET, as_other
+from planted_files import DOCUMENTED, PLANTS, REFUSED, look, plant, wrong_accounts
 
 HELD = 11
+# A property list of an older version, in the binary form: the integer that is 12.
+OLDER = (b"\x10\x0c", b"\x10\x0b")
 PYTHON = "/usr/bin/python3"  # one that other users can run
 # Tries to read and to write every file of the image that it can get at, until it is told to stop.
 INTRUDER = r"""
@@ -71,16 +76,23 @@ def modes_when_made(image):
     """No call makes a file or directory that others could use, even before its mode is changed."""
     (image.directory / "note.txt").write_text("Subject: x\n\ny\n")
     trace = image.directory / "trace"
+    made_some = 0
     for command in change_everything(image):
-        done = image.run(["strace", "-f", "-qq", "-o", trace, "-e", "trace=openat,open,mkdir,mkdirat,mknod,creat",
+        # With a file for each process no call is told of in two halves.
+        shutil.rmtree(trace, ignore_errors=True)
+        trace.mkdir()
+        done = image.run(["strace", "-ff", "-qq", "-o", trace / "of", "-e", "trace=openat,open,mkdir,mkdirat,mknod,creat",
                           "--", *command], umask=0)
         if done.returncode not in (0, 3):
             return f"{command[:2]} ended with {done.returncode}"
-        for line in trace.read_text(errors="replace").splitlines():
+        for line in [line for path in trace.iterdir() for line in path.read_text(errors="replace").splitlines()]:
             made = MAKING_CALL.search(line)
-            if made and made[3] and int(made[3], 8) & 0o077 and ("O_CREAT" in line or "mk" in made[1]):
+            if made is None or not ("O_CREAT" in line or "mk" in made[1]):
+                continue
+            made_some += 1
+            if made[3] is None or int(made[3], 8) & 0o077:
                 return f"{os.path.basename(command[0])} {command[1]}: {line}"
-    return ""
+    return "" if made_some > 10 else f"only {made_some} files were made"
 
 
 def nothing_is_public(image):
@@ -187,23 +199,94 @@ def lock_that_others_may_not_take(name):
     return case
 
 
+LOCKS = {"the image's lock": "var/run/image.lock", "the migration lock": "tmp/AccountMigrationInProgress"}
+
+
+def held_for_ever(image, path):
+    """Another user's process that has made the lock file and holds it."""
+    path.unlink(missing_ok=True)
+    path.parent.chmod(0o1777)
+    holder = subprocess.Popen(["flock", str(path), "sh", "-c", "echo held; exec sleep 1000"], start_new_session=True,
+                              stdout=subprocess.PIPE, **as_other())
+    if holder.stdout.readline() != b"held\n":
+        raise RuntimeError("the lock could not be planted")
+    return holder
+
+
+def end(holder):
+    os.killpg(holder.pid, signal.SIGKILL)
+    holder.wait()
+    holder.stdout.close()
+
+
 def lock_planted_by_another(name):
-    """Another user made the lock file first, a link, or holds it: a migration does not wait for it."""
+    """Another user made the lock file first, and holds it: a run does not wait for it."""
     def case(image):
         image.open_to_others()
-        path = image.root / name
+        holder = held_for_ever(image, image.root / LOCKS[name])
+        try:
+            code = image.host().returncode
+        finally:
+            end(holder)
+        if code not in ((0,) if "migration" in name else (HELD, REFUSED)):
+            return f"the host ended with {code}"
+        return image.wrong_settings(image.old) if code else wrong_accounts(image.settings)
+    return case
+
+
+def legacy_lock_held_for_ever(image):
+    """A run with a legacy step needs the migration lock: it gives up in time, has changed nothing, holds nothing,
+    and works when the lock is free."""
+    install_migrator(image)
+    image.settings.write_bytes(image.old.replace(*OLDER))
+    image.open_to_others()
+    before = image.settings.read_bytes()
+    holder = held_for_ever(image, image.root / LOCKS["the migration lock"])
+    try:
+        done = image.host("--legacy", "--timeout", 2)
+        if done.returncode != HELD:
+            return f"the host ended with {done.returncode}: {done.stdout[-200:]} {done.stderr[-200:]}"
+        if wrong := image.wrong_settings(before):
+            return wrong
+    finally:
+        end(holder)
+    (image.root / LOCKS["the migration lock"]).unlink()
+    done = image.host("--legacy", "--timeout", 60)
+    if done.returncode != 0:
+        return f"the next run ended with {done.returncode}: {done.stdout[-200:]} {done.stderr[-200:]}"
+    return "the settings are not of the newer version" if plistlib.loads(image.settings.read_bytes())["Version"] != 12 else ""
+
+
+def install_migrator(image):
+    """The bundle for legacy settings, as an image has it that is made with its services."""
+    whole = image.directory / "whole"
+    try:
+        subprocess.run([image.found["device-image"], "create", str(whole)], check=True, stdout=subprocess.DEVNULL)
+        place = image.root / "System/Library/DataClassMigrators"
+        place.mkdir(exist_ok=True, parents=True)
+        for bundle in (whole / "System/Library/DataClassMigrators").glob("AccountMigrator.migrator"):
+            shutil.copytree(bundle, place / bundle.name)
+    finally:
+        shutil.rmtree(whole, ignore_errors=True)
+
+
+def something_in_the_place_of(name, kind):
+    """Another user put something else where a lock is looked for: nobody waits, opens it or follows it."""
+    def case(image):
+        image.open_to_others()
+        path = image.root / LOCKS[name]
         path.unlink(missing_ok=True)
         path.parent.chmod(0o1777)
-        holder = subprocess.Popen(["flock", str(path), "sleep", "1000"], start_new_session=True, **as_other())
-        try:
-            while not path.exists():
-                if holder.poll() is not None:
-                    return "the lock could not be planted"
-            code = image.host().returncode
-            return "" if code in (0, HELD) else f"the host ended with {code}"
-        finally:
-            os.killpg(holder.pid, 9)
-            holder.wait()
+        plant(image, path, kind)
+        before = look(path)
+        for command in [*image.commands(), [image.found["fault_saver"], "add", image.root, "L", 1],
+                        [image.found["migration-host"], "run", "--image", image.root, "--legacy", "--timeout", 5]]:
+            done = image.run(command)
+            if done.returncode not in DOCUMENTED or SECRET in done.stdout + done.stderr:
+                return f"{os.path.basename(command[0])} {command[1]} ended with {done.returncode}"
+        if look(path) != before or (image.outside / "nothing").exists():
+            return "what was planted has changed"
+        return wrong_accounts(image.settings)
     return case
 
 
@@ -218,6 +301,8 @@ CASES = {
     "another user holds the image's lock": held_by_another,
     "another user takes the image's lock": lock_that_others_may_not_take("var/run/image.lock"),
     "another user takes the migration lock": lock_that_others_may_not_take("tmp/AccountMigrationInProgress"),
-    "another user has made the image's lock": lock_planted_by_another("var/run/image.lock"),
-    "another user has made the migration lock": lock_planted_by_another("tmp/AccountMigrationInProgress"),
+    **{f"another user has made {name} and holds it": lock_planted_by_another(name) for name in LOCKS},
+    **{f"in the place of {name}: {kind}": something_in_the_place_of(name, kind)
+       for name in LOCKS for kind in PLANTS if kind != "a file of theirs"},
+    "another user holds the migration lock of a legacy step": legacy_lock_held_for_ever,
 }

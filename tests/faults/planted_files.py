@@ -1,14 +1,19 @@
 """Security cases about files: what others plant at names that are used, and links out of the image."""
 
 import os
+import plistlib
 import socket
 import stat
 import subprocess
 
 from hostile_image import MARK, OTHER_USER, SECRET, as_other
-from settings_image import PREFERENCES
+from settings_image import PREFERENCES, account
 
 SAVE_FAILED, NOT_LOADED = 1, 16
+REFUSED = 7
+# What programs may end with: success, every failure that their manual pages name, and what a saver says.
+DOCUMENTED = {*range(12), NOT_LOADED}
+PROGRAMS = ["save", "migrate", "check", "show", "add an account", "import", "list accounts", "set a property"]
 PLANTS = {
     "a link to a secret": lambda image, path: path.symlink_to(image.secret),
     "a link to nothing": lambda image, path: path.symlink_to(image.outside / "nothing"),
@@ -45,7 +50,7 @@ def planted_temporary_name(kind):
             return "what was planted has changed"
         if second.exists() or (image.outside / "nothing").exists():
             return "a file is left"
-        return "" if b"changed" in image.settings.read_bytes() else "nothing was saved"
+        return image.wrong_settings(image.expected)
     return case
 
 
@@ -54,11 +59,12 @@ def all_names_taken(image):
     names = [image.root / f"tmp/fileAAAAA{number}" for number in range(8)]
     for name in names:
         plant(image, name, "a file of theirs")
-    before = image.settings.read_bytes()
     code = image.save(**image.meddled(names=":".join(map(str, names))))
-    if code != SAVE_FAILED or image.settings.read_bytes() != before:
+    if code != SAVE_FAILED:
         return f"the save ended with {code}"
-    return "" if all(name.stat().st_size == 0 for name in names) else "a planted file was written"
+    if any(name.stat().st_size != 0 for name in names):
+        return "a planted file was written"
+    return image.wrong_settings(image.old)
 
 
 def swapped_before_the_change_of_owner(image):
@@ -72,7 +78,9 @@ def swap_by_another_user(image):
     begun = image.root / "tmp/fileAAAAAA"
     begun.write_bytes(b"begun")
     done = subprocess.run(["mv", "-f", str(begun), str(begun) + "x"], check=False, capture_output=True, **as_other())
-    return "another user can move a temporary file" if done.returncode == 0 else ""
+    if done.returncode == 0 or begun.read_bytes() != b"begun":
+        return "another user can move a temporary file"
+    return f"the save ended with {code}" if (code := image.save()) else image.wrong_settings(image.expected)
 
 
 def settings_are(make, outcome=NOT_LOADED):
@@ -106,43 +114,83 @@ def settings_of_many_gigabytes(image):
     os.truncate(image.settings, 10 << 30)
 
 
+def contents(directory):
+    return {path: (look(path), path.read_bytes() if path.is_file() else b"")
+            for path in [directory, *directory.rglob("*")]}
+
+
+def wrong_accounts(path):
+    """Whether the settings are not whole; other programs than the savers change them too."""
+    try:
+        identifiers = [entry["Identifier"] for entry in plistlib.loads(path.read_bytes())["Accounts"]]
+    except Exception as error:  # whatever the independent reader does not like
+        return f"the settings cannot be read: {error!r}"
+    return "" if "A" in identifiers else f"the accounts are {identifiers}"
+
+
 def linked_directory(name):
-    """A directory of the image is a link out of it: programs say so, and nothing there is read or changed."""
+    """A directory of the image is a link out of it: programs say so, and nothing there is read or changed. A save
+    comes about when it needs nothing from there."""
     def case(image):
+        holds_settings = image.settings.is_relative_to(image.root / name)
         moved = image.put_outside(name)
-        before = {path: (look(path), path.read_bytes() if path.is_file() else b"")
-                  for path in [moved, *moved.rglob("*")]}
+        before = contents(moved)
         for command in image.commands():
             done = image.run(command)
             what = f"{os.path.basename(command[0])} {command[1]}"
-            if done.returncode < 0 or done.returncode >= 128:
+            if done.returncode not in DOCUMENTED:
                 return f"{what} ended with {done.returncode}"
             if MARK.encode() in done.stdout + done.stderr:
                 return f"{what} has read what is outside"
-            now = {path: (look(path), path.read_bytes() if path.is_file() else b"")
-                   for path in [moved, *moved.rglob("*")]}
-            if now != before:
-                changed = sorted(str(path) for path in now.keys() | before.keys() if now.get(path) != before.get(path))
-                return f"{what} has changed {changed}"
+            if contents(moved) != before:
+                changed = dict(contents(moved).items() ^ before.items())
+                return f"{what} has changed {sorted(map(str, changed))}"
+            if command[:2] == image.commands()[0][:2]:
+                wanted = NOT_LOADED if holds_settings else SAVE_FAILED if name in ("tmp", "etc") else 0
+                if done.returncode != wanted:
+                    return f"the save ended with {done.returncode} instead of {wanted}"
+                if wrong := not holds_settings and image.wrong_settings(image.old if wanted else image.expected):
+                    return wrong
+        return "" if holds_settings else wrong_accounts(image.settings)
+    return case
+
+
+def swapped_directory(name, number):
+    """Between any two calls of a program the directory turns into a link out of the image, and back."""
+    def case(image):
+        directory, link = image.root / name, image.root / "link"
+        outside = image.outside / "there"
+        subprocess.run(["cp", "-a", str(directory), str(outside)], check=True)
+        for path in outside.rglob(image.settings.name):
+            image.write_settings(path, [account("A", DisplayName=MARK)])
+        before = contents(outside)
+        command = image.commands()[number]
+        for turn in range(6):
+            link.symlink_to(outside)
+            if turn % 2:
+                exchange(directory, link)
+            done = image.run(command, environment=image.environment(**image.meddled(swap=f"{directory}:{link}")))
+            if directory.is_symlink():
+                exchange(directory, link)
+            link.unlink()
+            if done.returncode not in DOCUMENTED:
+                return f"turn {turn} ended with {done.returncode}: {done.stderr[-200:]}"
+            if MARK.encode() in done.stdout + done.stderr:
+                return f"turn {turn} has read what is outside"
+            if contents(outside) != before:
+                return f"turn {turn} has changed what is outside"
+            if wrong := wrong_accounts(image.settings):
+                return f"turn {turn}: {wrong}"
         return ""
     return case
 
 
-def directory_swapped_while_it_is_used(image):
-    """Between any two calls the directory of the settings turns into a link out of the image, and back."""
-    outside = image.outside / "Preferences"
-    outside.mkdir()
-    image.write_settings(outside / image.settings.name, [])
-    there = (outside / image.settings.name).read_bytes()
-    link = image.root / "var/mobile/Library/link"
-    link.symlink_to(outside)
-    for turn in range(20):
-        code = image.save(**image.meddled(swap=f"{image.root / PREFERENCES}:{link}"))
-        if code < 0 or code >= 128:
-            return f"turn {turn} ended with {code}"
-        if (outside / image.settings.name).read_bytes() != there or len(list(outside.iterdir())) != 1:
-            return f"turn {turn} has changed what is outside"
-    return ""
+def exchange(a, b):
+    """Both names change places."""
+    spare = a.with_name(a.name + ".exchanged")
+    a.rename(spare)
+    b.rename(a)
+    spare.rename(b)
 
 
 def linked_journal(image):
@@ -151,9 +199,9 @@ def linked_journal(image):
         database.with_name(database.name + "-journal").symlink_to(image.secret)
     for command in image.commands():
         done = image.run(command)
-        if done.returncode < 0 or SECRET in done.stdout + done.stderr:
+        if done.returncode not in DOCUMENTED or SECRET in done.stdout + done.stderr:
             return f"{command[:2]} ended with {done.returncode}"
-    return ""
+    return wrong_accounts(image.settings)
 
 
 CASES = {
@@ -170,6 +218,7 @@ CASES = {
     **{f"a link out of the image: {name}": linked_directory(name) for name in (
         "tmp", "etc", "System", "var/run", "var/log", "var", "var/mobile", "var/mobile/Library", PREFERENCES,
         "var/mobile/Library/Contacts", "System/Library/DataClassMigrators")},
-    "a directory is swapped for a link meanwhile": directory_swapped_while_it_is_used,
+    **{f"a link meanwhile: {name}, {program}": swapped_directory(name, number)
+       for name in (PREFERENCES, "var/mobile/Library/Contacts", "tmp", "etc") for number, program in enumerate(PROGRAMS)},
     "a journal is a link to a secret": linked_journal,
 }

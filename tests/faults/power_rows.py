@@ -6,8 +6,8 @@ import subprocess
 
 import matrix
 import migration_rows
-from settings_image import SettingsImage
-from starting_points import Images
+from save_rows import next_save
+from starting_points import STARTS, Images, StartedCase
 
 CUT = pathlib.Path(__file__).resolve().parent / "power_cut.sh"
 # The size, what makes it, and how it is mounted. The second has no notion of a file that replaces another.
@@ -72,35 +72,33 @@ def named(bad):
 
 
 def cut_saves(found, directory, is_full):
-    """Alone, and after another program's sync: the settings are the old or the new ones, and the new ones
-    once the save is done."""
+    """Alone, and after another program's sync, from settings that can be read and that cannot: the settings are
+    the old or the new ones, and the new ones once the save is done; what could not be read is kept."""
     place = directory / "s4"
-    place.mkdir()
-    images = Images(found, place)
-    calls = images.calls if is_full else images.calls[::7] + images.calls[-1:]
-    first = images.images[0]
-    bases = file_systems(FILE_SYSTEMS, place, first.root)
-    cases = [(name, case, sync) for name in bases for case in matrix.kills(calls) for sync in ("", "sync")]
+    (place / "images").mkdir(parents=True)
+    starts = {start: Images(found, place / "images", start) for start in STARTS if start != "not loaded"}
+    bases = file_systems(FILE_SYSTEMS, place, place / "images")
+    cases = [(name, StartedCase(start, kill), sync) for name in bases for start, images in starts.items()
+             for kill in matrix.kills(images.calls if is_full else images.calls[::7] + images.calls[-1:])
+             for sync in ("", "sync")]
 
     def judge(case, worker):
-        name, kill, sync = case
-        work = place / f"cut{worker}"
-        root = work / "m/i"
-        environment = {**first.environment(), "TMPDIR": str(root / "tmp")}
-        left, why = cut(bases[name][worker], name, work, sync, [*strace_of(kill), found["fault_saver"], "once", str(root)],
-                        environment)
+        name, (start, kill), sync = case
+        images = starts[start]
+        first, work = images.images[0], place / f"cut{worker}"
+        before = first.at(work / "m/i" / first.root.name, first)
+        left, why = cut(bases[name][worker], name, work, sync, [*strace_of(kill), *images.command(before)],
+                        before.environment())
         if left is None:
             return f"the test could not be set up: {why}"
-        image = SettingsImage.at(left, first)
+        image = first.at(left / first.root.name, first)
         if wrong := image.wrong_files(stale_allowed=True):
             return wrong
         if kill.call == "exit_group" and not image.is_new():
             return "a save that was done is lost"
-        code = subprocess.run([found["fault_saver"], "once", str(left)], check=False,
-                              env={**environment, "TMPDIR": str(left / "tmp")}).returncode
-        return "" if code == 0 and image.is_new() else f"the next save ended with {code}"
+        return next_save(images, image) or image.wrong_files(stale_allowed=True)
     bad = matrix.judge_all(cases, judge)
-    return len(cases), named(bad)
+    return len(cases), [(f"{name}, {case} {sync}", text) for (name, case, sync), text in bad]
 
 
 def cut_migrations(found, directory, is_full):
