@@ -67,9 +67,25 @@ def all_names_taken(image):
     return image.wrong_settings(image.old)
 
 
-def swapped_before_the_change_of_owner(image):
-    image.save(**image.meddled(link=image.secret))
-    return ""  # the secret is looked at for every case
+def swapped_name(when):
+    """In a directory that is not sticky somebody puts a link in the place of what a save has begun: the save
+    fails, and neither what the link leads to nor the settings have changed."""
+    def case(image):
+        (image.root / "tmp").chmod(0o777)
+        code = image.save(**image.meddled(**{when: image.secret}))
+        if code != SAVE_FAILED:
+            return f"the save ended with {code}"
+        return image.wrong_settings(image.old)
+    return case
+
+
+def directory_open_to_others(image):
+    """A host does not begin where others could do so."""
+    (image.root / "tmp").chmod(0o777)
+    done = image.host()
+    if done.returncode != REFUSED or b"tmp" not in done.stdout + done.stderr:
+        return f"the host ended with {done.returncode}: {(done.stdout + done.stderr)[-200:]}"
+    return image.wrong_settings(image.old)
 
 
 def swap_by_another_user(image):
@@ -207,7 +223,9 @@ def linked_journal(image):
 CASES = {
     **{f"at the temporary name: {kind}": planted_temporary_name(kind) for kind in PLANTS},
     "all proposed names are taken": all_names_taken,
-    "the name is swapped before the change of owner": swapped_before_the_change_of_owner,
+    "the name is swapped before the change of owner": swapped_name("link"),
+    "the name is swapped before the bytes are on the disk": swapped_name("later"),
+    "everybody may swap names": directory_open_to_others,
     "another user swaps the name": swap_by_another_user,
     "the settings file is a link to a secret": settings_are(lambda i: i.settings.symlink_to(i.secret)),
     "the settings file is a FIFO": settings_are(lambda i: os.mkfifo(i.settings)),

@@ -119,7 +119,11 @@ TEST(BinaryReader, RefusesWithThePlaceOfTheFault) {
       {"offset in the magic", {{"\x09"}, 1, 1, 0, {7}}, 9, "an object outside of its region"},
       {"offset at the table", {{"\x09"}, 1, 1, 0, {9}}, 9, "an object outside of its region"},
       {"top above the count", {{"\x09"}, 1, 1, 1}, 26, "no such top object"},
+      {"count where the table begins", only("\x5F"), 9, "a count outside of its region"},
+      {"count that is true", only("\x5F\x09z"), 9, "a count that is no integer"},
+      {"offset size of 0", {{"\x09"}, 0}, 15, "bad offset size"},
       {"offset size of 9", {{"\x09"}, 9}, 24, "bad offset size"},
+      {"reference size of 0", {{"\x09"}, 1, 0}, 17, "bad reference size"},
       {"reference size of 9", {{"\x09"}, 1, 9}, 17, "bad reference size"},
   };
   for (const auto& c : kCases) {
@@ -129,6 +133,67 @@ TEST(BinaryReader, RefusesWithThePlaceOfTheFault) {
     EXPECT_EQ(error.what, c.what);
     EXPECT_EQ(error.byteOffset, c.byteOffset);
     EXPECT_EQ(error.line, std::nullopt);
+  }
+}
+
+TEST(BinaryReader, RefusesATrailerThatDoesNotFit) {
+  // An object at 8, a table of four bytes at 9, the trailer at 13.
+  const struct {
+    const char* name;
+    std::size_t at;
+    std::uint8_t number;
+    std::size_t byteOffset;
+    const char* what;
+  } kCases[] = {
+      {"no object", 28, 0, 21, "object count does not fit the offset table"},
+      {"more objects than the table has room for", 28, 2, 21,
+       "object count does not fit the offset table"},
+      {"a table in the place of all objects", 44, 8, 37, "offset table out of place"},
+      {"a table behind its end", 44, 14, 37, "offset table out of place"},
+      {"a table without room", 44, 13, 21, "object count does not fit the offset table"},
+  };
+  for (const auto& c : kCases) {
+    SCOPED_TRACE(c.name);
+    Bytes bytes = only("\x09").bytes();
+    bytes[c.at] = c.number;
+    const ReadResult result = readBinaryPropertyList(bytes);
+    EXPECT_EQ(result.value, std::nullopt);
+    EXPECT_EQ(result.error.what, c.what);
+    EXPECT_EQ(result.error.byteOffset, c.byteOffset);
+  }
+}
+
+TEST(BinaryReader, RefusesNothingAtAll) {
+  const ReadError error = readBinaryPropertyList({}).error;
+  EXPECT_EQ(error.what, "not a binary property list of a known version");
+  EXPECT_EQ(error.byteOffset, 0U);
+}
+
+TEST(BinaryReader, KnowsTheTypesThatPropertyListsHave) {
+  const auto isKnown = [](unsigned marker) {
+    switch (marker >> 4U) {
+      case 0x0:
+        return marker == 0x08 || marker == 0x09;
+      case 0x1:
+        return marker <= 0x14;
+      case 0x2:
+        return marker == 0x22 || marker == 0x23;
+      case 0x3:
+        return marker == 0x33;
+      case 0x4:
+      case 0x5:
+      case 0x6:
+      case 0xA:
+      case 0xD:
+        return true;
+      default:
+        return false;
+    }
+  };
+  for (unsigned marker = 0; marker < 256; ++marker) {
+    SCOPED_TRACE(marker);
+    const std::string raw = static_cast<char>(marker) + std::string(64, '\0');
+    EXPECT_EQ(errorOf(only(raw)).what != "an object of an unknown type", isKnown(marker));
   }
 }
 
@@ -160,6 +225,10 @@ TEST(BinaryReader, SortsKeysAndKeepsTheLastOfEqualOnes) {
                          "b",
                          "\x10\x01", "\x10\x02", "\x10\x03", "\x10\x04"}};
   EXPECT_EQ(*read(list), Value(Dictionary{{"a", 3}, {"b", 4}}));
+}
+
+TEST(BinaryReader, TakesAKeyThatIsAValueToo) {
+  EXPECT_EQ(*read({{"\xD1\x01\x01", "\x51k"}}), Value(Dictionary{{"k", "k"}}));
 }
 
 TEST(BinaryReader, TakesEveryReferenceSize) {
@@ -233,6 +302,21 @@ TEST(BinaryReader, CountsTheDepthOfWhatIsSharedAtItsDeepestPlace) {
     EXPECT_EQ(read(chain(513, first)), std::nullopt);
     EXPECT_EQ(errorOf(chain(513, first)).what, "nested too deep");
   }
+}
+
+TEST(BinaryReader, CountsTheLevelsOfContainersOnly) {
+  // Arrays around true, each of three bytes.
+  const auto arrays = [](std::size_t levels) {
+    BinaryList list;
+    list.referenceSize = 2;
+    for (std::size_t i = 1; i <= levels; ++i) list.objects.push_back("\xA1" + bigEndian(i, 2));
+    list.objects.emplace_back("\x09");
+    return list;
+  };
+  EXPECT_TRUE(read(arrays(512)).has_value());
+  EXPECT_EQ(errorOf(arrays(513)).what, "nested too deep");
+  EXPECT_EQ(errorOf(arrays(513)).byteOffset, 8U + 512 * 3);
+  EXPECT_EQ(errorOf(arrays(600)).byteOffset, 8U + 512 * 3);
 }
 
 TEST(BinaryReader, RefusesObjectsThatOverlapWithoutMeasure) {

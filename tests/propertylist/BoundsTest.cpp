@@ -1,8 +1,11 @@
 // What stays small however a value is built: the stack when it is nested, the effort when it is
 // shared.
 #include <gtest/gtest.h>
+#include <sys/mman.h>
 
 #include <atomic>
+#include <new>
+#include <span>
 #include <thread>
 
 #include "propertylist/Reading.h"
@@ -54,6 +57,38 @@ TEST(NestedValues, AreWrittenUpToTheLimitOfTheReaderOnly) {
       EXPECT_EQ(writeXMLPropertyList(nested(levels)), std::nullopt);
     }
   });
+}
+
+// Pages of nothing, which take no memory as long as nobody writes to them.
+class Pages {
+ public:
+  explicit Pages(std::size_t size)
+      : _size(size),
+        _at(::mmap(nullptr, size, PROT_READ, MAP_PRIVATE | MAP_ANONYMOUS | MAP_NORESERVE, -1, 0)) {
+    if (_at == MAP_FAILED) throw std::bad_alloc();
+  }
+  Pages(const Pages&) = delete;
+  Pages& operator=(const Pages&) = delete;
+  ~Pages() { ::munmap(_at, _size); }
+
+  std::span<const std::uint8_t> bytes(std::size_t count) const {
+    return {static_cast<const std::uint8_t*>(_at), count};
+  }
+
+ private:
+  std::size_t _size;
+  void* _at;
+};
+
+TEST(LargeLists, AreRefusedBeforeTheyAreLookedAt) {
+  const Pages pages(kMaximumFileSize + 1);
+  const auto most = pages.bytes(kMaximumFileSize);
+  const auto tooMany = pages.bytes(kMaximumFileSize + 1);
+  EXPECT_EQ(readBinaryPropertyList(tooMany).error.what, "too large");
+  EXPECT_EQ(readBinaryPropertyList(tooMany).error.byteOffset, kMaximumFileSize);
+  EXPECT_EQ(readXMLPropertyList(tooMany).error.what, "too large");
+  EXPECT_NE(readBinaryPropertyList(most).error.what, "too large");
+  EXPECT_NE(readXMLPropertyList(most).error.what, "too large");
 }
 
 TEST(SharedValues, AreComparedByWhatIsStored) {

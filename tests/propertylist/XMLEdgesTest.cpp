@@ -1,5 +1,9 @@
 // The XML form where it borders on what is no XML any more.
 #include <gtest/gtest.h>
+#include <sys/mman.h>
+#include <unistd.h>
+
+#include <algorithm>
 
 #include "propertylist/Reading.h"
 
@@ -56,6 +60,47 @@ TEST(XMLEdges, AreRefusedWithTheReason) {
        "a character reference that is no number"},
       {"reference of other capitals", "<plist><string>&#xG;</string></plist>",
        "a character reference that is no number"},
+      // Where a reading that went on behind the fault would find a whole document.
+      {"instruction of a document", "<?<plist><true/></plist><!--?>-->",
+       "a processing instruction that is not well formed"},
+      {"instruction of a value", "<plist><?<true/><!--?>--></plist>",
+       "a processing instruction that is not well formed"},
+      {"instruction of an end tag", "<plist><string><?</string><!--?>--></plist>",
+       "a processing instruction that is not well formed"},
+      {"instruction behind the document type", "<!DOCTYPE plist><?<plist><true/></plist><!--?>-->",
+       "a processing instruction that is not well formed"},
+      {"instruction without a name",
+       "<?"
+       "?><plist><true/></plist>",
+       "a processing instruction that is not well formed"},
+      {"instruction of a blank", "<? a?><plist><true/></plist>",
+       "a processing instruction that is not well formed"},
+      {"declaration of a document", "<?xml <plist><true/></plist>",
+       "a tag that is not well formed"},
+      {"declaration that ends like a tag", "<?xml version='1.0'/><plist><true/></plist>",
+       "a tag that is not well formed"},
+      {"document type of a document", "<!DOCTYPE <plist><true/></plist>",
+       "a document type without a name"},
+      {"document type without an end", "<!DOCTYPE plist <plist><true/></plist>",
+       "a document type that is not well formed"},
+      {"document type glued to its name", "<!DOCTYPEplist><plist><true/></plist>",
+       "a document type without a name"},
+      {"address glued to its word", "<!DOCTYPE plist SYSTEM'd'><plist><true/></plist>",
+       "a document type that is not well formed"},
+      {"no address", "<!DOCTYPE plist SYSTEM ><plist><true/></plist>",
+       "a document type that is not well formed"},
+      {"address between letters", "<!DOCTYPE plist SYSTEM xax><plist><true/></plist>",
+       "a document type that is not well formed"},
+      {"comment that ends in another sign", "<!-- a --x<plist><true/></plist>",
+       "two hyphens in a comment"},
+      {"tag without an end", "<plist ", "a tag without an end"},
+      {"tag of a digit", "<plist><1/></plist>", "markup that is no tag"},
+      {"attribute without an equals sign", "<plist a'1'><true/></plist>",
+       "a tag that is not well formed"},
+      {"text that ends with another beginning", "<plist><string>x<string></plist>",
+       "an element inside of a text"},
+      {"reference of a colon", "<plist><string>&#x:;</string></plist>",
+       "a character reference that is no number"},
       {"reference behind the letters", "<plist><string>&#x~;</string></plist>",
        "a character reference that is no number"},
   };
@@ -78,12 +123,39 @@ TEST(XMLEdges, AreReadWhereTheFormAllowsThem) {
       {"names of every sign", "<?a-b.c9_:\xC3\xA4Z?><?_?><?:?><plist><true/></plist>", true},
       {"instruction that begins like a declaration", "<?xml-style a?><plist><true/></plist>", true},
       {"name of another script", "<?\xC3\xA4?><plist><true/></plist>", true},
+      {"small digits of a reference", "<plist><string>&#xfa;</string></plist>", "\xC3\xBA"},
+      {"an attribute that only a declaration goes by", "<plist encoding='x'><true/></plist>", true},
       {"capital digits of a reference", "<plist><string>&#x4F;</string></plist>", "O"},
   };
   for (const auto& c : kCases) {
     SCOPED_TRACE(c.name);
     EXPECT_EQ(read(c.document).value, c.value) << read(c.document).error.description();
   }
+}
+
+TEST(XMLEdges, AreRefusedAtTheirPlace) {
+  EXPECT_EQ(read("<!DOCTYPE plist SYSTEM \"x><plist/>").error.description(),
+            "a document type that is not well formed in line 1, column 24");
+}
+
+// Every beginning of a document lies at the end of what memory there is: a look behind it would be
+// the end of the process.
+TEST(XMLEdges, AreReadWithoutALookBehindThem) {
+  const std::string document =
+      "<?xml version='1.0'?><!DOCTYPE plist PUBLIC 'a' \"b\"><!--c--><?d e?>"
+      "<plist version = '1'><array><string>&amp;&#x41;<![CDATA[x]]></string><key/></array></plist>";
+  const std::size_t page = static_cast<std::size_t>(::sysconf(_SC_PAGESIZE));
+  void* const pages =
+      ::mmap(nullptr, 2 * page, PROT_READ | PROT_WRITE, MAP_PRIVATE | MAP_ANONYMOUS, -1, 0);
+  ASSERT_NE(pages, MAP_FAILED);
+  auto* const end = static_cast<std::uint8_t*>(pages) + page;
+  ASSERT_EQ(::mprotect(end, page, PROT_NONE), 0);
+  for (std::size_t size = 0; size <= document.size(); ++size) {
+    SCOPED_TRACE(size);
+    std::copy_n(document.begin(), size, end - size);
+    EXPECT_EQ(readXMLPropertyList({end - size, size}).value, std::nullopt);
+  }
+  ::munmap(pages, 2 * page);
 }
 
 }  // namespace
