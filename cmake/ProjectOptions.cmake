@@ -44,7 +44,10 @@ set(CMAKE_RUNTIME_OUTPUT_DIRECTORY ${PROJECT_BINARY_DIR}/bin)
 set(CMAKE_LIBRARY_OUTPUT_DIRECTORY ${PROJECT_BINARY_DIR}/lib)
 set(PROJECT_MIGRATORS_DIRECTORY ${PROJECT_BINARY_DIR}/lib/account-retirement/migrators)
 set(PROJECT_SERVICES_DIRECTORY ${PROJECT_BINARY_DIR}/lib/account-retirement/services)
-set(CMAKE_INSTALL_RPATH $ORIGIN $ORIGIN/../${CMAKE_INSTALL_LIBDIR} $ORIGIN/../../..)
+set(CMAKE_INSTALL_RPATH $ORIGIN $ORIGIN/../${CMAKE_INSTALL_LIBDIR} $ORIGIN/../lib $ORIGIN/../../..)
+list(REMOVE_DUPLICATES CMAKE_INSTALL_RPATH)
+# A path that is replaced at installation ends with an empty entry, which is the current directory.
+set(CMAKE_BUILD_WITH_INSTALL_RPATH ON)
 
 # shared_library(<target>) names a library that stays loaded in other people's processes: its file says
 # whose it is, and what was built for another version of the package does not load with it.
