@@ -38,6 +38,8 @@ class ImageFileServices::Reached {
     return Status::failure(outcome.code, told(outcome.error->description));
   }
 
+  bool isInImage() const { return !_held.empty(); }
+
   Status status;
   std::string path;
 
@@ -86,6 +88,7 @@ bool ImageFileServices::fileExists(const std::string& path) {
 platform::FileServices::Opened ImageFileServices::createPrivateFile(const std::string& path) {
   const ReachedPtr reached = _reach(path);
   if (!reached->status.isSuccess()) return {reached->status, -1};
+  if (!reached->isInImage()) return PosixFileServices::createPrivateFile(path);
   {
     // First, so that no file is made that its maker never hears of, for want of memory.
     const std::lock_guard guard(_mutex);
