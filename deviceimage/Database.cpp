@@ -62,6 +62,12 @@ std::map<std::string, std::string> schemaOf(sqlite3* connection) {
   return statements;
 }
 
+// Made once a process, because making a database takes longer than opening one.
+const std::map<std::string, std::string>& expectedSchema() {
+  static const std::map<std::string, std::string> schema = schemaOf(emptyDatabase().get());
+  return schema;
+}
+
 std::int64_t pragmaOf(sqlite3* connection, const char* pragma) {
   std::int64_t value = 0;
   const int code = sqlite3_exec(
@@ -138,7 +144,7 @@ void Database::_checkSchema() {
                                                ", and this program knows versions up to " +
                                                std::to_string(kSchemaVersion) +
                                                "; use a newer program");
-    if (version != kSchemaVersion || schemaOf(_connection) != schemaOf(emptyDatabase().get()))
+    if (version != kSchemaVersion || schemaOf(_connection) != expectedSchema())
       throw DatabaseFailure(
           SQLITE_SCHEMA, "its tables are not those of version " + std::to_string(kSchemaVersion));
     Statement journal(*this, "PRAGMA journal_mode");

@@ -3,21 +3,9 @@
 namespace deviceimage {
 namespace {
 
-std::string_view keyOf(platform::RestrictedFeature feature) {
-  switch (feature) {
-    case platform::RestrictedFeature::cloudDocumentSync:
-      return "CloudDocumentSync";
-    case platform::RestrictedFeature::photoStream:
-      return "PhotoStream";
-    case platform::RestrictedFeature::sharedPhotoStreams:
-      return "SharedPhotoStreams";
-    case platform::RestrictedFeature::cloudBackup:
-      return "CloudBackup";
-    case platform::RestrictedFeature::cardsWhileLocked:
-      break;
-  }
-  return "CardsWhileLocked";
-}
+// In the order of the features.
+constexpr std::array<std::string_view, 5> kKeys = {
+    "CloudDocumentSync", "PhotoStream", "SharedPhotoStreams", "CloudBackup", "CardsWhileLocked"};
 
 }  // namespace
 
@@ -32,9 +20,19 @@ std::string ImageAccountFramework::QuillnetStatusKey() {
 }
 
 int ImageRestrictions::featureRestriction(platform::RestrictedFeature feature) {
-  const auto value = _image->readProperty(DeviceImage::kRestrictionsFile, keyOf(feature));
-  const std::optional<std::int64_t> state = value ? value->asInteger() : std::nullopt;
-  return state == kExplicitlyForbidden ? kExplicitlyForbidden : 0;
+  std::call_once(_isRead, [this] {
+    const propertylist::FileReadResult read =
+        _image->readPropertyList(DeviceImage::kRestrictionsFile);
+    const propertylist::Dictionary* const states =
+        read.value ? read.value->asDictionary() : nullptr;
+    if (states == nullptr) return;
+    for (std::size_t index = 0; index < kKeys.size(); ++index) {
+      const propertylist::Value* const state = states->find(kKeys[index]);
+      if (state != nullptr && state->asInteger() == kExplicitlyForbidden)
+        _states[index] = kExplicitlyForbidden;
+    }
+  });
+  return _states.at(static_cast<std::size_t>(feature));
 }
 
 }  // namespace deviceimage

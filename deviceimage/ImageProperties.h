@@ -1,6 +1,8 @@
 #pragma once
 
+#include <array>
 #include <memory>
+#include <mutex>
 #include <utility>
 
 #include "deviceimage/DeviceImage.h"
@@ -9,7 +11,8 @@
 #include "platform/RestrictionsService.h"
 #include "platform/UserDatabase.h"
 
-// What the files of an image say about the device. Each question reads the file anew.
+// What the files of an image say about the device. Each question reads the file anew, but for the
+// restrictions.
 namespace deviceimage {
 
 // The strings of the property list System/Library/DeviceProperties.plist.
@@ -36,14 +39,19 @@ class ImageAccountFramework : public platform::AccountFramework {
 
 // The integers of the property list DeviceImage::kRestrictionsFile, under "CloudDocumentSync",
 // "PhotoStream", "SharedPhotoStreams", "CloudBackup" and "CardsWhileLocked". 2 forbids the feature;
-// a feature that is not named there is not restricted (0).
+// a feature that is not named there is not restricted (0). The file is read for the first question
+// and then no more: the account settings library asks five times for each account of each load and
+// each save, and nobody changes a profile of an image while a program works on it.
 class ImageRestrictions : public platform::RestrictionsService {
  public:
   explicit ImageRestrictions(std::shared_ptr<const DeviceImage> image) : _image(std::move(image)) {}
   int featureRestriction(platform::RestrictedFeature feature) override;
 
  private:
+  static constexpr std::size_t kFeatureCount = 5;
   std::shared_ptr<const DeviceImage> _image;
+  std::once_flag _isRead;
+  std::array<int, kFeatureCount> _states{};  // by feature, in the order of their keys
 };
 
 // The image's own etc/passwd and etc/group.

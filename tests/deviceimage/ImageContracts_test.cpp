@@ -237,6 +237,7 @@ class ImageRestrictionStates : public OnAnImage<RestrictionsUnderTest> {
                                      "CloudBackup", "CardsWhileLocked"};  // in the features' order
     putIntoList(DeviceImage::kRestrictionsFile, kKeys[static_cast<std::size_t>(feature)],
                 forbidden ? 2 : 1);
+    renewServices();  // which have read the file already
   }
 };
 INSTANTIATE_TEST_SUITE_P(DeviceImage, RestrictionsContract,

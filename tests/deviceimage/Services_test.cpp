@@ -129,7 +129,6 @@ TEST_F(ImageServices, NameTheStatusKeyAsTheDevicePropertiesDoElseAsUsual) {
 
 TEST_F(ImageServices, ForbidWhatTheRestrictionsFileForbids) {
   using platform::RestrictedFeature;
-  EXPECT_EQ(services.restrictions.featureRestriction(RestrictedFeature::photoStream), 0);
   write(DeviceImage::kRestrictionsFile,
         Dictionary{{"PhotoStream", 2}, {"CloudBackup", 1}, {"CardsWhileLocked", "2"}});
   EXPECT_EQ(services.restrictions.featureRestriction(RestrictedFeature::photoStream),
@@ -137,6 +136,14 @@ TEST_F(ImageServices, ForbidWhatTheRestrictionsFileForbids) {
   EXPECT_EQ(services.restrictions.featureRestriction(RestrictedFeature::cloudBackup), 0);
   EXPECT_EQ(services.restrictions.featureRestriction(RestrictedFeature::cardsWhileLocked), 0);
   EXPECT_EQ(services.restrictions.featureRestriction(RestrictedFeature::cloudDocumentSync), 0);
+}
+
+TEST_F(ImageServices, ReadTheRestrictionsOnce) {
+  using platform::RestrictedFeature;
+  EXPECT_EQ(services.restrictions.featureRestriction(RestrictedFeature::photoStream), 0);
+  write(DeviceImage::kRestrictionsFile, Dictionary{{"PhotoStream", 2}, {"CloudBackup", 2}});
+  EXPECT_EQ(services.restrictions.featureRestriction(RestrictedFeature::photoStream), 0);
+  EXPECT_EQ(services.restrictions.featureRestriction(RestrictedFeature::cloudBackup), 0);
 }
 
 TEST_F(ImageServices, KnowNoProcessesButThoseOfTheImage) {
