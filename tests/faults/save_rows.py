@@ -1,5 +1,6 @@
 """Saving the settings while something fails: rows S1 to S3, S5, S6 and S10 of docs/reliability.md."""
 
+import collections
 import os
 import pathlib
 import shutil
@@ -7,7 +8,6 @@ import signal
 import subprocess
 
 import matrix
-from settings_image import SettingsImage
 from starting_points import STARTS, Images, StartedCase
 
 SAVE_FAILED, MANY_LINES, SECOND_FAILED, LEAKED, NOT_LOADED, OUT_OF_MEMORY = 1, 2, 4, 8, 16, 64
@@ -102,7 +102,7 @@ def in_own_mounts(script, *arguments):
 
 
 FULL_DISK = r"""
-saver=$1 image=$2 mount=$3 free=$4 inodes=$5 result=$6
+saver=$1 work=$2 image=$3 mount=$4 free=$5 inodes=$6 result=$7
 mount -t tmpfs -o size=16m tmpfs "$mount"
 cp -a "$image" "$mount/i"
 if [ "$inodes" = 1 ]; then
@@ -113,25 +113,34 @@ else
   dd if=/dev/zero of="$mount/filler" bs=1k count=$((left - free)) 2>/dev/null
 fi
 code=0
-TMPDIR=$mount/i/tmp "$saver" once "$mount/i" || code=$?
+TMPDIR=$mount/i/tmp "$saver" "$work" "$mount/i" || code=$?
 rm -rf "$result"; cp -a "$mount/i" "$result"
 exit $((code + 100))
 """
+# Where the room has to do: for the new settings, and for a copy of the old ones.
+STARTS_THAT_WRITE = ("", "unreadable, of two names")
+
+
+class NamedCase(collections.namedtuple("NamedCase", "start kind number")):
+    def __str__(self):
+        return f"{self.start or 'settings'}, {self.number} {self.kind}"
 
 
 def full_disk(all_images):
-    """A file system with 0, 4, 8 ... KiB left, and with no inode or one; the next save has room."""
-    images = all_images[""]
-    cases = [("KiB", kib) for kib in range(0, 160, 4)] + [("inodes", count) for count in range(3)]
+    """A file system with 0, 4, 8 ... KiB left, and with no inode or a few; the next save has room."""
+    starts = {start: all_images[start] for start in STARTS_THAT_WRITE}
+    cases = [NamedCase(start, kind, number) for start in starts
+             for kind, numbers in (("KiB", range(0, 160, 4)), ("inodes", range(4))) for number in numbers]
 
     def judge(case, worker):
+        images = starts[case.start]
         image = images.images[worker]
         image.reset()
         mount = pathlib.Path(f"{image.root}.mount")
         mount.mkdir(exist_ok=True)
-        left = SettingsImage.at(f"{image.root}.full", image)
-        done = in_own_mounts(FULL_DISK, images.saver, image.root, mount, case[1], int(case[0] == "inodes"),
-                             left.root)
+        left = image.at(f"{image.root}.full", image)
+        done = in_own_mounts(FULL_DISK, images.saver, images.work, image.root, mount, case.number,
+                             int(case.kind == "inodes"), left.root)
         code = done.returncode - 100
         if code < 0:
             return f"the test could not be set up: {done.stderr.strip()[-200:]}"
@@ -139,31 +148,38 @@ def full_disk(all_images):
             return wrong
         if code != (0 if left.is_new() else SAVE_FAILED):
             return f"exit code {code} says something else than the file"
-        return next_save(images, left)
+        if not case.number and left.is_new():
+            return "saved without any room"
+        return next_save(images, left) or left.wrong_files()
     return cases, judge
 
 
 def size_limit(all_images):
     """Files that may grow to a limit only, the signal ignored (short writes, then EFBIG) and not; the next save
     has no limit."""
-    images = all_images[""]
-    size = len(images.images[0].expected)
-    limits = sorted({0, 1, 7, 512, 4095, 4096, 4097, size - 1, size, size + 1} | set(range(0, size, size // 8)))
-    cases = [(ignored, limit) for ignored in (True, False) for limit in limits]
+    cases, sizes = [], {}
+    for start in STARTS_THAT_WRITE:
+        first = all_images[start].images[0]
+        size = sizes[start] = max(len(first.expected), len(first.old) if start else 0)
+        limits = {0, 1, 7, 512, 4095, 4096, 4097, size - 1, size, size + 1} | set(range(0, size, size // 8))
+        cases += [NamedCase(start, kind, limit) for kind in ("bytes", "bytes at most") for limit in sorted(limits)]
 
     def judge(case, worker):
-        ignored, limit = case
+        start, kind, limit = case
+        is_ignored, size = kind == "bytes", sizes[start]
+        images = all_images[start]
         image = images.images[worker]
         image.reset()
-        command = ["prlimit", f"--fsize={limit}", *(["env", "--ignore-signal=XFSZ"] if ignored else []),
+        command = ["prlimit", f"--fsize={limit}", *(["env", "--ignore-signal=XFSZ"] if is_ignored else []),
                    *images.command(image)]
         code = subprocess.run(command, env=image.environment(), check=False, timeout=LIMIT).returncode
-        if wrong := image.wrong_files(stale_allowed=not ignored):
+        if wrong := image.wrong_files(stale_allowed=not is_ignored):
             return wrong
         if image.is_new() != (limit >= size):
             return f"saved with a limit of {limit} bytes" if image.is_new() else "not saved with room enough"
-        wanted = 0 if limit >= size else SAVE_FAILED if ignored else -signal.SIGXFSZ
-        return f"exit code {code} instead of {wanted}" if code != wanted else next_save(images, image)
+        wanted = 0 if limit >= size else SAVE_FAILED if is_ignored else -signal.SIGXFSZ
+        return f"exit code {code} instead of {wanted}" if code != wanted else \
+            next_save(images, image) or image.wrong_files(stale_allowed=not is_ignored)
     return cases, judge
 
 
