@@ -18,7 +18,7 @@ FILE = re.compile(r'\s+\.file\s+(\d+)\s+(?:"[^"]*"\s+)?"([^"]*)"')
 LINE = re.compile(r"\s+\.loc\s+(\d+)\s+(\d+)")
 LANDING = re.compile(r"\s+\.uleb128 (\.L\d+)-\.LFB\d+$")
 DESTRUCTOR = re.compile(r"\s+call\s+\S*D[012]Ev(@PLT)?$")
-LIMIT = 60  # seconds of one test run; a mutant that takes longer is noticed
+LIMIT = 60  # seconds of processor time of one test run; a mutant that takes longer is noticed
 
 Mutant = collections.namedtuple("Mutant", "index line always")
 
@@ -50,13 +50,14 @@ class Program:
 
     def notices(self, made):
         environment = {**os.environ, "LD_LIBRARY_PATH": os.path.dirname(made)}
-        return any(run([word.replace("{program}", made) for word in test], self.build, environment) != 0
-                   for test in self.tests)
+        return any(run(["prlimit", f"--cpu={LIMIT}", *(word.replace("{program}", made) for word in test)],
+                       self.build, environment) != 0 for test in self.tests)
 
 
 def run(command, directory, environment=None):
+    """The exit code. One that waits for ever ends, too; on a machine with other work that takes its time."""
     try:
-        return subprocess.run(command, cwd=directory, env=environment, timeout=LIMIT, check=False,
+        return subprocess.run(command, cwd=directory, env=environment, timeout=20 * LIMIT, check=False,
                               stdin=subprocess.DEVNULL, stdout=subprocess.DEVNULL,
                               stderr=subprocess.DEVNULL).returncode
     except subprocess.TimeoutExpired:

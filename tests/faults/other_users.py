@@ -81,8 +81,8 @@ def modes_when_made(image):
         # With a file for each process no call is told of in two halves.
         shutil.rmtree(trace, ignore_errors=True)
         trace.mkdir()
-        done = image.run(["strace", "-ff", "-qq", "-o", trace / "of", "-e", "trace=openat,open,mkdir,mkdirat,mknod,creat",
-                          "--", *command], umask=0)
+        done = image.run(["strace", "-ff", "-qq", "-o", trace / "of", "-e",
+                          "trace=openat,open,mkdir,mkdirat,mknod,creat", "--", *command], umask=0)
         if done.returncode not in (0, 3):
             return f"{command[:2]} ended with {done.returncode}"
         for line in [line for path in trace.iterdir() for line in path.read_text(errors="replace").splitlines()]:
@@ -254,7 +254,8 @@ def legacy_lock_held_for_ever(image):
     done = image.host("--legacy", "--timeout", 60)
     if done.returncode != 0:
         return f"the next run ended with {done.returncode}: {done.stdout[-200:]} {done.stderr[-200:]}"
-    return "the settings are not of the newer version" if plistlib.loads(image.settings.read_bytes())["Version"] != 12 else ""
+    version = plistlib.loads(image.settings.read_bytes())["Version"]
+    return "" if version == 12 else f"the settings are of version {version}"
 
 
 def install_migrator(image):

@@ -237,6 +237,7 @@ CASES = {
         "tmp", "etc", "System", "var/run", "var/log", "var", "var/mobile", "var/mobile/Library", PREFERENCES,
         "var/mobile/Library/Contacts", "System/Library/DataClassMigrators")},
     **{f"a link meanwhile: {name}, {program}": swapped_directory(name, number)
-       for name in (PREFERENCES, "var/mobile/Library/Contacts", "tmp", "etc") for number, program in enumerate(PROGRAMS)},
+       for name in (PREFERENCES, "var/mobile/Library/Contacts", "tmp", "etc")
+       for number, program in enumerate(PROGRAMS)},
     "a journal is a link to a secret": linked_journal,
 }

@@ -21,6 +21,11 @@ TEST(XMLEdges, AreRefusedWithTheReason) {
     const char* what;
   } kCases[] = {
       {"end tag for a root", "</plist>", "not a property list"},
+      {"another root", "<list><true/></plist>", "not a property list"},
+      {"key in an array", "<plist><array><key>a</key></array></plist>",
+       "a key outside of a dictionary"},
+      {"key that ends as a text", "<plist><dict><key>a</string><true/></dict></plist>",
+       "an end tag that does not fit"},
       {"other end tag of the root", "<plist><true/></dict>", "an end tag that does not fit"},
       {"comment behind without end", "<plist><true/></plist><!-- x", "a comment without an end"},
       {"key without a dictionary", "<plist><key>a</key></plist>", "a key outside of a dictionary"},
