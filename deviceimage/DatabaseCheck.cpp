@@ -69,9 +69,11 @@ std::vector<DatabaseReport> RecordStores::checkDatabases(const std::set<std::str
   return reports;
 }
 
-platform::Status RecordStores::recoverDatabases() {
+platform::Status RecordStores::recoverDatabases(const std::set<std::string>& leaveOut) {
   platform::Status first;
   for (const Dataclass dataclass : kDataclasses) {
+    const std::string path(DeviceImage::databaseFile(syncTypeOf(dataclass)));
+    if (leaveOut.contains(path)) continue;
     // Opening reads the schema, and the first read rolls back.
     platform::Status status = statusOf([&] {
       if (Database* const database = _databases->find(syncTypeOf(dataclass)))
@@ -81,6 +83,14 @@ platform::Status RecordStores::recoverDatabases() {
     if (first.isSuccess()) first = std::move(status);
   }
   return first;
+}
+
+platform::Status RecordStores::tryToWrite(Dataclass dataclass) {
+  return statusOf([&] {
+    if (Database* const database = _databases->find(syncTypeOf(dataclass)))
+      const Transaction transaction(*database);
+    return platform::Status::success();
+  });
 }
 
 }  // namespace deviceimage

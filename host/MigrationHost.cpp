@@ -144,6 +144,7 @@ void MigrationHost::_runUnderLock(const RunOptions& options, int lockDescriptor)
   removeStaleTemporaryFiles(*_image);
   _image->removeLeftovers();
   if (!_interruption.requested()) _runMigrators(options, lockDescriptor);
+  rollBackLeftovers(_image, _leftAlone);
 
   _listener.stageBegan("Looking at the image after");
   const Observation after = observe(_image, _leftAlone);

@@ -20,6 +20,12 @@ using deviceimage::RecordStores;
 
 constexpr char kSeparator = ',';  // in no path of a database
 
+std::set<std::string> pathsOf(const std::vector<UnusableDatabase>& databases) {
+  std::set<std::string> paths;
+  for (const UnusableDatabase& database : databases) paths.insert(database.path);
+  return paths;
+}
+
 // What is not there yet is made when it is needed, in a folder that is looked at too.
 std::optional<std::string> whyNotWritable(const std::string& path) {
   if (faccessat(AT_FDCWD, path.c_str(), W_OK, AT_EACCESS) == 0 || errno == ENOENT)
@@ -36,13 +42,33 @@ void findUnwritable(const DeviceImage& image, const std::string& relative,
   if (why) found.push_back({relative, std::move(*why), true});
 }
 
+// Those that somebody is about to write, but lets others read: each change of ours would have to
+// wait, and fail in the end.
+void findThoseInUse(const std::shared_ptr<const DeviceImage>& image,
+                    std::vector<UnusableDatabase>& found) {
+  RecordStores stores(image, RecordStores::Access::readWrite);
+  for (const deviceimage::Dataclass dataclass : deviceimage::kDataclasses) {
+    const std::string path(DeviceImage::databaseFile(deviceimage::syncTypeOf(dataclass)));
+    if (pathsOf(found).contains(path)) continue;
+    const platform::Status status = stores.tryToWrite(dataclass);
+    if (!status.isSuccess())
+      found.push_back(
+          {path, "it is in use: " + status.error->description + "; wait for who uses it", true});
+  }
+}
+
 }  // namespace
+
+void rollBackLeftovers(const std::shared_ptr<const DeviceImage>& image,
+                       const std::vector<UnusableDatabase>& leftAlone) {
+  RecordStores(image, RecordStores::Access::readWrite)
+      .recoverDatabases(pathsOf(leftAlone))
+      .ignore("what cannot be recovered shows in the check");
+}
 
 std::vector<UnusableDatabase> findUnusableDatabases(
     const std::shared_ptr<const DeviceImage>& image) {
-  RecordStores(image, RecordStores::Access::readWrite)
-      .recoverDatabases()
-      .ignore("what cannot be recovered shows in the check");
+  rollBackLeftovers(image, {});
   RecordStores stores(image, RecordStores::Access::readOnly);
   std::vector<UnusableDatabase> found;
   for (const DatabaseReport& database : stores.checkDatabases()) {
@@ -57,6 +83,7 @@ std::vector<UnusableDatabase> findUnusableDatabases(
       found.push_back({database.path, "it is damaged or in use: " + database.problems.front() +
                                           "; bring back a sound copy, or wait for who uses it"});
   }
+  findThoseInUse(image, found);
   return found;
 }
 
@@ -76,11 +103,9 @@ std::vector<std::string> pathsJoinedIn(std::string_view joined) {
 
 std::vector<std::string> newDamage(const std::shared_ptr<const DeviceImage>& image,
                                    const std::vector<UnusableDatabase>& leftAlone) {
-  std::set<std::string> known;
-  for (const UnusableDatabase& database : leftAlone) known.insert(database.path);
   std::vector<std::string> sentences;
   RecordStores stores(image, RecordStores::Access::readOnly);
-  for (const DatabaseReport& database : stores.checkDatabases(known))
+  for (const DatabaseReport& database : stores.checkDatabases(pathsOf(leftAlone)))
     for (const std::string& problem : database.problems)
       sentences.push_back(image->absolutePath(database.path) + " is damaged: " + problem +
                           "; bring back a sound copy.");

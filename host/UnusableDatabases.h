@@ -25,6 +25,10 @@ struct UnusableDatabase {
 std::vector<UnusableDatabase> findUnusableDatabases(
     const std::shared_ptr<const deviceimage::DeviceImage>& image);
 
+// Rolls back what a migrator that was ended in the middle of a change left in the others.
+void rollBackLeftovers(const std::shared_ptr<const deviceimage::DeviceImage>& image,
+                       const std::vector<UnusableDatabase>& leftAlone);
+
 // Their paths as one argument of a command, and back.
 std::string joinedPaths(const std::vector<UnusableDatabase>& databases);
 std::vector<std::string> pathsJoinedIn(std::string_view joined);

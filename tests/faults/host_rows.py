@@ -11,8 +11,10 @@ import subprocess
 import time
 
 import matrix
-from migration_rows import environment, prepared, rerun
+from migration_image import environment
+from migration_rows import prepared
 
+RECORDS = 6  # of each kind
 LIMIT = 60  # seconds, after which a host counts as hanging
 LOCK = "var/run/image.lock"
 # The exit codes that the manual page gives; a bundle that does what it should leaves Q1 behind, code 3.
@@ -77,8 +79,8 @@ def bundle_of(found, directory, name):
 
 def hostile_plugins(found, directory, is_full):
     """Each ends with its code, in time, and leaves no process, no lock and no record touched."""
-    migration, place = prepared(found, directory, False, "h1")
-    bundles = {name: bundle_of(found, place, name) for name in HOSTILE}
+    migration = prepared(found, directory, RECORDS, "h1")
+    bundles = {name: bundle_of(found, migration.directory, name) for name in HOSTILE}
 
     def judge(name, worker):
         image = migration.copy(worker)
@@ -96,10 +98,11 @@ def hostile_plugins(found, directory, is_full):
             return f"processes are left: {left}"
         if (image / LOCK).exists() and is_lock_held(image):
             return "the lock is held"
-        if migration.contents(image) != migration.records:
+        state = migration.look(image)
+        if (state.active, state.retired) != (migration.begin.active, migration.begin.retired):
             return "the records have changed"
         (image / "tmp/opened").unlink(missing_ok=True)  # ClosesDescriptors makes a file of its own
-        return rerun(migration, image)
+        return migration.rerun(image)
     adopt_what_hosts_leave()
     bad = matrix.judge_all(list(HOSTILE), judge)
     if left := zombies():
@@ -132,7 +135,7 @@ KILLED = ["Spins", "Sleeps", "LogsForEver", "WritesOutputForEver", 0, 1, 2, 3, 5
 
 def killed_host(found, directory, is_full):
     """The migrator goes with its host, the lock is free then, and the next run does the work."""
-    migration, _ = prepared(found, directory, False, "h2")
+    migration = prepared(found, directory, RECORDS, "h2")
 
     def shoot(kind, worker):
         """The image after the host was killed; None when it had ended before."""
@@ -159,7 +162,7 @@ def killed_host(found, directory, is_full):
         while processes_of(image) or is_lock_held(image):
             if time.monotonic() > end:
                 return f"left: processes {processes_of(image)}, lock held {is_lock_held(image)}"
-        return rerun(migration, image)
+        return migration.rerun(image)
     return len(KILLED), matrix.judge_all(KILLED, judge)
 
 

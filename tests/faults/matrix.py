@@ -1,90 +1,159 @@
-"""Fails or kills a command at every system call that it makes, one at a time, under strace.
+"""Fails or kills a command at every system call that it makes, one at a time.
 
-strace counts the calls of one name for each process on its own; a call is hit only when it is among the
-traced ones. SIGKILL comes before the call acts, so killing before every call covers every point between.
+fault_injector does the work: it counts the calls of one name for the command's own process (generation 0)
+and for those that it forks (generation 1) on their own. SIGKILL comes before the call acts, so killing
+before every call covers every point between.
 """
 
 import collections
 import concurrent.futures
+import errno
+import functools
 import os
+import pathlib
 import re
 import signal
 import subprocess
 import threading
 
+BUILD = pathlib.Path(os.environ.get("BUILD", pathlib.Path(__file__).resolve().parents[2] / "build/release"))
+INJECTOR = str(BUILD / "bin/fault_injector")
+_NUMBERS = "/usr/include/x86_64-linux-gnu/asm/unistd_64.h"
+
 # The errors that each call's manual page lists and that fit a file, a descriptor or a process of ours.
 ERRORS = {
-    "openat": "EACCES EMFILE ENFILE ENOSPC EROFS EIO EINTR ELOOP ENOMEM ENOENT",
-    "read": "EIO EINTR EISDIR", "pread64": "EIO EINTR", "lseek": "EINVAL",
+    "openat": "EACCES EMFILE ENFILE ENOSPC EROFS EIO EINTR ELOOP ENOMEM ENOENT", "openat2": "EACCES EMFILE EIO",
+    "read": "EIO EINTR EISDIR", "pread64": "EIO EINTR", "readv": "EIO EINTR", "lseek": "EINVAL",
     "write": "ENOSPC EDQUOT EIO EFBIG EINTR", "pwrite64": "ENOSPC EDQUOT EIO EINTR",
-    "fsync": "EIO ENOSPC EDQUOT EROFS", "fdatasync": "EIO ENOSPC",
-    "close": "EIO EINTR ENOSPC", "fchown": "EPERM EIO EROFS EDQUOT", "fchmod": "EPERM EROFS EIO",
+    "writev": "ENOSPC EDQUOT EIO EFBIG EINTR", "copy_file_range": "ENOSPC EIO EXDEV",
+    "fsync": "EIO ENOSPC EDQUOT EROFS", "fdatasync": "EIO ENOSPC", "syncfs": "EIO ENOSPC",
+    "close": "EIO EINTR ENOSPC", "close_range": "ENOMEM", "fchown": "EPERM EIO EROFS EDQUOT",
+    "fchownat": "EPERM EIO EROFS", "fchmod": "EPERM EROFS EIO", "chmod": "EPERM EROFS EIO EACCES",
+    "chown": "EPERM EROFS EIO EDQUOT", "lchown": "EPERM EROFS EIO", "futimesat": "EACCES EROFS", "fchmodat": "EPERM EROFS EIO",
+    "utimensat": "EACCES EROFS",
     "rename": "EXDEV EACCES EPERM ENOSPC EROFS EIO ENOENT EISDIR EBUSY EDQUOT",
-    "renameat": "EXDEV EACCES EIO", "unlink": "EACCES EIO EBUSY ENOENT",
-    "unlinkat": "EACCES EIO ENOENT", "newfstatat": "EACCES EIO ELOOP ENOENT ENOMEM", "fstat": "EIO",
-    "access": "EACCES", "faccessat2": "EACCES", "readlink": "EACCES EINVAL",
-    "ftruncate": "EIO ENOSPC EFBIG", "fallocate": "ENOSPC EIO EOPNOTSUPP EINTR",
-    "mkdir": "EACCES ENOSPC EROFS EEXIST", "mkdirat": "EACCES ENOSPC",
-    "flock": "EINTR ENOLCK EWOULDBLOCK", "fcntl": "EINTR ENOLCK EAGAIN", "mmap": "ENOMEM",
-    "getdents64": "EIO", "pipe2": "EMFILE", "getrandom": "EINTR ENOSYS",
+    "renameat": "EXDEV EACCES EIO ENOSPC", "renameat2": "EXDEV EACCES EIO ENOSPC EEXIST EINVAL",
+    "link": "EACCES EEXIST EMLINK EPERM EIO", "linkat": "EACCES EEXIST EMLINK EPERM EIO ENOSPC",
+    "unlink": "EACCES EIO EBUSY ENOENT", "unlinkat": "EACCES EIO ENOENT",
+    "newfstatat": "EACCES EIO ELOOP ENOENT ENOMEM", "fstat": "EIO ENOMEM", "stat": "EACCES EIO ENOENT",
+    "lstat": "EACCES EIO ENOENT", "statx": "EACCES EIO ENOENT ENOMEM", "fstatfs": "EIO ENOMEM",
+    "statfs": "EACCES EIO", "access": "EACCES EIO ENOENT", "faccessat": "EACCES EIO",
+    "faccessat2": "EACCES EIO", "readlink": "EACCES EINVAL EIO", "readlinkat": "EACCES EINVAL EIO",
+    "getcwd": "ENOENT", "chdir": "EACCES",
+    "ftruncate": "EIO ENOSPC EFBIG", "fallocate": "ENOSPC EIO EOPNOTSUPP EINTR", "fadvise64": "EINVAL",
+    "mkdir": "EACCES ENOSPC EROFS EEXIST", "mkdirat": "EACCES ENOSPC EROFS", "rmdir": "EACCES EBUSY",
+    "getdents64": "EIO ENOENT", "flock": "EINTR ENOLCK EWOULDBLOCK", "fcntl": "EINTR ENOLCK EAGAIN EMFILE",
+    "ioctl": "ENOTTY", "dup": "EMFILE", "dup2": "EBUSY EINTR EMFILE", "dup3": "EBUSY EINTR EMFILE",
+    "pipe2": "EMFILE ENFILE", "eventfd2": "EMFILE ENFILE ENOMEM", "signalfd4": "EMFILE ENFILE ENOMEM",
+    "mmap": "ENOMEM EAGAIN", "mremap": "ENOMEM", "mprotect": "ENOMEM EACCES", "madvise": "EAGAIN",
+    "getrandom": "EINTR ENOSYS", "socket": "EMFILE ENFILE EACCES", "socketpair": "EMFILE ENFILE",
+    "connect": "EACCES ENOENT ECONNREFUSED", "sendto": "EPIPE ENOBUFS EINTR ENOMEM",
+    "sendmsg": "EPIPE ENOBUFS EINTR ENOMEM", "recvfrom": "EINTR EAGAIN ECONNRESET ENOMEM",
+    "recvmsg": "EINTR EAGAIN ECONNRESET ENOMEM", "setsockopt": "ENOMEM", "shutdown": "ENOTCONN",
+    "poll": "EINTR ENOMEM", "ppoll": "EINTR ENOMEM", "clock_nanosleep": "EINTR", "nanosleep": "EINTR",
+    "clone": "EAGAIN ENOMEM", "clone3": "EAGAIN ENOMEM", "fork": "EAGAIN ENOMEM", "vfork": "EAGAIN ENOMEM",
+    "execve": "EACCES EAGAIN EIO ENOENT ENOMEM ETXTBSY", "wait4": "EINTR ECHILD", "waitid": "EINTR ECHILD",
+    "pidfd_open": "EMFILE ENFILE ENOMEM ENOSYS", "kill": "EPERM ESRCH", "prctl": "EINVAL EPERM",
+    "prlimit64": "EPERM", "setrlimit": "EPERM", "setsid": "EPERM", "getsid": "ESRCH", "rt_sigaction": "EINVAL",
+    "rt_sigprocmask": "EINVAL", "sigaltstack": "ENOMEM", "sysinfo": "EFAULT", "uname": "EFAULT",
 }
-TRACED = ",".join(sorted(ERRORS)) + ",exit_group"
-_LINE = re.compile(r"^(\d+)\s+(\w+)\(")
+# These cannot fail, or not with arguments like ours.
+CANNOT_FAIL = set("exit exit_group getpid getppid gettid getuid geteuid getgid getegid umask munmap arch_prctl"
+                  " set_tid_address set_robust_list rseq futex sched_yield sched_getaffinity time gettimeofday"
+                  " clock_gettime clock_getres rt_sigreturn restart_syscall".split())
+# The C library's own malloc does not survive that this fails; row S9 has allocations that fail.
+CANNOT_FAIL.add("brk")
 
-Case = collections.namedtuple("Case", "call fault nth lasting")
+# A system call: its name, the how-manieth of the name, and the generation of the process.
+Call = collections.namedtuple("Call", "call nth generation")
+# What happens to it: an error's name, SIGKILL, or POWER CUT, which kills all processes.
+Case = collections.namedtuple("Case", "call fault nth lasting generation", defaults=(0,))
+POWER_CUT = "POWER CUT"
+
+
+class NotHit(Exception):
+    """The command ended before the call: nothing has been tried."""
+
+
+class UnknownCall(Exception):
+    """A command makes a call of which ERRORS says nothing."""
+
+
+@functools.cache
+def _numbers():
+    with open(_NUMBERS, encoding="ascii") as header:
+        return {match[1]: int(match[2]) for match in re.finditer(r"#define __NR_(\w+) (\d+)", header.read())}
 
 
 def name_of(case):
-    return f"{case.call}:{case.fault}:{case.nth}{'+' if case.lasting else ''}"
+    who = "child " if case.generation else ""
+    return f"{who}{case.call}:{case.fault}:{case.nth}{'+' if case.lasting else ''}"
 
 
-def traced_calls(command, environment, trace, after):
-    """The calls of the command from the first line on that matches `after`: (call, number) each."""
-    subprocess.run(["strace", "-f", "-qq", "-o", trace, "-e", "trace=" + TRACED, "--", *command],
-                   env=environment, check=False, stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL)
+def traced_calls(command, environment, after):
+    """The calls of an unharmed run, in their order, from the first line "GENERATION NAME PATH" on that
+    matches `after`."""
+    names = {number: name for name, number in _numbers().items()}
+    done = subprocess.run([INJECTOR, "list", *command], env=environment, check=False, stdin=subprocess.DEVNULL,
+                          stdout=subprocess.PIPE, text=True, errors="replace", timeout=600)
     counts, calls, on = collections.Counter(), [], False
-    with open(trace, errors="replace") as lines:
-        for line in lines:
-            if not (match := _LINE.match(line)):
-                continue
-            process, call = match[1], match[2]
-            counts[process, call] += 1
-            on = on or re.search(after, line) is not None
-            if on:
-                calls.append((call, counts[process, call]))
-    return list(dict.fromkeys(calls))
+    for line in done.stdout.splitlines():
+        if not (match := re.match(r"(\d+) (\d+)(.*)", line)):
+            continue
+        generation, name = int(match[1]), names.get(int(match[2]), match[2])
+        counts[generation, name] += 1
+        on = on or re.search(after, f"{generation} {name}{match[3]}") is not None
+        if on:
+            calls.append(Call(name, counts[generation, name], generation))
+    return calls
 
 
-def kills(calls):
-    return [Case(call, "SIGKILL", nth, False) for call, nth in calls]
+def always(traces):
+    """The calls that every one of several runs makes: how often a host asks for its child, or the C library
+    for random numbers, depends on the moment."""
+    others = [set(trace) for trace in traces[1:]]
+    return [call for call in traces[0] if all(call in other for other in others)]
+
+
+def kills(calls, fault="SIGKILL"):
+    return [Case(call, fault, nth, False, generation) for call, nth, generation in calls]
 
 
 def errors(calls, lasting=False):
     """A lasting EINTR is left out: nothing can end a loop that goes on after it."""
-    return [Case(call, error, nth, lasting) for call, nth in calls
+    if unknown := sorted({call.call for call in calls} - ERRORS.keys() - CANNOT_FAIL):
+        raise UnknownCall(f"of these calls nobody has said how they fail: {' '.join(unknown)}")
+    return [Case(call, error, nth, lasting, generation) for call, nth, generation in calls
             for error in ERRORS.get(call, "").split() if not (lasting and error == "EINTR")]
 
 
+def injection(case):
+    """What goes in front of a command, which then prints "hit" when the fault has come."""
+    how = {"SIGKILL": "kill", POWER_CUT: "cut"}.get(case.fault) or str(getattr(errno, case.fault))
+    return [INJECTOR, "hit", str(case.generation), str(_numbers()[case.call]),
+            f"{case.nth}{'+' if case.lasting else ''}", how]
+
+
 def run_with(case, command, environment, limit=30):
-    """The command's exit code under the fault; -9 and the like for a signal, "hang" past the limit."""
-    inject = ("signal=SIGKILL" if case.fault == "SIGKILL" else "error=" + case.fault)
-    when = f"{case.nth}{'+' if case.lasting else ''}"
-    process = subprocess.Popen(
-        ["strace", "-f", "-qq", "-o", "/dev/null", "-e", "trace=" + case.call,
-         "-e", f"inject={case.call}:{inject}:when={when}", "--", *command],
-        env=environment, start_new_session=True, stdin=subprocess.DEVNULL,
-        stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL)
+    """The command's exit code under the fault; -9 and the like for a signal, "hang" past the limit, also
+    when a process of the command's does not end."""
+    process = subprocess.Popen([*injection(case), *command], env=environment, start_new_session=True,
+                               stdin=subprocess.DEVNULL, stdout=subprocess.PIPE, stderr=subprocess.DEVNULL)
     try:
-        return process.wait(limit)
+        output, _ = process.communicate(timeout=limit)
     except subprocess.TimeoutExpired:
         os.killpg(process.pid, signal.SIGKILL)
         process.wait()
         return "hang"
+    if b"hit" not in output:
+        raise NotHit("the fault never came")
+    return process.returncode
 
 
 def judge_all(cases, judge, workers=2):
     """Calls judge(case, worker) for each; what is wrong with the outcomes: (case, text) for each bad one.
-    `worker` is a number from 0 below `workers`; no two calls at one time have the same."""
+    A case that cannot be judged is bad. `worker` is a number from 0 below `workers`; no two calls at one
+    time have the same."""
     free = list(range(workers))
     lock = threading.Lock()
 
@@ -93,6 +162,8 @@ def judge_all(cases, judge, workers=2):
             worker = free.pop()
         try:
             return judge(case, worker)
+        except Exception as failure:  # whatever it is, the other cases are to be tried
+            return f"{type(failure).__name__}: {failure}"
         finally:
             with lock:
                 free.append(worker)

@@ -1,253 +1,174 @@
-"""Migrations that are killed or fail on the way, and run again: rows M1 to M3 and M5 of docs/reliability.md.
+"""Migrations that are killed or fail on the way, and run again: rows M1 to M3 of docs/reliability.md.
 
-The image holds a retired account with records of all five kinds, one that is not retired, and records of
-the device's own, some of them equal to the service's. After a re-run each record is in the local store or in
-a retired one, none of the local ones has changed, and none is there twice.
+Faults hit the migrator, which the host runs as its child, and in the rows M1 and M3 the host as well.
+After each the image is looked at as it was left, then the host runs again, and the image is looked at
+against what a migration leaves that nothing disturbed.
 """
 
-import os
-import pathlib
-import plistlib
 import random
-import shutil
-import sqlite3
 import subprocess
 
 import matrix
-from settings_image import NAME, PREFERENCES
+from migration_image import SELECTED, SELECTED_STORES, MigrationImage, environment
+from migration_state import Rules, State
 
-DATABASES = {"contacts": "Contacts/Contacts.sqlite", "calendars": "Calendars/Calendars.sqlite",
-             "reminders": "Calendars/Calendars.sqlite", "bookmarks": "Bookmarks/Bookmarks.sqlite",
-             "notes": "Notes/Notes.sqlite"}
-SETTINGS = f"{PREFERENCES}/{NAME}"
-# Done; done, with records left behind; refused at the start.
-ENDS_ALLOWED = {0, 3}
-FIRST_CALL = r"flock\("
-
-
-def cards(prefix, count):
-    return "".join(f"BEGIN:VCARD\r\nVERSION:3.0\r\nUID:{prefix}{i}\r\nFN:{prefix} {i}\r\nN:{i};{prefix};;;\r\n"
-                   "END:VCARD\r\n" for i in range(count))
+# The exit codes of the manual page that a run without a signal to the host itself may have.
+DONE, FAILED, LEFT_BEHIND, WRONG, REFUSED, CRASHED, BUSY = 0, 1, 3, 5, 7, 8, 11
+DOCUMENTED = {DONE, FAILED, LEFT_BEHIND, WRONG, REFUSED, CRASHED, BUSY}
+HOST, CHILD = 0, 1
+FIRST_CALL = r"^0 flock"
+LIMIT = 120  # seconds, after which a host counts as hanging
+RECORDS = 1000
+TRACES = 3
+SEED = 20261121
 
 
-def components(kind, prefix, count):
-    body = "".join(f"BEGIN:{kind}\r\nUID:{prefix}{i}\r\nDTSTAMP:20260101T000000Z\r\nDTSTART:20260101T000000Z\r\n"
-                   f"SUMMARY:{prefix} {i}\r\nEND:{kind}\r\n" for i in range(count))
-    return f"BEGIN:VCALENDAR\r\nVERSION:2.0\r\nPRODID:-//test//\r\n{body}END:VCALENDAR\r\n"
+class Migration(MigrationImage):
+    """An image to be migrated, the calls of its migration, and the rules for what is left."""
 
-
-def bookmarks(prefix, count):
-    links = "".join(f'<DT><A HREF="http://{prefix}{i}.example/">{prefix} {i}</A>\n' for i in range(count))
-    return f"<!DOCTYPE NETSCAPE-Bookmark-file-1>\n<DL><p>\n{links}</DL><p>\n"
-
-
-def note(prefix):
-    return f"Subject: {prefix}\n\nText of {prefix}\n"
-
-
-class Migration:
     def __init__(self, found, directory, count):
-        self.found = found
-        self.directory = pathlib.Path(directory)
-        self.base = self.directory / "base"
-        self._make(count)
-        self.records = self.contents(self.base)
-        self.local = self.contents(self.base, "account IS NULL")
+        super().__init__(found, directory, count)
+        self.rules = Rules(self.begin, self.end, SELECTED, SELECTED_STORES)
+        self.calls = matrix.always([self._traced() for _ in range(TRACES)])
+        self._learn_settings()
 
-    def _tool(self, *arguments):
-        subprocess.run([self.found["device-image"], *map(str, arguments)], check=True,
-                       stdout=subprocess.DEVNULL)
+    def _traced(self):
+        return matrix.traced_calls(self.command(self.copy("traced")), environment(), FIRST_CALL)
 
-    def _make(self, count):
-        self._tool("create", self.base, "--without-services", "--sync-account-name", "ada")
-        self._tool("add-account", self.base, "--type", "Quillnet", "--identifier", "Q1", "--status", 1,
-                   "--username", "ada", *[word for name in DATABASES for word in ("--enable", name)])
-        self._tool("add-account", self.base, "--type", "Quillnet", "--identifier", "Q2", "--status", 0,
-                   "--username", "bo", "--enable", "contacts")
-        for account, prefixes in (("Q1", ("service", "both")), (None, ("own", "both"))):
-            for prefix in prefixes:
-                self._fill(account, prefix, count)
+    def _learn_settings(self):
+        """The settings file of every moment: that before each rename of a run, and the last one."""
+        self.rules.settings = {self.begin.settings, self.end.settings}
+        for call in self.calls_of(CHILD):
+            if call.call == "rename":
+                image = self.copy("traced")
+                matrix.run_with(matrix.kills([call])[0], self.command(image), environment(), LIMIT)
+                self.rules.settings.add(self.look(image).settings)
 
-    def _fill(self, account, prefix, count):
-        texts = {"contacts": ("vcf", cards(prefix, count)),
-                 "calendars": ("ics", components("VEVENT", prefix, count)),
-                 "reminders": ("ics", components("VTODO", prefix, count)),
-                 "bookmarks": ("html", bookmarks(prefix, count)), "notes": ("txt", note(prefix))}
-        for dataclass, (suffix, text) in texts.items():
-            file = self.directory / f"{prefix}.{suffix}"
-            file.write_bytes(text.encode())
-            self._tool("import", self.base, "--dataclass", dataclass,
-                       *(["--account", account] if account else []), file)
+    def calls_of(self, generation):
+        return [call for call in self.calls if call.generation == generation]
 
-    def command(self, image):
-        return [self.found["migration-host"], "run", "--image", str(image), "--quiet"]
+    def look(self, image, left_out=""):
+        return State(image.parent, self.directory, left_out)
 
-    def copy(self, worker):
-        image = self.directory / f"m{worker}"
-        shutil.rmtree(image, ignore_errors=True)
-        shutil.copytree(self.base, image, symlinks=True)
-        if os.geteuid() == 0:
-            for path in [image, *image.rglob("*")]:
-                there = (self.base / path.relative_to(image)).lstat()
-                os.chown(path, there.st_uid, there.st_gid, follow_symlinks=False)
-        return image
+    def run(self, image):
+        return subprocess.run(self.command(image), env=environment(), check=False, timeout=LIMIT,
+                              stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL).returncode
 
-    @staticmethod
-    def contents(image, where="1"):
-        """How often each record's content lies in the stores: {(kind, content): count}."""
-        found = {}
-        for name in sorted(set(DATABASES.values())):
-            path = image / "var/mobile/Library" / name
-            if not path.exists():
-                continue
-            database = sqlite3.connect(f"file:{path}?mode=ro", uri=True)
+    def run_under(self, case, worker):
+        """The image of the worker after a run with the fault, and the exit code. How often the host asks for
+        its child depends on the moment: when it ends before the call, an earlier one of the name is hit."""
+        for nth in (case.nth, case.nth // 2, case.nth // 4):
+            image = self.copy(worker)
             try:
-                rows = database.execute(
-                    "SELECT records.kind, content FROM records"
-                    f" JOIN stores ON stores.id = records.store WHERE {where}").fetchall()
-            finally:
-                database.close()
-            for kind, content in rows:
-                found[kind, content] = found.get((kind, content), 0) + 1
-        return found
+                return image, matrix.run_with(case._replace(nth=max(1, nth)), self.command(image), environment(),
+                                              LIMIT)
+            except matrix.NotHit:
+                if case.generation != HOST:
+                    raise
+        raise matrix.NotHit("the host never came to the call")
 
-    def damage(self, image):
-        """What is wrong with the databases, asked of SQLite itself."""
-        for name in sorted(set(DATABASES.values())):
-            path = image / "var/mobile/Library" / name
-            if path.exists():
-                database = sqlite3.connect(path)
-                try:
-                    for pragma in ("integrity_check", "foreign_key_check"):
-                        rows = database.execute(f"PRAGMA {pragma}").fetchall()
-                        if rows not in ([], [("ok",)]):
-                            return f"{name}: {pragma} says {rows[:3]}"
-                finally:
-                    database.close()
-        return ""
-
-    def records_of(self, name):
-        """What the one database holds at the beginning."""
-        database = sqlite3.connect(f"file:{self.base}/var/mobile/Library/{name}?mode=ro", uri=True)
-        try:
-            return database.execute("SELECT kind, content FROM records").fetchall()
-        finally:
-            database.close()
-
-    def judge_end(self, image):
-        """After the last run: retired, and nothing lost or doubled."""
-        if wrong := self.damage(image):
-            return wrong
-        local = self.contents(image, "account IS NULL AND retired_at IS NULL")
-        everywhere = self.contents(image)
-        lost = [record for record in self.records if record not in everywhere]
-        if lost:
-            return f"{len(lost)} records are lost"
-        if missing := [record for record in self.records if record not in local]:
-            return f"{len(missing)} records are not in the local stores"
-        if doubled := [record for record, count in local.items() if count > 1]:
-            return f"{len(doubled)} records are doubled in the local stores"
-        identifiers = {entry.get("Identifier") for entry in
-                       plistlib.loads((image / SETTINGS).read_bytes())["Accounts"]}
-        if "Q1" in identifiers or "Q2" not in identifiers:
-            return f"the accounts are {sorted(map(str, identifiers))}"
-        stale = [path.name for path in (image / "tmp").iterdir() if path.name != "AccountMigrationInProgress"]
-        return f"temporary files are left: {stale}" if stale else ""
+    def rerun(self, image):
+        """What is wrong after another run, which must do all that was left to do."""
+        code = self.run(image)
+        return f"the run after that ended with {code}" if code != DONE else self.rules.wrong_at_end(self.look(image))
 
 
-def environment():
-    return {"PATH": os.environ["PATH"], "LC_ALL": "C"}
-
-
-def rerun(migration, image):
-    code = subprocess.run(migration.command(image), env=environment(), check=False,
-                          stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL).returncode
-    if code not in ENDS_ALLOWED:
-        return f"the re-run ended with {code}"
-    return migration.judge_end(image)
-
-
-def traced(migration, directory):
-    image = migration.copy("t")
-    return matrix.traced_calls(migration.command(image), environment(), str(directory / "trace"), FIRST_CALL)
-
-
-def sampled(cases, every):
-    return cases[::every]
-
-
-def prepared(found, directory, is_full, name):
+def prepared(found, directory, count, name):
     place = directory / name
     place.mkdir()
-    return Migration(found, place, 1000 if is_full else 5), place
+    return Migration(found, place, count)
+
+
+def spread(cases, number):
+    """That many of the cases, in even distances, with the first and the last."""
+    number = min(number, len(cases))
+    return [cases[index * (len(cases) - 1) // max(1, number - 1)] for index in range(number)]
+
+
+def told(row, cases, all_cases):
+    """Says which part of the cases is tried."""
+    child = sum(case.generation == CHILD for case in cases)
+    every = sum(case.generation == CHILD for case in all_cases)
+    print(f"     {row} {child} of {every} cases in the migrator, {len(cases) - child} of"
+          f" {len(all_cases) - every} in the host", flush=True)
+    return cases
+
+
+def sampled(row, cases, in_child, in_host):
+    child = [case for case in cases if case.generation == CHILD]
+    host = [case for case in cases if case.generation == HOST]
+    return told(row, spread(child, in_child) + spread(host, in_host), cases)
+
+
+def wrong_end_of_killed(case, code):
+    expected = -9 if case.generation == HOST else CRASHED
+    return "" if code == expected else f"the host ended with {code}"
 
 
 def kill_and_rerun(found, directory, is_full):
-    migration, place = prepared(found, directory, is_full, "m1")
-    cases = sampled(matrix.kills(traced(migration, place)), 1 if is_full else 25)
+    migration = prepared(found, directory, RECORDS if is_full else 6, "m1")
+    cases = sampled("M1", matrix.kills(migration.calls), *((3000, 300) if is_full else (240, 60)))
 
     def judge(case, worker):
-        image = migration.copy(worker)
-        matrix.run_with(case, migration.command(image), environment(), limit=120)
-        return rerun(migration, image)
+        image, code = migration.run_under(case, worker)
+        return wrong_end_of_killed(case, code) or migration.rules.wrong_after_kill(migration.look(image)) or \
+            migration.rerun(image)
     return len(cases), matrix.judge_all(cases, judge)
 
 
 def kill_twice(found, directory, is_full):
-    """The second run is killed at another call of its own, and a third one follows."""
-    migration, place = prepared(found, directory, is_full, "m2")
-    kills = matrix.kills(traced(migration, place))
-    chance = random.Random(20261121)
-    pairs = [(first, chance.choice(kills)) for first in sampled(kills, 7 if is_full else 100)]
+    """The second run is killed too, at a call of its own if it comes that far, and a third one follows."""
+    migration = prepared(found, directory, RECORDS if is_full else 6, "m2")
+    kills = matrix.kills(migration.calls_of(CHILD))
+    chance = random.Random(SEED)
+    pairs = [(first, chance.choice(kills)) for first in spread(kills, 500 if is_full else 40)]
 
     def judge(pair, worker):
-        image = migration.copy(worker)
-        for case in pair:
-            matrix.run_with(case, migration.command(image), environment(), limit=120)
-        return rerun(migration, image)
+        image, code = killed_twice(migration, *pair, worker)
+        return wrong_end_of_killed(pair[1], code) or migration.rules.wrong_after_kill(migration.look(image)) or \
+            migration.rerun(image)
     bad = matrix.judge_all(pairs, judge)
     return len(pairs), [(" then ".join(map(matrix.name_of, pair)), text) for pair, text in bad]
 
 
+def killed_twice(migration, first, second, worker):
+    """The image, and the exit code of the second run. That one has less to do and may end before the call:
+    then all is done again with an earlier call of the name, and at last with the migrator's exit."""
+    for attempt in (second, second._replace(nth=max(1, second.nth // 4)),
+                    second._replace(call="exit_group", nth=1)):
+        image, code = migration.run_under(first, worker)
+        if wrong := wrong_end_of_killed(first, code):
+            return image, f"{wrong} in the first run"
+        try:
+            return image, matrix.run_with(attempt, migration.command(image), environment(), LIMIT)
+        except matrix.NotHit:
+            continue
+    raise matrix.NotHit("the second run makes none of the calls")
+
+
 def fail_and_rerun(found, directory, is_full):
-    migration, place = prepared(found, directory, is_full, "m3")
-    cases = sampled(matrix.errors(traced(migration, place)), 1 if is_full else 97)
+    migration = prepared(found, directory, 100 if is_full else 6, "m3")
+    cases = sampled("M3", matrix.errors(migration.calls), *((2400, 400) if is_full else (200, 60)))
+    rules = migration.rules
 
     def judge(case, worker):
-        image = migration.copy(worker)
-        code = matrix.run_with(case, migration.command(image), environment(), limit=120)
-        if code == "hang" or code < 0:
+        image, code = migration.run_under(case, worker)
+        left = migration.look(image)
+        if code not in DOCUMENTED:
             return f"the host ended with {code}"
-        if migration.damage(image):
-            return migration.damage(image)
-        lost = [record for record in migration.records if record not in migration.contents(image)]
-        if lost:
-            return f"{len(lost)} records are lost, exit code {code}"
-        # What is retired has left the settings with its account: the records lie in a retired store.
-        identifiers = {entry.get("Identifier") for entry in
-                       plistlib.loads((image / SETTINGS).read_bytes())["Accounts"]}
-        return rerun(migration, image) if "Q1" in identifiers else ""
+        if wrong := rules.wrong_always(left) or rules.wrong_in_run(migration.begin, left, code):
+            return f"{wrong}; the host had ended with {code}"
+        again = migration.run(image)
+        if again not in (DONE, LEFT_BEHIND):
+            return f"the run after that ended with {again}, the first with {code}"
+        end = migration.look(image)
+        wrong = rules.wrong_always(end) or rules.wrong_in_run(left, end, again) or rules.wrong_remains(end)
+        return f"{wrong}; the host had ended with {code}, then {again}" if wrong else ""
     return len(cases), matrix.judge_all(cases, judge)
-
-
-def two_at_once(found, directory, is_full):
-    migration, _ = prepared(found, directory, is_full, "m5")
-    rounds, bad = 20, []
-    for number in range(rounds):
-        image = migration.copy(0)
-        hosts = [subprocess.Popen(migration.command(image), env=environment(), stdout=subprocess.DEVNULL,
-                                  stderr=subprocess.DEVNULL) for _ in range(2)]
-        codes = sorted(host.wait() for host in hosts)
-        if codes not in ([0, 0], [0, 11], [0, 3], [3, 3], [3, 11]):
-            bad.append((number, f"two hosts ended with {codes}"))
-        elif text := rerun(migration, image):
-            bad.append((number, text))
-    return rounds, bad
 
 
 ROWS = {
     "M1": ("a migration is killed at a system call, then run again", kill_and_rerun),
     "M2": ("the second run is killed too, then a third run", kill_twice),
-    "M3": ("a system call of a migration fails", fail_and_rerun),
-    "M5": ("two hosts at once, and a host run again", two_at_once),
+    "M3": ("a system call of a migration fails, then run again", fail_and_rerun),
 }

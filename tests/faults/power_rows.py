@@ -6,6 +6,7 @@ import subprocess
 
 import matrix
 import migration_rows
+from migration_image import environment
 from save_rows import next_save
 from starting_points import STARTS, Images, StartedCase
 
@@ -39,11 +40,6 @@ def make_file_system(name, path, content):
     return ""
 
 
-def strace_of(case):
-    return ["strace", "-f", "-qq", "-o", "/dev/null", "-e", "trace=" + case.call,
-            "-e", f"inject={case.call}:signal=SIGKILL:when={case.nth}", "--"]
-
-
 def cut(base, name, work, sync, command, environment):
     """Runs the command on a copy of the file system and cuts the power when it has been killed: the
     directory with what is left, or None and why."""
@@ -51,6 +47,8 @@ def cut(base, name, work, sync, command, environment):
     done = subprocess.run(
         ["unshare", "-m", str(CUT), str(base), FILE_SYSTEMS[name][2], str(work), sync, *command],
         env=environment, check=False, capture_output=True, text=True, timeout=120)
+    if done.returncode >= 100 and "hit" not in done.stdout:
+        raise matrix.NotHit("the command ended before the call")
     return (work / "found/i", "") if done.returncode >= 100 else (None, done.stderr.strip()[-200:])
 
 
@@ -87,7 +85,7 @@ def cut_saves(found, directory, is_full):
         images = starts[start]
         first, work = images.images[0], place / f"cut{worker}"
         before = first.at(work / "m/i" / first.root.name, first)
-        left, why = cut(bases[name][worker], name, work, sync, [*strace_of(kill), *images.command(before)],
+        left, why = cut(bases[name][worker], name, work, sync, [*matrix.injection(kill), *images.command(before)],
                         before.environment())
         if left is None:
             return f"the test could not be set up: {why}"
@@ -102,20 +100,28 @@ def cut_saves(found, directory, is_full):
 
 
 def cut_migrations(found, directory, is_full):
-    """After the cut a second run ends the work, and no record is lost or doubled."""
-    migration, place = migration_rows.prepared(found, directory, is_full, "m4")
-    kills = migration_rows.sampled(matrix.kills(migration_rows.traced(migration, place)), 10 if is_full else 400)
-    bases = file_systems(("ext4", "xfs"), place, migration.base)
-    cases = [(name, kill, sync) for name in bases for kill in kills for sync in ("", "sync")]
+    """The power goes before a call of the migrator, before its end, and when the host is done. A second run
+    ends the work; after the host's end there is nothing left to do."""
+    migration = migration_rows.prepared(found, directory, migration_rows.RECORDS if is_full else 6, "m4")
+    kills = matrix.kills(migration.calls_of(migration_rows.CHILD), matrix.POWER_CUT)
+    end = matrix.kills(migration.calls_of(migration_rows.HOST)[-1:], matrix.POWER_CUT)
+    if end[0].call != "exit_group":
+        raise RuntimeError(f"the host's last call is {end[0].call}")
+    sample = migration_rows.told("M4", migration_rows.spread(kills, 80 if is_full else 9) + end, kills + end)
+    bases = file_systems(("ext4", "xfs"), migration.directory, migration.base)
+    cases = [(name, kill, sync) for name in bases for kill in sample for sync in ("", "sync")]
 
     def judge(case, worker):
         name, kill, sync = case
-        work = place / f"cut{worker}"
-        left, why = cut(bases[name][worker], name, work, sync, [*strace_of(kill), *migration.command(work / "m/i")],
-                        migration_rows.environment())
+        work = migration.directory / f"cut{worker}"
+        left, why = cut(bases[name][worker], name, work, sync,
+                        [*matrix.injection(kill), *migration.command(work / "m/i/image")], environment())
         if left is None:
             return f"the test could not be set up: {why}"
-        return migration_rows.rerun(migration, left)
+        state = migration.look(left / "image")
+        if kill in end:
+            return migration.rules.wrong_at_end(state)
+        return migration.rules.wrong_after_kill(state) or migration.rerun(left / "image")
     bad = matrix.judge_all(cases, judge)
     return len(cases), named(bad)
 

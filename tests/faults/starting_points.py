@@ -129,15 +129,18 @@ class Images:
         self.images = [make(tools, directory / f"image{start.replace(' ', '-')}{i}") for i in range(workers)]
         for image in self.images:
             image.learn(self.command(image), image.environment())
-        self.calls = self._calls(first, directory)
+        self.calls = self._calls(first)
         if end:
-            self.calls = self.calls[:-len(self._calls(end, directory))]
+            self.calls = self.calls[:-len(self._calls(end))]
         if not self.calls:
             raise SystemExit(f"a save of {start} settings makes none of the calls that are to be tried")
 
-    def _calls(self, first, directory):
+    def _calls(self, first):
+        return matrix.always([self._traced(first) for _ in range(3)])
+
+    def _traced(self, first):
         image = self.images[0]
-        calls = matrix.traced_calls(self.command(image), image.environment(), str(directory / "trace"), first)
+        calls = matrix.traced_calls(self.command(image), image.environment(), first)
         image.reset()
         return calls
 

@@ -1,4 +1,5 @@
 """A database that cannot be used is left alone and told of; the others are migrated."""
+import contextlib
 import os
 import shutil
 import sqlite3
@@ -72,20 +73,45 @@ class UnusableDatabases(hosttest.HostTestCase):
         self.assertEqual(before, (self.image / hosttest.SETTINGS).read_bytes())
         self.assertEqual(1, len(self.contents("calendars", SERVICE)))
 
+    @unittest.skipIf(shutil.which("strace") is None, "needs strace")
+    @unittest.skipIf(os.environ["SANITIZED"], "a sanitizer does not work under strace")
+    def test_one_in_which_the_migrator_died_is_rolled_back_before_it_is_judged(self):
+        run = self.run_host("--json", "--quiet", prefix=(
+            "strace", "-f", "-qq", "-o", os.devnull, "-P", str(self.contacts_file),
+            "-e", "inject=fdatasync:signal=SIGKILL:when=2"))  # the host makes one, the migrator more
+        self.assertEqual((8, "migrator failed", True),
+                         (run.code, run.report["outcome"], run.report["balanced"]), run.output)
+        self.assertFalse(any("damaged" in reason for reason in run.report["reasons"]),
+                         run.report["reasons"])
+        self.assertFalse(self.contacts_file.with_name("Contacts.sqlite-journal").exists())
+        self.assertEqual(0, self.run_host("--quiet").code)
+        self.assertEqual(2, len(self.contents("contacts")))
+
     def test_one_with_another_content_than_its_hashes_say(self):
         with sqlite3.connect(self.contacts_file) as database:
             database.execute("UPDATE records SET content = x'78'")
         database.close()
         self.check_that_contacts_are_left_alone("another content than its hash says")
 
-    def test_one_that_somebody_else_holds(self):
+    @contextlib.contextmanager
+    def held(self, begin):
         # In a process of its own: whoever closes a file loses the locks that he has on it.
         with subprocess.Popen(["sqlite3", self.contacts_file], stdin=subprocess.PIPE,
                               stdout=subprocess.PIPE, text=True) as holder:
-            holder.stdin.write("BEGIN EXCLUSIVE; SELECT 'held';\n")
+            holder.stdin.write(f"{begin}; SELECT 'held';\n")
             holder.stdin.flush()
             self.assertEqual("held\n", holder.stdout.readline())
+            yield
+
+    def test_one_that_somebody_else_holds(self):
+        with self.held("BEGIN EXCLUSIVE"):
             self.check_that_contacts_are_left_alone("database is locked")
+
+    def test_one_that_somebody_is_about_to_write_is_accounted_for(self):
+        with self.held("BEGIN IMMEDIATE"):
+            run = self.check_that_contacts_are_left_alone("it is in use", "database is locked")
+        self.assertEqual((1, 1), (run.report["dataclasses"][0]["service_before"],
+                                  run.report["dataclasses"][0]["left_behind"]))
 
     @hosttest.skip_unless_root
     def test_one_that_can_only_be_read_is_accounted_for(self):
