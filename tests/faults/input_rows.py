@@ -31,6 +31,12 @@ def damaged_lists(found, _directory, _is_full):
     return sum(count for count, _ in results), [text for _, bad in results for text in bad]
 
 
+def why_crashed(output, name):
+    """The indented lines behind the target's own: where the input lies, and what the fuzzer said last."""
+    found = re.search(rf"^{name} .*\n((?:    .*\n)*)", output, re.MULTILINE)
+    return " | ".join(line.strip() for line in found[1].splitlines())
+
+
 def fuzzed(_found, _directory, is_full):
     """Every target of fuzz/ for some seconds, or for five minutes each."""
     done = subprocess.run([str(TOP / "fuzz/run"), "25" if is_full else "0.5"], check=False,
@@ -38,8 +44,7 @@ def fuzzed(_found, _directory, is_full):
     lines = re.findall(r"^([a-z-]+) +(\d+) runs +(\d+) crashes$", done.stdout, re.MULTILINE)
     for name, runs, crashes in lines:
         print(f"     R2 {name:<14} {runs:>12} runs {crashes:>4} crashes", flush=True)
-    bad = [(name, "crashed; the input lies in build/fuzz/crashes") for name, _, crashes in lines
-           if crashes != "0"]
+    bad = [(name, why_crashed(done.stdout, name)) for name, _, crashes in lines if crashes != "0"]
     if not lines or (done.returncode != 0) != bool(bad):
         bad.append(("fuzz/run", f"ended with {done.returncode}: {done.stdout[-300:]}"))
     return sum(int(runs) for _, runs, _ in lines), bad
