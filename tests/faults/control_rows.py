@@ -10,6 +10,8 @@ import shutil
 import subprocess
 import time
 
+import matrix
+
 TOP = pathlib.Path(__file__).resolve().parents[2]
 HOST = ["device-image", "migration-host", "QuillnetAccountRemoval", "bundle_resources"]
 
@@ -88,7 +90,7 @@ class Copy:
 def run_row(control, make, found, place):
     """All bad cases, and those that show the sign of the control. The row prints what it has to say."""
     place.mkdir()
-    _, bad = make(found, place, False)
+    _, bad = matrix.run_row(make, found, place, False)
     shutil.rmtree(place)
     return bad, [text for _, text in bad if re.search(control.sign, text)]
 

@@ -15,6 +15,7 @@ import re
 import signal
 import subprocess
 import threading
+import traceback
 
 BUILD = pathlib.Path(os.environ.get("BUILD", pathlib.Path(__file__).resolve().parents[2] / "build/release"))
 INJECTOR = str(BUILD / "bin/fault_injector")
@@ -171,3 +172,13 @@ def judge_all(cases, judge, workers=2):
 
     with concurrent.futures.ThreadPoolExecutor(workers) as pool:
         return [(case, text) for case, text in zip(cases, pool.map(one, cases)) if text]
+
+
+def run_row(make, found, directory, is_full):
+    """The number of cases of a row, and the bad ones. A row that cannot be run is a bad case itself, so that the
+    others have their turn."""
+    try:
+        return make(found, directory, is_full)
+    except Exception as failure:
+        traceback.print_exc()
+        return 0, [("the row", f"could not be run: {type(failure).__name__}: {failure}")]

@@ -10,7 +10,7 @@ import pathlib
 import shutil
 import subprocess
 
-from migration_state import DATABASES, State
+from migration_state import Rules, State
 
 # The accounts that are to be retired, and the stores with their records.
 SELECTED = {"Q1", "Q2", "V1"}
@@ -19,6 +19,7 @@ DATACLASSES = ["contacts", "calendars", "reminders", "bookmarks", "notes"]
 # Of 1,000 records of the service, so many lie in each of the three stores with calendars, 10 are on the
 # device too, and 10 in another version.
 SHARED = 100
+LIMIT = 120  # seconds, after which a host counts as hanging
 
 
 def cards(prefix, numbers, text=""):
@@ -57,7 +58,8 @@ SUFFIX = {"contacts": "vcf", "calendars": "ics", "reminders": "ics", "bookmarks"
 
 class MigrationImage:
     """An image at directory/base/image with `count` records of each kind in the service's stores, and copies of it
-    for each worker. `begin` and `end` are its states before and after a run that nothing disturbed."""
+    for each worker. `begin` and `end` are its states before and after a run that nothing disturbed,
+    `rules` what holds of the states between."""
 
     def __init__(self, found, directory, count):
         self.found = found
@@ -66,10 +68,14 @@ class MigrationImage:
         self._make(count)
         self.begin = State(self.base, self.directory)
         image = self.copy("learning")
-        done = subprocess.run(self.command(image), env=environment(), check=False, capture_output=True, text=True)
-        if done.returncode != 0:
-            raise RuntimeError(f"a migration ends with {done.returncode} without any fault: {done.stdout[-500:]}")
+        done = subprocess.run(self.command(image), env=environment(), check=False, capture_output=True, text=True,
+                              timeout=LIMIT)
         self.end = State(image.parent, self.directory)
+        self.rules = Rules(self.begin, self.end, SELECTED, SELECTED_STORES)
+        if wrong := self.rules.wrong_at_end(self.end):
+            raise RuntimeError(f"a migration that nothing disturbs: {wrong}")
+        if done.returncode != 0:
+            raise RuntimeError(f"a migration that nothing disturbs ends with {done.returncode}: {done.stdout[-500:]}")
         self._check_learned(count)
 
     def _check_learned(self, count):
@@ -139,9 +145,6 @@ class MigrationImage:
         shutil.rmtree(place, ignore_errors=True)
         subprocess.run(["cp", "-a", str(self.base), str(place)], check=True)
         return place / "image"
-
-    def database(self, image, name):
-        return image / DATABASES[name]
 
 
 def environment():

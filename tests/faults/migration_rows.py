@@ -9,26 +9,24 @@ import random
 import subprocess
 
 import matrix
-from migration_image import SELECTED, SELECTED_STORES, MigrationImage, environment
-from migration_state import Rules, State
+from migration_image import LIMIT, MigrationImage, environment
+from migration_state import State
 
 # The exit codes of the manual page that a run without a signal to the host itself may have.
 DONE, FAILED, LEFT_BEHIND, WRONG, REFUSED, CRASHED, BUSY = 0, 1, 3, 5, 7, 8, 11
 DOCUMENTED = {DONE, FAILED, LEFT_BEHIND, WRONG, REFUSED, CRASHED, BUSY}
 HOST, CHILD = 0, 1
 FIRST_CALL = r"^0 flock"
-LIMIT = 120  # seconds, after which a host counts as hanging
 RECORDS = 1000
 TRACES = 3
 SEED = 20261121
 
 
 class Migration(MigrationImage):
-    """An image to be migrated, the calls of its migration, and the rules for what is left."""
+    """An image to be migrated, and the calls of its migration."""
 
     def __init__(self, found, directory, count):
         super().__init__(found, directory, count)
-        self.rules = Rules(self.begin, self.end, SELECTED, SELECTED_STORES)
         self.calls = matrix.always([self._traced() for _ in range(TRACES)])
         self._learn_settings()
 
