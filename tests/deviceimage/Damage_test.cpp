@@ -199,6 +199,25 @@ TEST(DatabaseCheck, FindsARowWithoutTheOneItRefersTo) {
           "row 1 of table \"records\" refers to a row of \"collections\" that is not there"));
 }
 
+TEST(ReadOnlyFolders, LeaveTheirNameToNoNewOne) {
+  const TemporaryImage image;
+  const auto add = [&](const char* uid) {
+    return image.stores()
+        .addRecords(Dataclass::notes, std::nullopt, std::vector{record(uid, "1")})
+        .status.isSuccess();
+  };
+  ASSERT_TRUE(add("a"));
+  runSQL(image.path(DeviceImage::databaseFile(platform::NotesSyncType)),
+         "UPDATE collections SET writable = 0, is_default = 0");
+  ASSERT_TRUE(add("b"));
+  RecordStores stores = image.stores();
+  const Row store = stores.findStore(Dataclass::notes, std::nullopt).store->row;
+  std::vector<std::string> names;
+  for (const Collection& folder : stores.listCollections(Dataclass::notes, store).collections)
+    names.push_back(folder.path.front());
+  EXPECT_EQ(names, (std::vector<std::string>{"Notes", "Notes 2"}));
+}
+
 TEST(FoldersThatHoldOneAnother, FailACopyInsteadOfGoingRoundForEver) {
   const TemporaryImage image;
   ASSERT_TRUE(

@@ -129,6 +129,56 @@ TEST(RecordStores, ListNestedFoldersAfterTheirParents) {
                                  Lines{"A", "B", "C"}));
 }
 
+TEST(RecordStores, EndAVisitWhenTheVisitorHasEnough) {
+  const TemporaryImage image;
+  RecordStores stores = image.stores();
+  ASSERT_TRUE(stores
+                  .addRecords(Dataclass::contacts, "x",
+                              std::vector{record("a", "1"), record("b", "2"), record("c", "3")})
+                  .status.isSuccess());
+  Lines seen;
+  const auto visitor = [&](const Record& visited, std::string_view) {
+    seen.push_back(visited.uid);
+    return seen.size() < 2;
+  };
+  const Row store = stores.findStore(Dataclass::contacts, "x").store->row;
+  EXPECT_TRUE(stores.visitRecords(Dataclass::contacts, store, false, visitor).isSuccess());
+  EXPECT_EQ(seen, (Lines{"a", "b"}));
+}
+
+TEST(RecordStores, HaveNothingOfADatabaseThatIsNotThere) {
+  const TemporaryImage image;
+  RecordStores stores = image.stores();
+  const auto visitor = [](const Record&, std::string_view) { return true; };
+  EXPECT_TRUE(stores.visitRecords(Dataclass::notes, 1, true, visitor).isSuccess());
+  EXPECT_EQ(stores.readContent(Dataclass::notes, 1).bytes, std::nullopt);
+  EXPECT_EQ(stores.syncAnchor(Dataclass::notes, 1).anchor, std::nullopt);
+  EXPECT_EQ(stores.purgeRetiredStore(Dataclass::notes, 1).status.error.value().description,
+            "the image has no notes database");
+}
+
+TEST(RecordStores, KeepRecordsOfMailToo) {
+  const TemporaryImage image;
+  RecordStores stores = image.stores();
+  ASSERT_TRUE(stores.addRecords(Dataclass::mail, std::nullopt, std::vector{record("a", "Ada")})
+                  .status.isSuccess());
+  const Row store = stores.findStore(Dataclass::mail, std::nullopt).store->row;
+  EXPECT_EQ(stores.listCollections(Dataclass::mail, store).collections.front().path,
+            Lines{"Mail Accounts"});
+}
+
+TEST(RecordStores, NestFoldersSoFarAndNoFurther) {
+  const TemporaryImage image;
+  const auto add = [&](std::size_t levels) {
+    return image.stores()
+        .addRecords(Dataclass::bookmarks, "x", std::vector{record("a", "1", 1, Lines(levels, "A"))})
+        .status;
+  };
+  EXPECT_EQ(add(1001).error.value().description.substr(0, 29), "folders are nested deeper tha");
+  EXPECT_EQ(linesOf(image, Dataclass::bookmarks, "x"), Lines{});
+  EXPECT_TRUE(add(1000).isSuccess());
+}
+
 class RetiredStore : public testing::Test {
  protected:
   RetiredStore() {

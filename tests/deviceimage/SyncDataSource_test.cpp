@@ -1,6 +1,7 @@
 // Data sources over the stores of an image.
 #include <gmock/gmock.h>
 
+#include "deviceimage/ContentHash.h"
 #include "deviceimage/DeviceImageServices.h"
 #include "tests/deviceimage/TemporaryImage.h"
 
@@ -129,6 +130,16 @@ TEST_F(ImageSources, GiveAConflictCopyAnotherUIDWhenSomebodyHasTaken) {
   ASSERT_EQ(lines.size(), 3U);
   EXPECT_EQ(lines[1], taken + ": own");
   EXPECT_TRUE(lines[2].starts_with(taken) && lines[2].ends_with(": old (of u)")) << lines[2];
+}
+
+TEST_F(ImageSources, CountWhenTheUIDsOfAConflictCopyAreTaken) {
+  const std::string longer = "u-conflict-" + contentHash("old");
+  add(Dataclass::contacts, std::nullopt,
+      {record("u", "new", 2000), record(std::string("u-conflict-") + kOldHash, "own"),
+       record(longer, "own too"), record(longer + "-2", "and this")});
+  add(Dataclass::contacts, kAccount, {record("u", "old", 1000)});
+  migrate("Contacts");
+  EXPECT_THAT(linesOf(image, Dataclass::contacts), testing::Contains(longer + "-3: old (of u)"));
 }
 
 TEST_F(ImageSources, PutACopyIntoTheFoldersOfTheSameNames) {
@@ -262,6 +273,31 @@ TEST_F(ImageSources, MakeNoFileBeforeThereIsSomethingToKeep) {
       std::filesystem::exists(image.path(DeviceImage::databaseFile(platform::ContactsSyncType))));
   EXPECT_EQ(sources().commit(open("Contacts")).code, 0);
   EXPECT_NE(image.stores().findStore(Dataclass::contacts, std::nullopt).store, std::nullopt);
+}
+
+TEST_F(ImageSources, HaveNothingToDoWhereThereIsNoDatabaseOrStore) {
+  const auto workOn = [&](const std::optional<std::string>& account) {
+    const DataSourcePtr source = open("Contacts", account);
+    EXPECT_EQ(sources().clearSyncAnchors(source).code, 0);
+    EXPECT_EQ(sources().migrateRecords(source, open("Contacts")).code, 0);
+    EXPECT_EQ(sources().removeStore(source, false).code, 0);
+    EXPECT_EQ(sources().commit(source).code, 0);
+  };
+  workOn("nobody");
+  EXPECT_FALSE(
+      std::filesystem::exists(image.path(DeviceImage::databaseFile(platform::ContactsSyncType))));
+  add(Dataclass::contacts, kAccount, {record("a", "Ada")});
+  workOn("nobody");
+  EXPECT_EQ(linesOf(image, Dataclass::contacts, kAccount), Lines{"a: Ada"});
+  EXPECT_THAT(retiredLinesOf(image, Dataclass::contacts, "nobody"), IsEmpty());
+}
+
+TEST_F(ImageSources, RetireNothingWhenAStoreWithoutRecordsIsCleared) {
+  ASSERT_TRUE(image.stores().ensureStore(Dataclass::contacts, kAccount).isSuccess());
+  const DataSourcePtr source = open("Contacts", kAccount);
+  EXPECT_EQ(sources().clearAllRecords(source).code, 0);
+  EXPECT_EQ(sources().commit(source).code, 0);
+  EXPECT_EQ(image.stores().listStores(Dataclass::contacts).stores.size(), 1U);
 }
 
 TEST_F(ImageSources, ForgetTheAnchorsOfWhatTheSourceHolds) {

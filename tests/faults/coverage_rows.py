@@ -14,7 +14,8 @@ import subprocess
 TOP = pathlib.Path(__file__).resolve().parents[2]
 BUILD = TOP / "build/branches"
 LIBRARIES = ["propertylist", "platform"]
-PROGRAMS = ["propertylist_test", "account_settings_test", "platform_test", "localdata_tests", "migrator_tests"]
+PROGRAMS = ["propertylist_test", "account_settings_test", "platform_test", "localdata_tests", "migrator_tests",
+            "deviceimage_test"]
 GOAL = 98
 GROUPS = {
     "readers": ["propertylist/BinaryReader.cpp", "propertylist/BinaryReaderValues.cpp", "propertylist/DateText.cpp",
@@ -26,6 +27,9 @@ GROUPS = {
     "migration": ["localdata/ASSDeviceLocalAccountSettingsUI.cpp", "localdata/AccountSettingsUISyncDataController.cpp",
                   "localdata/DataclassFunctions.cpp", "localdata/LocalStores.cpp",
                   "migrator/MergeAndRemoveQuillnetAccounts.cpp"],
+    "records of an image": ["deviceimage/ImageSyncDataSource.cpp", "deviceimage/RecordPlacer.cpp",
+                            "deviceimage/RecordStores.cpp", "deviceimage/RecordStoresChanges.cpp",
+                            "deviceimage/StoreRows.cpp"],
     # Rows S1 to S10 are about these; most that is missing here is a system call that fails.
     "calls of the system": ["propertylist/FileReading.cpp", "platform/posix/PosixFileServices.cpp",
                             "platform/posix/SetAside.cpp"],
