@@ -4,8 +4,10 @@
 #include <bit>
 #include <cmath>
 #include <string_view>
+#include <utility>
 
 #include "propertylist/BinaryForm.h"
+#include "propertylist/UTF8.h"
 
 namespace propertylist {
 
@@ -95,7 +97,7 @@ bool BinaryReader::_follow(Step step, std::vector<Step>& way) {
   if (header.marker == kDictionary && step.nextReference < header.count) {
     if (!_isString(member.header)) return _fail(place, "a key that is no string");
     if (isNew) _close(*reached);
-    _keys.push_back(*reached);
+    if (!std::exchange(member.isKey, true)) _keys.push_back(*reached);
     return true;
   }
   if (!isNew && member.isOpen) return _fail(place, "an object that contains itself");
@@ -230,12 +232,10 @@ bool BinaryReader::_checkLeaf(const Header& header) {
   if (header.marker == (kInteger | 4U)) return _checkInteger(header);
   if (header.marker == kUTF16) return _checkUTF16(header);
   if (header.marker == kASCII) {
-    const auto text = _bytes.subspan(header.contents, static_cast<std::size_t>(header.count));
-    const auto bad =
-        std::find_if(text.begin(), text.end(), [](std::uint8_t b) { return b > 0x7F; });
-    if (bad == text.end()) return true;
-    return _fail(header.contents + static_cast<std::size_t>(bad - text.begin()),
-                 "a character that is not ASCII");
+    const std::string_view text(reinterpret_cast<const char*>(_bytes.data()) + header.contents,
+                                static_cast<std::size_t>(header.count));
+    const std::size_t good = asciiPrefix(text, 0);
+    return good == text.size() || _fail(header.contents + good, "a character that is not ASCII");
   }
   if (header.marker == kDate &&
       !std::isfinite(std::bit_cast<double>(_number(header.contents, 8)))) {
@@ -276,12 +276,6 @@ bool BinaryReader::_isString(const Header& header) {
 
 std::uint64_t BinaryReader::_referenceCount(const Header& header) {
   return header.marker == kDictionary ? header.count * 2 : header.count;
-}
-
-std::uint64_t BinaryReader::_number(std::size_t at, std::size_t size) const {
-  std::uint64_t number = 0;
-  for (const std::uint8_t byte : _bytes.subspan(at, size)) number = number << 8U | byte;
-  return number;
 }
 
 std::size_t BinaryReader::_placeOfReference(const Header& header, std::uint64_t index) const {

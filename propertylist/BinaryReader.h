@@ -8,6 +8,7 @@
 #include <utility>
 #include <vector>
 
+#include "propertylist/BigEndian.h"
 #include "propertylist/Reading.h"
 #include "propertylist/Value.h"
 
@@ -38,6 +39,7 @@ class BinaryReader {
     std::uint64_t values = 1;   // how many values it stands for with all that it holds
     std::size_t depth = 0;      // how many containers lie in one another, itself included
     bool isOpen = false;        // some reference in it is still to be followed
+    bool isKey = false;         // listed in _keys
     std::uint32_t keyRank = 0;  // the place of a key's text among the texts of all keys
     std::optional<Value> value;
   };
@@ -71,7 +73,9 @@ class BinaryReader {
   static bool _isContainer(const Header& header);
   static bool _isString(const Header& header);
   static std::uint64_t _referenceCount(const Header& header);
-  std::uint64_t _number(std::size_t at, std::size_t size) const;
+  std::uint64_t _number(std::size_t at, std::size_t size) const {
+    return bigEndianNumber(_bytes.data() + at, size);
+  }
   std::size_t _placeOfReference(const Header& header, std::uint64_t index) const;
   const Object& _member(const Header& header, std::uint64_t index) const;
   bool _fail(std::size_t at, std::string what);
@@ -87,7 +91,7 @@ class BinaryReader {
   std::vector<std::uint32_t> _objectOfNumber;  // index in _objects and 1, or 0
   std::vector<Object> _objects;                // in the order in which they are reached
   std::vector<std::uint32_t> _order;           // in the order in which they are made
-  std::vector<std::uint32_t> _keys;            // the objects that are keys; some more than once
+  std::vector<std::uint32_t> _keys;            // the objects that are keys
   ReadError _error;
 };
 

@@ -15,8 +15,6 @@ using namespace binary;
 // sorting each by its texts could cost far more than the size of the file when many share a few
 // long keys.
 void BinaryReader::_rankKeys() {
-  std::sort(_keys.begin(), _keys.end());
-  _keys.erase(std::unique(_keys.begin(), _keys.end()), _keys.end());
   for (const std::uint32_t key : _keys) _build(_objects[key]);
   const auto textOf = [this](std::uint32_t key) -> const std::string& {
     return *_objects[key].value->asString();
@@ -116,8 +114,10 @@ Value BinaryReader::_dictionary(const Header& header) const {
     const Object& key = _member(header, i);
     pairs.push_back({key.keyRank, &key, &_member(header, header.count + i)});
   }
-  std::stable_sort(pairs.begin(), pairs.end(),
-                   [](const Pair& a, const Pair& b) { return a.keyRank < b.keyRank; });
+  // Most files come sorted.
+  const auto isBefore = [](const Pair& a, const Pair& b) { return a.keyRank < b.keyRank; };
+  if (!std::is_sorted(pairs.begin(), pairs.end(), isBefore))
+    std::stable_sort(pairs.begin(), pairs.end(), isBefore);
   std::vector<Dictionary::Entry> entries;
   entries.reserve(pairs.size());
   for (std::size_t i = 0; i < pairs.size(); ++i) {

@@ -1,15 +1,14 @@
 #pragma once
 
-#include <compare>
 #include <cstddef>
 #include <cstdint>
-#include <map>
 #include <optional>
 #include <string>
 #include <string_view>
 #include <unordered_map>
 #include <vector>
 
+#include "propertylist/TextTable.h"
 #include "propertylist/Value.h"
 
 namespace propertylist {
@@ -31,48 +30,49 @@ class BinaryWriter {
   struct Object {
     const Value* value;
     const std::string* text;
-    std::size_t firstReference = 0;  // of a container, in _references
-    std::size_t depth = 0;           // of a container: containers around it and itself
+    std::uint32_t firstReference = 0;  // of a container, in _references
+    std::uint32_t depth = 0;           // of a container: containers around it and itself
   };
-  // A leaf of fixed size.
-  struct Scalar {
-    Kind kind;
-    std::uint64_t bits;
-    bool isNegative;  // tells a negative integer from a large one
-    // NOLINTNEXTLINE(modernize-use-nullptr): no pointer is here
-    friend auto operator<=>(const Scalar&, const Scalar&) = default;
+  // Where a text stands in memory, and its number; see _numberOfText.
+  struct Recent {
+    const std::string* text = nullptr;
+    Number number = 0;
   };
 
   bool _number();
   bool _numberMembers(std::size_t container);
-  std::optional<Number> _numberOf(const Value& value, std::size_t depth);
+  bool _refer(std::optional<Number> number);
+  std::optional<Number> _numberOf(const Value& value, std::uint32_t depth);
   std::optional<Number> _numberOfText(const std::string& text);
+  std::optional<Number> _numberOfNewText(const std::string& text);
   Number _numberOfData(const Bytes& data, const Value& value);
   std::optional<Number> _numberOfScalar(const Value& value);
   Number _add(const Object& object);
 
   void _put(const Object& object);
-  void _putText(const std::string& text);
+  void _putText(std::string_view text);
   void _putInteger(const Value& integer);
   void _putReferences(const Object& container, std::size_t count);
   void _putHead(std::uint8_t type, std::uint64_t count);
   void _putCount(std::uint64_t count);
   void _putNumber(std::uint64_t number, std::size_t size);
+  void _putBytes(const void* bytes, std::size_t size);
+  std::uint8_t* _room(std::size_t size);
   void _putOffsetsAndTrailer();
 
   const Value& _value;
   std::vector<Object> _objects;
   std::vector<Number> _references;
-  // Numbers by content; a long text or data is looked up by its address first. The contents are
-  // ordered, not hashed, because whoever wrote a file that was read may have chosen ones that
-  // collide.
-  std::map<std::string_view, Number> _texts;
-  std::map<std::string_view, Number> _datas;
+  // Numbers by content; a long text or data is looked up by its address first.
+  TextTable _texts;
+  TextTable _datas;
+  TextTable _scalars;
   std::unordered_map<const void*, Number> _byAddress;
-  std::map<Scalar, Number> _scalars;
+  std::vector<Recent> _recent;
   std::vector<std::uint64_t> _offsets;
   std::size_t _referenceSize = 1;
   Bytes _bytes;
+  std::size_t _end = 0;  // of what is written; _bytes may have room behind it
 };
 
 }  // namespace propertylist

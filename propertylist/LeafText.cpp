@@ -11,6 +11,16 @@ constexpr std::string_view kBlanks = " \t\r\n";
 constexpr std::string_view kAlphabet =
     "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789+/";
 
+constexpr std::uint8_t kNoDigit = 0xFF;
+// The worth of each character as a digit.
+constexpr std::array<std::uint8_t, 256> kDigits = [] {
+  std::array<std::uint8_t, 256> digits{};
+  for (std::uint8_t& digit : digits) digit = kNoDigit;
+  for (std::size_t i = 0; i < kAlphabet.size(); ++i)
+    digits[static_cast<unsigned char>(kAlphabet[i])] = static_cast<std::uint8_t>(i);
+  return digits;
+}();
+
 // Takes a sign off the front of `text`; true for a minus.
 bool takeSign(std::string_view& text) {
   const bool isNegative = text.starts_with('-');
@@ -86,12 +96,13 @@ std::optional<Bytes> parseBase64(std::string_view text) {
   std::uint32_t bits = 0;
   std::size_t digits = 0;
   std::size_t padding = 0;
+  data.reserve(text.size() / 4 * 3);
   for (const char c : text) {
-    if (kBlanks.find(c) != std::string_view::npos) continue;
-    const std::size_t digit = c == '=' ? 0 : kAlphabet.find(c);
-    if (digit == std::string_view::npos || (padding > 0 && c != '=')) return std::nullopt;
+    if (c == ' ' || c == '\t' || c == '\r' || c == '\n') continue;
+    const std::uint8_t digit = c == '=' ? std::uint8_t{0} : kDigits[static_cast<unsigned char>(c)];
+    if (digit == kNoDigit || (padding > 0 && c != '=')) return std::nullopt;
     if (c == '=') ++padding;
-    bits = bits << 6U | static_cast<std::uint32_t>(digit);
+    bits = bits << 6U | digit;
     if (++digits % 4 != 0) continue;
     if (padding > 2) return std::nullopt;
     for (std::size_t i = 0; i < 3 - padding; ++i) {

@@ -1,4 +1,3 @@
-#include <map>
 #include <memory>
 #include <string>
 #include <utility>
@@ -7,6 +6,7 @@
 #include "propertylist/DateText.h"
 #include "propertylist/LeafText.h"
 #include "propertylist/Reading.h"
+#include "propertylist/TextTable.h"
 #include "propertylist/XMLScanner.h"
 
 namespace propertylist {
@@ -76,10 +76,17 @@ class XMLReader {
     if (_open.back().key) return _scanner.fail(tag, "a key without a value");
     std::string text;
     if (!_readContents(tag, text)) return false;
-    std::shared_ptr<const std::string>& shared = _keys[text];
-    if (!shared) shared = std::make_shared<const std::string>(std::move(text));
-    _open.back().key = shared;
+    _open.back().key = _sharedKey(std::move(text));
     return true;
+  }
+
+  const std::shared_ptr<const std::string>& _sharedKey(std::string text) {
+    const std::uint64_t hash = TextTable::hashOf(text);
+    const std::size_t known =
+        _keyTable.find(hash, [&](std::size_t index) { return *_keys[index] == text; });
+    if (known != TextTable::kNone) return _keys[known];
+    _keyTable.add(hash, _keys.size());
+    return _keys.emplace_back(std::make_shared<const std::string>(std::move(text)));
   }
 
   bool _readLeaf(const Tag& tag) {
@@ -140,9 +147,8 @@ class XMLReader {
   XMLScanner _scanner;
   std::vector<Container> _open;
   std::optional<Value> _top;
-  // Ordered: whoever writes a file may choose keys that would all meet in one place of a hash
-  // table.
-  std::map<std::string, std::shared_ptr<const std::string>> _keys;
+  TextTable _keyTable;
+  std::vector<std::shared_ptr<const std::string>> _keys;
 };
 
 }  // namespace

@@ -9,9 +9,22 @@ namespace propertylist {
 namespace {
 
 constexpr std::string_view kByteOrderMark = "\xEF\xBB\xBF";
-constexpr std::string_view kBlanks = " \t\r\n";
 
-bool isBlank(char c) { return kBlanks.find(c) != std::string_view::npos; }
+bool isBlank(char c) { return c == ' ' || c == '\t' || c == '\r' || c == '\n'; }
+
+// Whether these bytes are ASCII that XML allows, with no look at single ones.
+bool isPlain(const char* bytes, std::size_t size) {
+  unsigned char bad = 0;
+  for (std::size_t i = 0; i < size; ++i) {
+    const auto byte = static_cast<unsigned char>(bytes[i]);
+    // Without branches, so that many bytes are looked at together.
+    const unsigned isControl =
+        static_cast<unsigned>(byte < 0x20) & static_cast<unsigned>(byte != '\t') &
+        static_cast<unsigned>(byte != '\n') & static_cast<unsigned>(byte != '\r');
+    bad = static_cast<unsigned char>(bad | (byte & 0x80U) | isControl);
+  }
+  return bad == 0;
+}
 
 bool startsName(char c) {
   const auto byte = static_cast<unsigned char>(c);
@@ -29,6 +42,9 @@ std::string lowerCase(std::string_view text) {
   }
   return result;
 }
+
+// Where a text has to be looked at more closely.
+bool isSpecial(char c) { return c == '<' || c == '&' || c == ']' || c == '\r'; }
 
 // Line ends of any kind become line feeds.
 void appendLines(std::string& text, std::string_view raw) {
@@ -60,7 +76,21 @@ bool XMLScanner::readProlog() {
 }
 
 bool XMLScanner::_checkCharacters() {
+  constexpr std::size_t kBlock = 64;
+  std::size_t next = 0;  // where a block may begin
   for (std::size_t position = 0; position < _text.size();) {
+    if (position >= next && _text.size() - position >= kBlock) {
+      next = position + kBlock;
+      if (isPlain(_text.data() + position, kBlock)) {
+        position = next;
+        continue;
+      }
+    }
+    const auto byte = static_cast<unsigned char>(_text[position]);
+    if (byte >= 0x20 && byte < 0x80) {
+      ++position;
+      continue;
+    }
     const std::size_t at = position;
     const std::optional<char32_t> codePoint = decodeUTF8(_text, position);
     if (!codePoint) return _failAt(at, "not UTF-8");
@@ -186,16 +216,18 @@ bool XMLScanner::_readAttribute(std::string_view& name, std::string& value) {
 
 bool XMLScanner::readText(std::string& text) {
   while (!isAtEnd()) {
-    const std::size_t end = std::min(_text.find_first_of("<&", _at), _text.size());
-    const std::string_view raw = _text.substr(_at, end - _at);
-    const std::size_t sectionEnd = raw.find("]]>");
-    if (sectionEnd != std::string_view::npos) {
-      return _failAt(_at + sectionEnd, "the end of a section that has no beginning");
-    }
-    appendLines(text, raw);
-    _at = end;
+    const std::size_t start = _at;
+    while (!isAtEnd() && !isSpecial(_text[_at])) ++_at;
+    text += _text.substr(start, _at - start);
+    if (isAtEnd()) break;
     bool isGood = true;
-    if (_isAt("&")) {
+    if (_isAt("]")) {
+      isGood = !_isAt("]]>") || fail("the end of a section that has no beginning");
+      text += _text[_at++];
+    } else if (_isAt("\r")) {
+      ++_at;
+      if (!_isAt("\n")) text += '\n';
+    } else if (_isAt("&")) {
       isGood = _readReference(text);
     } else if (_isAt("<!--")) {
       isGood = _skipComment();
@@ -284,7 +316,7 @@ std::optional<std::string_view> XMLScanner::_readLiteral() {
 // Whether there were blanks.
 bool XMLScanner::_readBlanks() {
   const std::size_t start = _at;
-  _at = std::min(_text.find_first_not_of(kBlanks, _at), _text.size());
+  while (!isAtEnd() && isBlank(_text[_at])) ++_at;
   return _at > start;
 }
 

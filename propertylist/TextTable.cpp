@@ -1,0 +1,85 @@
+#include "propertylist/TextTable.h"
+
+#include <array>
+#include <cstring>
+#include <random>
+
+namespace propertylist {
+namespace {
+
+struct Key {
+  Key() {
+    std::random_device device;
+    for (std::uint64_t& word : words) word = std::uint64_t{device()} << 32U | device();
+    words[0] |= 1;
+  }
+  std::array<std::uint64_t, 3> words{};
+};
+
+const Key& key() {
+  static const Key made;
+  return made;
+}
+
+// Both halves of the product, folded: each bit of the result depends on all of both factors.
+std::uint64_t mixed(std::uint64_t a, std::uint64_t b) {
+  __extension__ using Wide = unsigned __int128;
+  const Wide product = static_cast<Wide>(a) * b;
+  return static_cast<std::uint64_t>(product) ^ static_cast<std::uint64_t>(product >> 64U);
+}
+
+std::uint64_t wordAt(const char* bytes, std::size_t size) {
+  std::uint64_t word = 0;
+  std::memcpy(&word, bytes, size);
+  return word;
+}
+
+}  // namespace
+
+std::uint64_t TextTable::hashOf(std::uint64_t a, std::uint64_t b) {
+  const auto& words = key().words;
+  return mixed(mixed(a ^ words[0], b ^ words[1]) ^ words[2], words[0]);
+}
+
+std::uint64_t TextTable::hashOf(std::string_view text) {
+  constexpr std::size_t kWord = 8;
+  const auto& words = key().words;
+  std::uint64_t state = words[2] ^ text.size();
+  const char* next = text.data();
+  std::size_t left = text.size();
+  for (; left > 2 * kWord; left -= 2 * kWord, next += 2 * kWord)
+    state = mixed(wordAt(next, kWord) ^ words[0] ^ state, wordAt(next + kWord, kWord) ^ words[1]);
+  std::uint64_t first = 0;
+  std::uint64_t second = 0;
+  if (left > kWord) {
+    first = wordAt(next, kWord);
+    second = wordAt(next + kWord, left - kWord);
+  } else if (left > 0) {
+    first = wordAt(next, left);
+  }
+  return mixed(mixed(first ^ words[0] ^ state, second ^ words[1]), words[2] ^ state);
+}
+
+void TextTable::add(std::uint64_t hash, std::size_t index) {
+  if (2 * (_count + 1) > _slots.size()) _grow();
+  std::size_t at = hash & _mask;
+  while (_slots[at].indexAndOne != 0) at = (at + 1) & _mask;
+  _slots[at] = {static_cast<std::uint32_t>(hash >> 32U), static_cast<std::uint32_t>(index + 1),
+                static_cast<std::uint32_t>(hash)};
+  ++_count;
+}
+
+void TextTable::_grow() {
+  constexpr std::size_t kFirstSize = 64;
+  std::vector<Slot> slots(_slots.empty() ? kFirstSize : _slots.size() * 2);
+  _mask = slots.size() - 1;
+  for (const Slot& slot : _slots) {
+    if (slot.indexAndOne == 0) continue;
+    std::size_t at = slot.place & _mask;
+    while (slots[at].indexAndOne != 0) at = (at + 1) & _mask;
+    slots[at] = slot;
+  }
+  _slots = std::move(slots);
+}
+
+}  // namespace propertylist

@@ -1,0 +1,47 @@
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <string_view>
+#include <vector>
+
+namespace propertylist {
+
+// Finds what was seen before by its content: the caller keeps the contents in a list, and the table
+// their indexes. The hash has a key that is chosen at random for each process, so that whoever
+// writes a file cannot choose contents that collide.
+class TextTable {
+ public:
+  static constexpr std::size_t kNone = ~std::size_t{0};
+
+  static std::uint64_t hashOf(std::string_view text);
+  // Of up to two numbers.
+  static std::uint64_t hashOf(std::uint64_t a, std::uint64_t b);
+
+  // The index of what has this hash and is the same; kNone when there is none.
+  template <typename IsSame>
+  std::size_t find(std::uint64_t hash, const IsSame& isSame) const {
+    if (_slots.empty()) return kNone;
+    for (std::size_t at = hash & _mask;; at = (at + 1) & _mask) {
+      const Slot& slot = _slots[at];
+      if (slot.indexAndOne == 0) return kNone;
+      if (slot.hash == static_cast<std::uint32_t>(hash >> 32U) && isSame(slot.indexAndOne - 1))
+        return slot.indexAndOne - 1;
+    }
+  }
+  // Adds what find did not find. `index` is less than 2^32 - 1.
+  void add(std::uint64_t hash, std::size_t index);
+
+ private:
+  struct Slot {
+    std::uint32_t hash = 0;  // the upper half
+    std::uint32_t indexAndOne = 0;
+    std::uint32_t place = 0;  // the lower half
+  };
+  void _grow();
+  std::vector<Slot> _slots;  // a power of two, at most half full
+  std::size_t _mask = 0;
+  std::size_t _count = 0;
+};
+
+}  // namespace propertylist
