@@ -25,6 +25,17 @@ using State = std::array<std::uint32_t, 8>;
 constexpr State kInitialState = {0x6a09e667, 0xbb67ae85, 0x3c6ef372, 0xa54ff53a,
                                  0x510e527f, 0x9b05688c, 0x1f83d9ab, 0x5be0cd19};
 
+using Word = std::uint32_t;
+
+// One round: `d` becomes what the next round calls e, and `h` what it calls a.
+inline void takeWord(Word a, Word b, Word c, Word& d, Word e, Word f, Word g, Word& h, Word word) {
+  const Word s1 = std::rotr(e, 6) ^ std::rotr(e, 11) ^ std::rotr(e, 25);
+  const Word s0 = std::rotr(a, 2) ^ std::rotr(a, 13) ^ std::rotr(a, 22);
+  const Word t1 = h + s1 + ((e & f) ^ (~e & g)) + word;
+  d += t1;
+  h = t1 + s0 + ((a & b) ^ (a & c) ^ (b & c));
+}
+
 // Takes one block of 64 bytes into `state`.
 void takeBlock(State& state, const unsigned char* block) {
   std::array<std::uint32_t, 64> w{};
@@ -36,19 +47,16 @@ void takeBlock(State& state, const unsigned char* block) {
     w[i] = w[i - 16] + s0 + w[i - 7] + s1;
   }
   auto [a, b, c, d, e, f, g, h] = state;
-  for (std::size_t i = 0; i < 64; ++i) {
-    const std::uint32_t s1 = std::rotr(e, 6) ^ std::rotr(e, 11) ^ std::rotr(e, 25);
-    const std::uint32_t t1 = h + s1 + ((e & f) ^ (~e & g)) + kRoundConstants[i] + w[i];
-    const std::uint32_t s0 = std::rotr(a, 2) ^ std::rotr(a, 13) ^ std::rotr(a, 22);
-    const std::uint32_t t2 = s0 + ((a & b) ^ (a & c) ^ (b & c));
-    h = g;
-    g = f;
-    f = e;
-    e = d + t1;
-    d = c;
-    c = b;
-    b = a;
-    a = t1 + t2;
+  // The variables change their roles from round to round instead of their values.
+  for (std::size_t i = 0; i < 64; i += 8) {
+    takeWord(a, b, c, d, e, f, g, h, kRoundConstants[i] + w[i]);
+    takeWord(h, a, b, c, d, e, f, g, kRoundConstants[i + 1] + w[i + 1]);
+    takeWord(g, h, a, b, c, d, e, f, kRoundConstants[i + 2] + w[i + 2]);
+    takeWord(f, g, h, a, b, c, d, e, kRoundConstants[i + 3] + w[i + 3]);
+    takeWord(e, f, g, h, a, b, c, d, kRoundConstants[i + 4] + w[i + 4]);
+    takeWord(d, e, f, g, h, a, b, c, kRoundConstants[i + 5] + w[i + 5]);
+    takeWord(c, d, e, f, g, h, a, b, kRoundConstants[i + 6] + w[i + 6]);
+    takeWord(b, c, d, e, f, g, h, a, kRoundConstants[i + 7] + w[i + 7]);
   }
   const State worked = {a, b, c, d, e, f, g, h};
   for (std::size_t i = 0; i < state.size(); ++i) state[i] += worked[i];

@@ -73,7 +73,9 @@ platform::Status RecordStores::recoverDatabases(const std::set<std::string>& lea
   platform::Status first;
   for (const Dataclass dataclass : kDataclasses) {
     const std::string path(DeviceImage::databaseFile(syncTypeOf(dataclass)));
-    if (leaveOut.contains(path)) continue;
+    const bool isWhole =
+        _databases->image().lookAt(path + "-journal").kind == FileLook::Kind::nothing;
+    if (isWhole || leaveOut.contains(path)) continue;
     // Opening reads the schema, and the first read rolls back.
     platform::Status status = statusOf([&] {
       if (Database* const database = _databases->find(syncTypeOf(dataclass)))

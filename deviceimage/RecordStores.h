@@ -189,8 +189,8 @@ class RecordStores {
   std::vector<DatabaseReport> checkDatabases(const std::set<std::string>& leaveOut = {});
 
   // Rolls back what a killed program left half written, as any writer would; nothing else changes.
-  // With readOnly access a database in that state is a failure. Those in `leaveOut` are passed
-  // over.
+  // With readOnly access a database in that state is a failure. Those in `leaveOut`, and those
+  // without a journal beside them, are passed over.
   platform::Status recoverDatabases(const std::set<std::string>& leaveOut = {});
 
   // Begins a change of the dataclass's database and takes it back. Fails after five seconds when

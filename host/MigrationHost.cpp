@@ -2,11 +2,13 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <memory>
 #include <system_error>
 #include <utility>
 
 #include "deviceimage/DeviceImageServices.h"
 #include "deviceimage/ImageLock.h"
+#include "deviceimage/RecordStores.h"
 #include "deviceimage/SyncAgent.h"
 #include "host/AccountComparison.h"
 #include "host/DiscardedAccounts.h"
@@ -22,6 +24,7 @@ namespace {
 
 using deviceimage::DeviceImage;
 using deviceimage::ImageLock;
+using deviceimage::RecordStores;
 
 // A report stays readable whatever a migrator writes; the image's system log has every line.
 constexpr std::size_t kMaximumLogSize = std::size_t{64} << 20U;  // bytes
@@ -122,13 +125,17 @@ void MigrationHost::_runUnderLock(const RunOptions& options, int lockDescriptor)
   for (std::string& reason : reasonsNotToStart(*_image, readSettings(*_image), _bundles))
     _refuse(std::move(reason));
   if (!_report.reasons.empty()) return;
-  _leftAlone = findUnusableDatabases(_image);
+  // Opened once for all looks at the image before, and once for those after: a migrator may put
+  // another file in a database's place.
+  auto stores = std::make_unique<RecordStores>(_image, RecordStores::Access::readOnly);
+  _leftAlone = findUnusableDatabases(_image, *stores);
   for (const UnusableDatabase& database : _leftAlone)
     if (database.mayPass) _refuse(_image->absolutePath(database.path) + ": " + database.why + ".");
   if (!_report.reasons.empty()) return;
 
   _listener.stageBegan("Looking at the image before");
-  const Observation before = observe(_image, _leftAlone);
+  const Observation before = observe(*_image, *stores, _leftAlone);
+  stores.reset();
   if (!before.error.empty()) return _refuse(before.error);
   const Selection selection = selectionOf(_image, _bundles);
   const deviceimage::SyncAgent agent(*_image);
@@ -147,8 +154,9 @@ void MigrationHost::_runUnderLock(const RunOptions& options, int lockDescriptor)
   rollBackLeftovers(_image, _leftAlone);
 
   _listener.stageBegan("Looking at the image after");
-  const Observation after = observe(_image, _leftAlone);
-  _compare(before, after, selection, agent);
+  stores = std::make_unique<RecordStores>(_image, RecordStores::Access::readOnly);
+  const Observation after = observe(*_image, *stores, _leftAlone);
+  _compare(before, after, newDamage(*_image, *stores, _leftAlone), selection, agent);
   _judge();
 }
 
@@ -218,7 +226,8 @@ void MigrationHost::_keepLogLine(std::string_view line) {
 }
 
 void MigrationHost::_compare(const Observation& before, const Observation& after,
-                             const Selection& selection, const deviceimage::SyncAgent& agent) {
+                             const std::vector<std::string>& damage, const Selection& selection,
+                             const deviceimage::SyncAgent& agent) {
   std::vector<std::string> contradictions;
   if (!after.error.empty()) contradictions.push_back(after.error);
   append(contradictions, checkSettingsFile(*_image, before.settings, after.settings));
@@ -234,7 +243,7 @@ void MigrationHost::_compare(const Observation& before, const Observation& after
     append(contradictions, records.contradictions);
     append(leftBehind, records.leftBehind);
   }
-  append(contradictions, newDamage(_image, _leftAlone));
+  append(contradictions, damage);
   for (const UnusableDatabase& database : _leftAlone)
     leftBehind.push_back(_image->absolutePath(database.path) + " was left alone: " + database.why +
                          ".");

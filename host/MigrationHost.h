@@ -57,7 +57,8 @@ class MigrationHost {
   bool _migrateLegacy(const RunOptions& options, int lockDescriptor);
   void _runMigrators(const RunOptions& options, int lockDescriptor);
   void _keepLogLine(std::string_view line);
-  void _compare(const Observation& before, const Observation& after, const Selection& selection,
+  void _compare(const Observation& before, const Observation& after,
+                const std::vector<std::string>& damage, const Selection& selection,
                 const deviceimage::SyncAgent& agent);
   void _judge();
 

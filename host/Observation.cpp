@@ -3,8 +3,6 @@
 #include <algorithm>
 #include <string_view>
 
-#include "deviceimage/RecordStores.h"
-
 namespace host {
 namespace {
 
@@ -36,11 +34,10 @@ std::string failureText(const platform::Status& status) {
 
 }  // namespace
 
-Observation observe(const std::shared_ptr<const deviceimage::DeviceImage>& image,
+Observation observe(const deviceimage::DeviceImage& image, deviceimage::RecordStores& stores,
                     const std::vector<UnusableDatabase>& leftAlone) {
   Observation observation;
-  observation.settings = readSettings(*image);
-  deviceimage::RecordStores stores(image, deviceimage::RecordStores::Access::readOnly);
+  observation.settings = readSettings(image);
   for (const deviceimage::Dataclass dataclass : deviceimage::kDataclasses) {
     if (isUnreadable(dataclass, leftAlone)) {
       observation.unseen.insert(dataclass);

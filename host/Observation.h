@@ -8,6 +8,7 @@
 
 #include "deviceimage/Dataclass.h"
 #include "deviceimage/DeviceImage.h"
+#include "deviceimage/RecordStores.h"
 #include "host/Settings.h"
 #include "host/UnusableDatabases.h"
 
@@ -30,14 +31,15 @@ struct ObservedStore {
   std::vector<ObservedRecord> records;
 };
 
-// Accounts and records of an image at one moment, read without changing anything.
+// Accounts and records of an image at one moment.
 struct Observation {
   Settings settings;
   std::vector<ObservedStore> stores;
   std::set<deviceimage::Dataclass> unseen;  // those whose database is left alone unread
   std::string error;  // what could not be read, in one sentence; empty when all else could
 };
-Observation observe(const std::shared_ptr<const deviceimage::DeviceImage>& image,
-                    const std::vector<UnusableDatabase>& leftAlone = {});
+// Reads all of it, the records through `stores`, and changes nothing.
+Observation observe(const deviceimage::DeviceImage& image, deviceimage::RecordStores& stores,
+                    const std::vector<UnusableDatabase>& leftAlone);
 
 }  // namespace host

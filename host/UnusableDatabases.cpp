@@ -66,10 +66,9 @@ void rollBackLeftovers(const std::shared_ptr<const DeviceImage>& image,
       .ignore("what cannot be recovered shows in the check");
 }
 
-std::vector<UnusableDatabase> findUnusableDatabases(
-    const std::shared_ptr<const DeviceImage>& image) {
+std::vector<UnusableDatabase> findUnusableDatabases(const std::shared_ptr<const DeviceImage>& image,
+                                                    RecordStores& stores) {
   rollBackLeftovers(image, {});
-  RecordStores stores(image, RecordStores::Access::readOnly);
   std::vector<UnusableDatabase> found;
   for (const DatabaseReport& database : stores.checkDatabases()) {
     if (database.problems.empty())
@@ -101,13 +100,12 @@ std::vector<std::string> pathsJoinedIn(std::string_view joined) {
   return paths;
 }
 
-std::vector<std::string> newDamage(const std::shared_ptr<const DeviceImage>& image,
+std::vector<std::string> newDamage(const DeviceImage& image, RecordStores& stores,
                                    const std::vector<UnusableDatabase>& leftAlone) {
   std::vector<std::string> sentences;
-  RecordStores stores(image, RecordStores::Access::readOnly);
   for (const DatabaseReport& database : stores.checkDatabases(pathsOf(leftAlone)))
     for (const std::string& problem : database.problems)
-      sentences.push_back(image->absolutePath(database.path) + " is damaged: " + problem +
+      sentences.push_back(image.absolutePath(database.path) + " is damaged: " + problem +
                           "; bring back a sound copy.");
   return sentences;
 }

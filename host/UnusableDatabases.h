@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "deviceimage/DeviceImage.h"
+#include "deviceimage/RecordStores.h"
 
 namespace host {
 
@@ -21,9 +22,11 @@ struct UnusableDatabase {
 };
 
 // Rolls back what a killed run may have left in the databases; then, which of them are damaged, of
-// another program or version, held by somebody else, or not to be written.
+// another program or version, held by somebody else, or not to be written. They are looked at
+// through `stores`, which may be read-only.
 std::vector<UnusableDatabase> findUnusableDatabases(
-    const std::shared_ptr<const deviceimage::DeviceImage>& image);
+    const std::shared_ptr<const deviceimage::DeviceImage>& image,
+    deviceimage::RecordStores& stores);
 
 // Rolls back what a migrator that was ended in the middle of a change left in the others.
 void rollBackLeftovers(const std::shared_ptr<const deviceimage::DeviceImage>& image,
@@ -34,7 +37,8 @@ std::string joinedPaths(const std::vector<UnusableDatabase>& databases);
 std::vector<std::string> pathsJoinedIn(std::string_view joined);
 
 // What is wrong with the databases that are not among `leftAlone`: a sentence each.
-std::vector<std::string> newDamage(const std::shared_ptr<const deviceimage::DeviceImage>& image,
+std::vector<std::string> newDamage(const deviceimage::DeviceImage& image,
+                                   deviceimage::RecordStores& stores,
                                    const std::vector<UnusableDatabase>& leftAlone);
 
 }  // namespace host
