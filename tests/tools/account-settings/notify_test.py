@@ -56,6 +56,9 @@ class Notify(SettingsTest):
         shutil.copytree(Path(TOOL).parent.parent / RESOURCES, installation / RESOURCES)
         (installation / "bin").mkdir()
         shutil.copy2(TOOL, installation / "bin")
+        (installation / "lib").mkdir(exist_ok=True)
+        for library in (Path(TOOL).parent.parent / "lib").glob("*.so*"):
+            (installation / "lib" / library.name).symlink_to(library)
         (installation / RESOURCES / "AccountCreators.plist").write_bytes(plistlib.dumps(catalogue))
         return installation / "bin/account-settings"
 
