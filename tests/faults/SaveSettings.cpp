@@ -53,7 +53,7 @@ int logLines = 0;
 void noteLogLine(std::string_view line) {
   ++logLines;
   if (const char* name = std::getenv("SAVER_LOG"))
-    std::ofstream(name, std::ios::app) << line << '\n';
+    std::ofstream(name, std::fstream::app) << line << '\n';
 }
 
 std::ptrdiff_t countOfDescriptors() {
