@@ -19,6 +19,24 @@ constexpr int kBusyMilliseconds = 5'000;
 
 using Connection = std::unique_ptr<sqlite3, int (*)(sqlite3*)>;
 
+// SQLite's own way to files, but for one thing: names are taken as they are. SQLite would look up
+// each link in them once and go by the result from then on.
+const char* wayToHeldFiles() {
+  static sqlite3_vfs files = *sqlite3_vfs_find(nullptr);
+  static const int registered = [] {
+    files.zName = "held-directory";
+    files.xFullPathname = [](sqlite3_vfs*, const char* name, int size, char* full) {
+      const std::string_view whole(name);
+      if (std::cmp_greater_equal(whole.size(), size)) return SQLITE_CANTOPEN;
+      *std::copy(whole.begin(), whole.end(), full) = '\0';
+      return SQLITE_OK;
+    };
+    return sqlite3_vfs_register(&files, 0);
+  }();
+  if (registered != SQLITE_OK) throw DatabaseFailure(registered, sqlite3_errstr(registered));
+  return files.zName;
+}
+
 void run(sqlite3* connection, const char* sql) {
   const int code = sqlite3_exec(connection, sql, nullptr, nullptr, nullptr);
   if (code != SQLITE_OK) throw DatabaseFailure(code, sqlite3_errmsg(connection));
@@ -83,8 +101,8 @@ std::int64_t pragmaOf(sqlite3* connection, const char* pragma) {
 
 }  // namespace
 
-Database::Database(std::string name, sqlite3* connection)
-    : _name(std::move(name)), _connection(connection) {}
+Database::Database(std::string name, Descriptor directory, sqlite3* connection)
+    : _name(std::move(name)), _directory(std::move(directory)), _connection(connection) {}
 
 Database::~Database() { sqlite3_close_v2(_connection); }
 
@@ -103,9 +121,15 @@ std::unique_ptr<Database> Database::openExisting(const DeviceImage& image,
   sqlite3* opened = nullptr;
   const int flags =
       access == DatabaseAccess::readOnly ? SQLITE_OPEN_READONLY : SQLITE_OPEN_READWRITE;
-  const int code = sqlite3_open_v2(image.absolutePath(name).c_str(), &opened,
-                                   flags | SQLITE_OPEN_NOFOLLOW, nullptr);
-  std::unique_ptr<Database> database(new Database(name, opened));
+  DeviceImage::Parent parent = image.openParent(name);
+  if (!parent.status.isSuccess())
+    throw DatabaseFailure(SQLITE_CANTOPEN, parent.status.error->description);
+  Descriptor directory(parent.descriptor);
+  const std::string path =
+      "/proc/self/fd/" + std::to_string(directory.number()) + "/" + parent.name;
+  const int code =
+      sqlite3_open_v2(path.c_str(), &opened, flags | SQLITE_OPEN_NOFOLLOW, wayToHeldFiles());
+  std::unique_ptr<Database> database(new Database(name, std::move(directory), opened));
   if (code != SQLITE_OK) database->_raise(code, "cannot be opened");
   database->_configure();
   database->_checkSchema();

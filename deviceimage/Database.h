@@ -8,6 +8,7 @@
 #include <string_view>
 #include <vector>
 
+#include "deviceimage/Descriptor.h"
 #include "deviceimage/DeviceImage.h"
 #include "platform/Status.h"
 #include "platform/SyncDataType.h"
@@ -65,12 +66,15 @@ class Database {
  private:
   friend class Statement;
   friend class Transaction;
-  Database(std::string name, sqlite3* connection);
+  Database(std::string name, Descriptor directory, sqlite3* connection);
   void _configure();
   void _checkSchema();
   [[noreturn]] void _raise(int code, std::string_view what) const;
 
   std::string _name;  // as it is called inside the image
+  // Of the file and its journal, which are reached through it: whatever becomes of the names above,
+  // nothing outside the image is read or written.
+  Descriptor _directory;
   sqlite3* _connection;
 };
 

@@ -135,6 +135,24 @@ TEST(DatabaseFile, IsNeverReachedThroughALink) {
   EXPECT_EQ(textOf(target), before);
 }
 
+TEST(DatabaseFile, IsReachedThroughTheDirectoryThatItWasFoundIn) {
+  const TemporaryImage image;
+  RecordStores stores = image.stores();
+  ASSERT_TRUE(stores.ensureStore(Dataclass::contacts, "x").isSuccess());
+  const std::filesystem::path directory =
+      image.path(DeviceImage::databaseFile(platform::ContactsSyncType)).parent_path();
+  const std::filesystem::path outside = image.directory.path / "outside";
+  std::filesystem::create_directory(outside);
+  std::filesystem::rename(directory, directory.string() + "-moved");
+  std::filesystem::create_directory_symlink(outside, directory);
+
+  EXPECT_TRUE(stores.ensureStore(Dataclass::contacts, "y").isSuccess());
+  EXPECT_TRUE(std::filesystem::is_empty(outside));
+  std::filesystem::remove(directory);
+  std::filesystem::rename(directory.string() + "-moved", directory);
+  EXPECT_TRUE(image.stores().findStore(Dataclass::contacts, "y").store.has_value());
+}
+
 TEST(DatabaseFile, HasAPrivateJournalWhileItIsWritten) {
   const TemporaryImage image;
   const std::unique_ptr<Database> database =
