@@ -33,12 +33,21 @@ bool mayPass(int code, const FileLook& look) {
   switch (code & 0xFF) {  // the kind of an SQLite code
     case SQLITE_IOERR:
     case SQLITE_NOMEM:
+    case SQLITE_FULL:
+    case SQLITE_PROTOCOL:  // locks could not be taken
+    case SQLITE_READONLY:  // what a killed program left could not be rolled back
       return true;
     case SQLITE_CANTOPEN:
       return look.kind == FileLook::Kind::file;
     default:
       return false;
   }
+}
+
+void note(const platform::Status& status, const FileLook& look, DatabaseReport& report) {
+  if (status.isSuccess()) return;
+  report.problems.push_back(status.error->description);
+  report.mayPass = mayPass(status.code, look);
 }
 
 }  // namespace
@@ -60,10 +69,7 @@ std::vector<DatabaseReport> RecordStores::checkDatabases(const std::set<std::str
       }
       return platform::Status::success();
     });
-    if (!status.isSuccess()) {
-      report.problems.push_back(status.error->description);
-      report.mayPass = mayPass(status.code, look);
-    }
+    note(status, look, report);
     reports.push_back(std::move(report));
   }
   return reports;
@@ -87,12 +93,18 @@ platform::Status RecordStores::recoverDatabases(const std::set<std::string>& lea
   return first;
 }
 
-platform::Status RecordStores::tryToWrite(Dataclass dataclass) {
-  return statusOf([&] {
-    if (Database* const database = _databases->find(syncTypeOf(dataclass)))
-      const Transaction transaction(*database);
-    return platform::Status::success();
-  });
+DatabaseReport RecordStores::tryToWrite(Dataclass dataclass) {
+  DatabaseReport report;
+  report.path = DeviceImage::databaseFile(syncTypeOf(dataclass));
+  const FileLook look = _databases->image().lookAt(report.path);
+  report.exists = look.kind != FileLook::Kind::nothing;
+  note(statusOf([&] {
+         if (Database* const database = _databases->find(syncTypeOf(dataclass)))
+           const Transaction transaction(*database);
+         return platform::Status::success();
+       }),
+       look, report);
+  return report;
 }
 
 }  // namespace deviceimage

@@ -196,7 +196,7 @@ class RecordStores {
   // Begins a change of the dataclass's database and takes it back. Fails after five seconds when
   // another program is about to write there, who lets others read meanwhile. Needs readWrite
   // access.
-  platform::Status tryToWrite(Dataclass dataclass);
+  DatabaseReport tryToWrite(Dataclass dataclass);
 
  private:
   Added _addTo(Dataclass dataclass, const std::optional<std::string>& account,

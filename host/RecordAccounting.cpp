@@ -199,9 +199,10 @@ void checkNewStore(const ObservedStore& store, const ActiveStores& before,
 void listWhatWasNotSeen(const Observation& before, RecordAccounting& result) {
   std::erase_if(result.dataclasses, [&](const DataclassReport& line) {
     if (!before.unseen.contains(line.dataclass)) return false;
-    result.leftBehind.push_back("What account " + line.account + " has of " +
-                                std::string(dataclassName(line.dataclass)) +
-                                " is left as it was, in a database that cannot be used.");
+    result.leftBehind.push_back(
+        "What account " + line.account + " has of " + std::string(dataclassName(line.dataclass)) +
+        " is left as it was, in a database that cannot be used; when it can, "
+        "put the account back into the settings and run the host again.");
     return true;
   });
 }

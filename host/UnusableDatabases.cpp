@@ -42,18 +42,30 @@ void findUnwritable(const DeviceImage& image, const std::string& relative,
   if (why) found.push_back({relative, std::move(*why), true});
 }
 
+UnusableDatabase notLookedAt(const DatabaseReport& database) {
+  return {database.path,
+          "it cannot be looked at now: " + database.problems.front() +
+              "; mend that, and run the host again",
+          false, true};
+}
+
 // Those that somebody is about to write, but lets others read: each change of ours would have to
 // wait, and fail in the end.
 void findThoseInUse(const std::shared_ptr<const DeviceImage>& image,
                     std::vector<UnusableDatabase>& found) {
   RecordStores stores(image, RecordStores::Access::readWrite);
+  const std::set<std::string> known = pathsOf(found);
   for (const deviceimage::Dataclass dataclass : deviceimage::kDataclasses) {
+    if (dataclass == deviceimage::Dataclass::reminders) continue;  // in the calendars' database
     const std::string path(DeviceImage::databaseFile(deviceimage::syncTypeOf(dataclass)));
-    if (pathsOf(found).contains(path)) continue;
-    const platform::Status status = stores.tryToWrite(dataclass);
-    if (!status.isSuccess())
+    if (known.contains(path)) continue;
+    const DatabaseReport database = stores.tryToWrite(dataclass);
+    if (database.problems.empty()) continue;
+    if (database.mayPass)
+      found.push_back(notLookedAt(database));
+    else
       found.push_back(
-          {path, "it is in use: " + status.error->description + "; wait for who uses it", true});
+          {path, "it is in use: " + database.problems.front() + "; wait for who uses it", true});
   }
 }
 
@@ -74,10 +86,7 @@ std::vector<UnusableDatabase> findUnusableDatabases(const std::shared_ptr<const 
     if (database.problems.empty())
       findUnwritable(*image, database.path, found);
     else if (database.mayPass)
-      found.push_back({database.path,
-                       "it cannot be looked at now: " + database.problems.front() +
-                           "; mend that, and run the host again",
-                       false, true});
+      found.push_back(notLookedAt(database));
     else
       found.push_back({database.path, "it is damaged or in use: " + database.problems.front() +
                                           "; bring back a sound copy, or wait for who uses it"});
@@ -105,8 +114,10 @@ std::vector<std::string> newDamage(const DeviceImage& image, RecordStores& store
   std::vector<std::string> sentences;
   for (const DatabaseReport& database : stores.checkDatabases(pathsOf(leftAlone)))
     for (const std::string& problem : database.problems)
-      sentences.push_back(image.absolutePath(database.path) + " is damaged: " + problem +
-                          "; bring back a sound copy.");
+      sentences.push_back(image.absolutePath(database.path) +
+                          " is damaged, or cannot be looked at: " + problem +
+                          "; look at it with device-image check, and bring back a sound copy "
+                          "when it is damaged.");
   return sentences;
 }
 

@@ -10,6 +10,7 @@ import hosttest
 from hosttest import SERVICE, account, card, event, record
 
 CONTACTS = hosttest.KINDS["contacts"][1]
+JOURNAL_BEGIN = bytes.fromhex("d9d505f920a163d7")  # written when the rest is on the disk
 
 
 class UnusableDatabases(hosttest.HostTestCase):
@@ -45,7 +46,8 @@ class UnusableDatabases(hosttest.HostTestCase):
         self.damage(100, 200)
         run = self.check_that_contacts_are_left_alone("damaged", "bring back a sound copy")
         self.assertIn("What account Q has of contacts is left as it was, in a database that cannot "
-                      "be used.", run.report["reasons"])
+                      "be used; when it can, put the account back into the settings and run the host "
+                      "again.", run.report["reasons"])
         self.assertEqual(["calendars"], [line["dataclass"] for line in run.report["dataclasses"]])
         self.assertTrue(any("is left alone" in line for line in run.report["log"]))
 
@@ -85,6 +87,33 @@ class UnusableDatabases(hosttest.HostTestCase):
                          run.report["reasons"])
         self.assertFalse(self.contacts_file.with_name("Contacts.sqlite-journal").exists())
         self.assertEqual(0, self.run_host("--quiet").code)
+        self.assertEqual(2, len(self.contents("contacts")))
+
+    def leave_a_journal(self):
+        """As a program does that was killed when the journal was on the disk and the change was not."""
+        journal = self.contacts_file.with_name("Contacts.sqlite-journal")
+        with contextlib.closing(sqlite3.connect(self.contacts_file, isolation_level=None)) as database:
+            database.execute("BEGIN")
+            database.execute("UPDATE records SET modified_at = 1")
+            content = JOURNAL_BEGIN + journal.read_bytes()[len(JOURNAL_BEGIN):]
+            database.execute("ROLLBACK")
+        journal.write_bytes(content)
+        return journal
+
+    @unittest.skipIf(shutil.which("strace") is None, "needs strace")
+    @unittest.skipIf(os.environ["SANITIZED"], "a sanitizer does not work under strace")
+    def test_one_that_cannot_be_rolled_back_at_the_moment_refuses_the_run(self):
+        journal = self.leave_a_journal()
+        before = (self.image / hosttest.SETTINGS).read_bytes()
+        run = self.run_host("--json", "--quiet", prefix=(
+            "strace", "-f", "-qq", "-o", os.devnull, "-e", "inject=unlink:error=EIO"))
+        self.assertEqual((7, "refused"), (run.code, run.report["outcome"]), run.output)
+        self.assertIn("cannot be looked at now", run.report["reasons"][0])
+        self.assertTrue(journal.exists())
+        self.assertEqual(before, (self.image / hosttest.SETTINGS).read_bytes())
+        self.assertEqual(1, len(self.contents("calendars", SERVICE)))
+        self.assertEqual(0, self.run_host("--quiet").code)
+        self.assertFalse(journal.exists())
         self.assertEqual(2, len(self.contents("contacts")))
 
     def test_one_with_another_content_than_its_hashes_say(self):
