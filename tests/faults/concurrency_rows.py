@@ -1,5 +1,6 @@
 """Many processes save and read one settings file: rows C1 to C3 of docs/reliability.md."""
 
+import collections
 import plistlib
 import random
 import select
@@ -64,11 +65,17 @@ def judged_readers(readers):
 def add_under_the_lock(found, directory, is_full):
     count = 1000 if is_full else 100
     image = SettingsImage(found, directory / "c2")
+    expected = collections.Counter(identifiers_in(image))
     bad = wait_for([start(found, image, "add", f"S{i}", count) for i in range(SAVERS)], "saver")
-    present = {entry["Identifier"] for entry in plistlib.loads(image.settings.read_bytes())["Accounts"]}
-    for i in range(SAVERS):
-        bad += [(f"S{i}-{j}", "is missing") for j in range(count) if f"S{i}-{j}" not in present]
+    expected.update(f"S{i}-{j}" for i in range(SAVERS) for j in range(count))
+    present = collections.Counter(identifiers_in(image))
+    bad += [(identifier, "is missing") for identifier in expected - present]
+    bad += [(identifier, "is there and should not be, or once more") for identifier in present - expected]
     return SAVERS * count, bad
+
+
+def identifiers_in(image):
+    return [entry["Identifier"] for entry in plistlib.loads(image.settings.read_bytes())["Accounts"]]
 
 
 def wrong_settings(image):

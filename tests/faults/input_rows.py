@@ -45,7 +45,9 @@ def fuzzed(_found, _directory, is_full):
     for name, runs, crashes in lines:
         print(f"     R2 {name:<14} {runs:>12} runs {crashes:>4} crashes", flush=True)
     bad = [(name, why_crashed(done.stdout, name)) for name, _, crashes in lines if crashes != "0"]
-    if not lines or (done.returncode != 0) != bool(bad):
+    targets = {path.name for path in (TOP / "fuzz/corpus").iterdir()}
+    bad += [(name, "has made no run") for name in targets - {name for name, runs, _ in lines if runs != "0"}]
+    if done.returncode != 0 and not bad:
         bad.append(("fuzz/run", f"ended with {done.returncode}: {done.stdout[-300:]}"))
     return sum(int(runs) for _, runs, _ in lines), bad
 

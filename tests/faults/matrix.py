@@ -179,6 +179,6 @@ def run_row(make, found, directory, is_full):
     others have their turn."""
     try:
         return make(found, directory, is_full)
-    except Exception as failure:
+    except (Exception, SystemExit) as failure:
         traceback.print_exc()
         return 0, [("the row", f"could not be run: {type(failure).__name__}: {failure}")]

@@ -43,7 +43,10 @@ class State:
             if name != left_out and (place / "image" / path).exists():
                 self._read(name, place / "image" / path, pathlib.Path(scratch) / f"{place.name}-look")
         self.settings = (place / "image" / SETTINGS).read_bytes()
-        self.accounts = {entry["Identifier"]: entry for entry in plistlib.loads(self.settings)["Accounts"]}
+        entries = plistlib.loads(self.settings)["Accounts"]
+        self.accounts = {entry["Identifier"]: entry for entry in entries}
+        if len(self.accounts) != len(entries):
+            self.damage = "an account is in the settings more than once"
 
     def _read(self, name, path, scratch):
         journal = pathlib.Path(f"{path}-journal")
