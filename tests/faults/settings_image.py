@@ -68,13 +68,19 @@ class SettingsImage:
     def temporary_files(self):
         return sorted((self.root / "tmp").iterdir())
 
-    def wrong_files(self, stale_allowed=False):
-        """What no fault may leave behind: torn or public files, temporary files."""
+    def wrong_settings(self):
+        """A settings file that is gone or torn."""
         if not self.settings.is_file():
             return "the settings file is gone"
         content = self.settings.read_bytes()
         if content not in (self.old, self.expected):
             return f"the settings file is neither the old nor the new one ({len(content)} bytes)"
+        return ""
+
+    def wrong_files(self, stale_allowed=False):
+        """What no fault may leave behind: torn or public files, temporary files."""
+        if wrong := self.wrong_settings():
+            return wrong
         stale = self.temporary_files()
         if len(stale) > (1 if stale_allowed else 0):
             return f"temporary files are left: {[path.name for path in stale]}"
@@ -85,7 +91,7 @@ class SettingsImage:
         for path in sides:
             if path != self.settings and path.read_bytes() != self.old and not stale_allowed:
                 return f"{path.name} is no whole copy of the old file"
-        if content == self.expected and \
+        if self.is_new() and \
                 (self.settings.stat().st_uid, self.settings.stat().st_gid) != self.owner:
             return "the new settings file has another owner"
         return ""

@@ -34,14 +34,9 @@ class UnreadableImage(SettingsImage):
         return sorted(path for path in (self.root / PREFERENCES).iterdir() if path.name.startswith(NAME + "."))
 
     def wrong_files(self, stale_allowed=False):
-        if not self.settings.is_file():
-            return "the settings file is gone"
-        content = self.settings.read_bytes()
-        if content not in (self.old, self.expected):
-            return f"the settings file is neither the old nor the new one ({len(content)} bytes)"
-        if wrong := self.wrong_temporary_files(stale_allowed):
+        if wrong := self.wrong_settings() or self.wrong_temporary_files(stale_allowed):
             return wrong
-        return self.wrong_asides(content, stale_allowed)
+        return self.wrong_asides(self.settings.read_bytes(), stale_allowed)
 
     def wrong_temporary_files(self, stale_allowed):
         stale = self.temporary_files()
