@@ -14,10 +14,12 @@
 // end is that of the last process: one that outlives the command is waited for.
 //
 // A filter in the processes stops them at the wanted calls alone, so a run is as fast as without.
-// It stays with them, and they are killed when the injector ends.
+// It stays with them, and they are killed when the injector ends. All are loaded at the same
+// addresses each time, because the calls for more memory depend on them.
 #include <fcntl.h>
 #include <linux/filter.h>
 #include <linux/seccomp.h>
+#include <sys/personality.h>
 #include <sys/prctl.h>
 #include <sys/ptrace.h>
 #include <sys/resource.h>
@@ -80,7 +82,7 @@ bool installFilter(int call) {
   close(null);
   ptrace(PTRACE_TRACEME, 0, nullptr, nullptr);
   std::raise(SIGSTOP);
-  if (installFilter(call)) execvp(command[0], command);
+  if (personality(ADDR_NO_RANDOMIZE) >= 0 && installFilter(call)) execvp(command[0], command);
   _exit(kUsage);
 }
 

@@ -66,6 +66,9 @@ CANNOT_FAIL = set("exit exit_group getpid getppid gettid getuid geteuid getgid g
 # The C library's own malloc does not survive that this fails; row S9 has allocations that fail.
 CANNOT_FAIL.add("brk")
 
+# How often these come depends on where memory lies, and that on the lengths of paths and on the moment.
+FOR_MEMORY = set("brk mmap munmap mremap mprotect madvise".split())
+
 # A system call: its name, the how-manieth of the name, and the generation of the process.
 Call = collections.namedtuple("Call", "call nth generation")
 # What happens to it: an error's name, SIGKILL, or POWER CUT, which kills all processes.
@@ -150,6 +153,19 @@ def run_with(case, command, environment, limit=30):
     if b"hit" not in output:
         raise NotHit("the fault never came")
     return process.returncode
+
+
+def where_it_comes(case, attempt, may_be_earlier=False):
+    """attempt(case); when the fault does not come, with earlier calls of the name, if `may_be_earlier` or if they
+    are for memory."""
+    if not (may_be_earlier or case.call in FOR_MEMORY):
+        return attempt(case)
+    for nth in (case.nth, case.nth // 2, case.nth // 4):
+        try:
+            return attempt(case._replace(nth=max(1, nth)))
+        except NotHit:
+            pass
+    raise NotHit("the fault never came, nor did an earlier one")
 
 
 def judge_all(cases, judge, workers=2):

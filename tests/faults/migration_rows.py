@@ -55,15 +55,10 @@ class Migration(MigrationImage):
     def run_under(self, case, worker):
         """The image of the worker after a run with the fault, and the exit code. How often the host asks for
         its child depends on the moment: when it ends before the call, an earlier one of the name is hit."""
-        for nth in (case.nth, case.nth // 2, case.nth // 4):
+        def attempt(case):
             image = self.copy(worker)
-            try:
-                return image, matrix.run_with(case._replace(nth=max(1, nth)), self.command(image), environment(),
-                                              LIMIT)
-            except matrix.NotHit:
-                if case.generation != HOST:
-                    raise
-        raise matrix.NotHit("the host never came to the call")
+            return image, matrix.run_with(case, self.command(image), environment(), LIMIT)
+        return matrix.where_it_comes(case, attempt, may_be_earlier=case.generation == HOST)
 
     def rerun(self, image):
         """What is wrong after another run, which must do all that was left to do."""

@@ -40,10 +40,15 @@ def make_file_system(name, path, content):
     return ""
 
 
-def cut(base, name, work, sync, command, environment):
+def cut(base, name, work, sync, kill, command, environment):
     """Runs the command on a copy of the file system and cuts the power when it has been killed: the
     directory with what is left, or None and why."""
     work.mkdir(exist_ok=True)
+    return matrix.where_it_comes(kill, lambda kill: cut_at(
+        base, name, work, sync, [*matrix.injection(kill), *command], environment))
+
+
+def cut_at(base, name, work, sync, command, environment):
     done = subprocess.run(
         ["unshare", "-m", str(CUT), str(base), FILE_SYSTEMS[name][2], str(work), sync, *command],
         env=environment, check=False, capture_output=True, text=True, timeout=120)
@@ -85,7 +90,7 @@ def cut_saves(found, directory, is_full):
         images = starts[start]
         first, work = images.images[0], place / f"cut{worker}"
         before = first.at(work / "m/i" / first.root.name, first)
-        left, why = cut(bases[name][worker], name, work, sync, [*matrix.injection(kill), *images.command(before)],
+        left, why = cut(bases[name][worker], name, work, sync, kill, images.command(before),
                         before.environment())
         if left is None:
             return f"the test could not be set up: {why}"
@@ -114,8 +119,8 @@ def cut_migrations(found, directory, is_full):
     def judge(case, worker):
         name, kill, sync = case
         work = migration.directory / f"cut{worker}"
-        left, why = cut(bases[name][worker], name, work, sync,
-                        [*matrix.injection(kill), *migration.command(work / "m/i/image")], environment())
+        left, why = cut(bases[name][worker], name, work, sync, kill, migration.command(work / "m/i/image"),
+                        environment())
         if left is None:
             return f"the test could not be set up: {why}"
         state = migration.look(left / "image")

@@ -45,9 +45,7 @@ def started(all_images, starts, faults):
 def fail_once(all_images):
     def judge(case, worker):
         images = all_images[case.start]
-        image = images.images[worker]
-        image.reset()
-        code = matrix.run_with(case.fault, images.command(image), image.environment())
+        image, code = images.run_under(case.fault, worker)
         return outcome_of_failed_call(code, image)
     return started(all_images, all_images, matrix.errors), judge
 
@@ -63,9 +61,7 @@ def save_again(all_images):
     writes everything, and holds no more descriptors than before."""
     def judge(case, worker):
         images = all_images[case.start]
-        image = images.images[worker]
-        image.reset()
-        code = matrix.run_with(case.fault, images.command(image, again=True), image.environment())
+        image, code = images.run_under(case.fault, worker, again=True)
         if code == "hang" or code < 0 or code >= 128:
             return f"the program ended with {code}"
         if wrong := image.wrong_files():
@@ -82,9 +78,7 @@ def save_again(all_images):
 def kill(all_images):
     def judge(case, worker):
         images = all_images[case.start]
-        image = images.images[worker]
-        image.reset()
-        code = matrix.run_with(case.fault, images.command(image), image.environment())
+        image, code = images.run_under(case.fault, worker)
         if code != -signal.SIGKILL:
             return f"it was not killed, but ended with {code}"
         return image.wrong_files(stale_allowed=True) or next_save(images, image) or \

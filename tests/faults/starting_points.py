@@ -141,3 +141,12 @@ class Images:
 
     def command(self, image, again=False):
         return [self.saver, AGAIN[self.work] if again else self.work, str(image.root)]
+
+    def run_under(self, fault, worker, again=False):
+        """The image of the worker after a save with the fault, and the exit code."""
+        image = self.images[worker]
+
+        def attempt(fault):
+            image.reset()
+            return image, matrix.run_with(fault, self.command(image, again), image.environment())
+        return matrix.where_it_comes(fault, attempt)
