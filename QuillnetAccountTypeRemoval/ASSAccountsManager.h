@@ -124,6 +124,8 @@ class ASSAccountsManager {
   // Writes every account, merged with what the file holds by now, in one step: a reader sees the
   // old or the new file. When anything fails the file stays as it is, one line is logged and
   // nothing is returned. Accounts that another process added meanwhile are not carried over.
+  // When memory runs out after the new file is in place, while others are told of the changes, that
+  // is thrown; the records know then that they were saved.
   //
   // A file that cannot be read now, or could not be when this store was made from it, is kept under
   // another name beside it (FileServices::setAsideUnreadableFile); where that fails, so does the
@@ -255,7 +257,9 @@ class ASSAccountsManager {
   bool _everyChildHasItsParent(const StringList& types, const AccountArray& accounts) const;
   void _placeChild(const AccountPtr& child, const AccountsByID& placed);
   bool _fixAccountsBeforeSaving();
-  propertylist::Array _mergedAccounts(const ASSAccountsManager& onDisk) const;
+  // `inMemory` has the properties to save of every top-level account, in order.
+  propertylist::Array _mergedAccounts(const std::vector<propertylist::Dictionary>& inMemory,
+                                      const ASSAccountsManager& onDisk) const;
 
   // Every account in the order of the file, as it was registered; an account placed by
   // replaceAccountWithAccount is listed here and not registered by its identifier.

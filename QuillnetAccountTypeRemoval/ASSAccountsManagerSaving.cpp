@@ -1,6 +1,7 @@
 // Writing the accounts back, merged with what the file holds by now.
 
 #include <new>
+#include <utility>
 
 #include "QuillnetAccountTypeRemoval/ASLog.h"
 #include "QuillnetAccountTypeRemoval/ASSAccountsManager.h"
@@ -67,14 +68,16 @@ bool ASSAccountsManager::_fixAccountsBeforeSaving() {
   return fixedAny;
 }
 
-Array ASSAccountsManager::_mergedAccounts(const ASSAccountsManager& onDisk) const {
+Array ASSAccountsManager::_mergedAccounts(const std::vector<Dictionary>& inMemory,
+                                          const ASSAccountsManager& onDisk) const {
   std::vector<Value> accounts;
-  accounts.reserve(orderedTopLevelAccounts_->size());
-  for (const AccountPtr& account : *orderedTopLevelAccounts_) {
+  accounts.reserve(inMemory.size());
+  for (const Dictionary& properties : inMemory) {
+    const AccountPtr& account = (*orderedTopLevelAccounts_)[accounts.size()];
     const std::optional<std::string> identifier = account->identifier();
     const AccountPtr stored = identifier ? onDisk.accountWithIdentifier(*identifier) : nullptr;
     const Dictionary result = mergeInMemoryPropertiesOriginalPropertiesOnDiskProperties(
-        account->propertiesToSave(), account->originalProperties(),
+        properties, account->originalProperties(),
         stored ? std::optional(stored->propertiesToSave()) : std::nullopt);
     // The list is computed whether or not tracing is on, and never printed.
     const StringList enabled = account->enabledDataclasses().value_or(StringList());
@@ -87,11 +90,16 @@ Array ASSAccountsManager::_mergedAccounts(const ASSAccountsManager& onDisk) cons
 void ASSAccountsManager::saveAllAccounts() {
   ASLog("Saving all accounts");
   const bool fixedAny = _fixAccountsBeforeSaving();
+  std::vector<Dictionary> inMemory;  // of each account in order
   bool saved = false;
   try {
     // What another process wrote since this store was loaded.
     const AccountsManagerPtr onDisk = initInsideOfMigration();
-    const Dictionary root{{"Accounts", _mergedAccounts(*onDisk)}, {"Version", currentVersion()}};
+    inMemory.reserve(orderedTopLevelAccounts_->size());
+    for (const AccountPtr& account : *orderedTopLevelAccounts_)
+      inMemory.push_back(account->propertiesToSave());
+    const Dictionary root{{"Accounts", _mergedAccounts(inMemory, *onDisk)},
+                          {"Version", currentVersion()}};
     // The file may be readable by now, with accounts that this store never saw.
     const bool holdsWhatNobodyRead = settingsFileIsUnreadable_ || onDisk->settingsFileIsUnreadable_;
     saved = writeSettingsFile(root, fullPathToAccountSettingsPlist(), holdsWhatNobodyRead);
@@ -101,9 +109,10 @@ void ASSAccountsManager::saveAllAccounts() {
   if (saved) {
     settingsFileIsUnreadable_ = false;
     // From here on, what is in memory counts as known to the file, also where the file kept values
-    // of its own: they stay on disk and are not taken into memory.
-    for (const AccountPtr& account : *orderedTopLevelAccounts_)
-      account->setOriginalProperties(account->propertiesToSave());
+    // of its own: they stay on disk and are not taken into memory. Nothing may fail any more, or
+    // the next save would take what this one wrote for a change of its own.
+    for (std::size_t i = 0; i < inMemory.size(); ++i)
+      (*orderedTopLevelAccounts_)[i]->setOriginalProperties(std::move(inMemory[i]));
   } else {
     platform::logToSystem(
         "Failed to save accounts to filesystem. Maybe the information did not conform to a plist.");

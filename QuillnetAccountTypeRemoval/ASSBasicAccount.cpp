@@ -107,8 +107,8 @@ void ASSBasicAccount::_forcedSetAccountPropertyForKey(const std::optional<Value>
 
 void ASSBasicAccount::removeAccountPropertyForKey(std::string_view key) { properties_.remove(key); }
 
-void ASSBasicAccount::setOriginalProperties(const Dictionary& properties) {
-  originalProperties_ = properties;
+void ASSBasicAccount::setOriginalProperties(Dictionary properties) noexcept {
+  originalProperties_ = std::move(properties);
 }
 
 std::optional<std::string> ASSBasicAccount::_stringForKey(std::string_view key) const {

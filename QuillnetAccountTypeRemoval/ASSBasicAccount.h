@@ -78,7 +78,7 @@ class ASSBasicAccount : public platform::Describable,
   virtual const propertylist::Dictionary& propertiesToSave() const { return properties_; }
   // The properties that the record was made from or last saved with.
   const propertylist::Dictionary& originalProperties() const { return originalProperties_; }
-  void setOriginalProperties(const propertylist::Dictionary& properties);
+  void setOriginalProperties(propertylist::Dictionary properties) noexcept;
 
   // Strings of the record or, where it has none, of its parent. A value that is no string counts as
   // none.

@@ -152,6 +152,48 @@ TEST_F(SavingFaults, MemoryThatRunsOutBehindTheRenameDoesNotUndoTheSave) {
   expectSaved();
 }
 
+// Makes what it saves anew whenever it is asked, and has no memory for that at one of the times.
+class ScarceAccount : public OpenAccount {
+ public:
+  using OpenAccount::OpenAccount;
+  static std::shared_ptr<ScarceAccount> initWithProperties(const Dictionary& properties) {
+    return _recordWithProperties<ScarceAccount>(properties);
+  }
+  const Dictionary& propertiesToSave() const override {
+    if (--askedUntilFailure == 0) throw std::bad_alloc();
+    return properties();
+  }
+  static inline int askedUntilFailure = 0;
+};
+
+TEST_F(SavingFaults, WheneverMemoryRunsOutForWhatIsSavedFileAndBasesAreOldOrNewTogether) {
+  Lines walked;
+  for (int n = 1; n < 100; ++n) {
+    SCOPED_TRACE(n);
+    const Array old{accountInfo("1", "CalDAV", {{"n", 1}}), accountInfo("2", "CalDAV", {{"n", 1}})};
+    const Array changed{accountInfo("1", "CalDAV", {{"n", 2}}),
+                        accountInfo("2", "CalDAV", {{"n", 2}})};
+    device.writeAccounts(old);
+    device.systemLog.clear();
+    ScarceAccount::askedUntilFailure = 0;
+    const AccountArray accounts{ScarceAccount::initWithProperties(*old[0].asDictionary()),
+                                ScarceAccount::initWithProperties(*old[1].asDictionary())};
+    store->replaceAccountsWithTypesWithAccounts({"CalDAV"}, accounts);
+    for (const AccountPtr& account : accounts) account->setAccountPropertyForKey(2, "n");
+
+    ScarceAccount::askedUntilFailure = n;
+    store->saveAllAccounts();
+    if (ScarceAccount::askedUntilFailure > 0) break;  // every time had its turn
+    const bool saved = device.savedAccounts() == changed;
+    walked.emplace_back(saved ? "saved" : "not saved");
+    EXPECT_EQ(device.savedAccounts(), saved ? changed : old);
+    EXPECT_EQ(device.logLines(), saved ? Lines() : Lines{kFailureLine});
+    for (const AccountPtr& account : accounts)
+      EXPECT_EQ(account->originalProperties().find("n")->asInteger(), saved ? 2 : 1);
+  }
+  EXPECT_EQ(walked, (Lines{"not saved", "not saved"}));
+}
+
 TEST_F(SavingFaults, WriteThatStopsHalfWayLeavesTheOldFile) {
   device.fileServices.answerNext("writeAll", {Status::failure(ENOSPC, "disk full"), true});
   store->saveAllAccounts();

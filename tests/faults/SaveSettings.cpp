@@ -1,10 +1,12 @@
 // Loads, changes and saves the settings of a device image, for tests that fail or kill it on the
 // way.
-//   fault_saver once IMAGE           changes the name of account "A" and saves
+//   fault_saver once IMAGE           renames account "A" and the last one to "changed" and saves
 //   fault_saver twice IMAGE          the same, and saves again; anew when the first try came to
 //                                    nothing
 //   fault_saver insert IMAGE         adds account "New" to what could be loaded, and saves
 //   fault_saver insert-twice IMAGE   the same, and saves again
+//   fault_saver change IMAGE         does what another program may do between two saves: renames
+//                                    every account to "theirs" and notes its name before as "Seen"
 //   fault_saver many IMAGE ID N      N times: loads, counts up in the account ID, saves
 //   fault_saver until IMAGE ID       as many, until it is killed
 //   fault_saver add IMAGE ID N       N times, each under the migration lock: loads, adds an
@@ -12,6 +14,7 @@
 //                                    saves
 // The exit code says what happened, since a fault may hit any output: see Outcome. It is a sum.
 //   SAVER_BEFORE_SAVE=C   the shell runs C after the first load
+//   SAVER_BEFORE_SECOND=C the shell runs C before the second save
 //   SAVER_LOG=F           what is logged is appended to the file F
 #include <cstdlib>
 #include <filesystem>
@@ -66,6 +69,7 @@ AccountsManagerPtr loadAndRename() {
   const accountsettings::AccountPtr account = store->accountWithIdentifier("A");
   if (account == nullptr) return nullptr;
   account->setDisplayName("changed");
+  store->allBasicAccounts()->back()->setDisplayName("changed");
   return store;
 }
 
@@ -102,9 +106,21 @@ int save(const std::function<AccountsManagerPtr()>& loadAndChange, bool again) {
   int outcome = tryToSave(store, loadAndChange, std::getenv("SAVER_BEFORE_SAVE"));
   if (endOfFailing != nullptr) endOfFailing();
   if (!again) return outcome;
-  if (tryToSave(store, loadAndChange, nullptr) != 0) outcome += kSecondSaveFailed;
+  if (tryToSave(store, loadAndChange, std::getenv("SAVER_BEFORE_SECOND")) != 0)
+    outcome += kSecondSaveFailed;
   if (countOfDescriptors() != before) outcome += kDescriptorsLeaked;
   return outcome;
+}
+
+int change() {
+  const AccountsManagerPtr store = ASSAccountsManager::init();
+  for (const accountsettings::AccountPtr& account : *store->allBasicAccounts()) {
+    account->setAccountPropertyForKey(propertylist::Value(account->displayName().value_or("")),
+                                      "Seen");
+    account->setDisplayName("theirs");
+  }
+  store->saveAllAccounts();
+  return logLines == 0 ? 0 : kSaveFailed;
 }
 
 int saveMany(const std::string& identifier, long count) {
@@ -145,6 +161,7 @@ int run(int count, char** arguments) {
   platform::install(services.services());
   if (work == "once" || work == "twice") return save(loadAndRename, work == "twice");
   if (work == "insert" || work == "insert-twice") return save(loadAndInsert, work != "insert");
+  if (work == "change") return change();
   if (work == "until" && count == 4)
     return saveMany(arguments[3], std::numeric_limits<long>::max());
   if (count < 5) return kWrongUsage;

@@ -1,5 +1,6 @@
 """Allocations that fail in a load and save: row S9 of docs/reliability.md."""
 
+import plistlib
 import shutil
 import subprocess
 
@@ -26,11 +27,30 @@ def failing_allocations(found, directory, is_full):
     return count, bad
 
 
+def wrong_merge(image):
+    """What is wrong with the settings that a process has saved twice, the second time without a change of its own,
+    when another program has renamed every account between. The process had renamed the first account and the last
+    one: if its first save came about, both names are known to the file and the newer ones stay; if not, it has its
+    own still to write."""
+    expected = plistlib.loads(image.old)["Accounts"]
+    found = plistlib.loads(image.settings.read_bytes())["Accounts"]
+    is_saved = found[0].get("Seen") == "changed"
+    for account in expected:
+        is_renamed = account in (expected[0], expected[-1])
+        account["Seen"] = "changed" if is_saved and is_renamed else account["DisplayName"]
+        account["DisplayName"] = "changed" if is_renamed and not is_saved else "theirs"
+    if found != expected:
+        names = [account.get("DisplayName") for account in found]
+        return f"merged wrongly after a first save that {'came about' if is_saved else 'failed'}: {names}"
+    return ""
+
+
 def failing_from(found, place, start, is_full):
     images = Images(found, place, start)
 
-    def save(image, again, **variables):
+    def save(image, again, before_second="", **variables):
         environment = {**image.environment(), "LD_PRELOAD": found["failing_allocations"],
+                       **({"SAVER_BEFORE_SECOND": before_second} if before_second else {}),
                        **{f"FAILING_{name.upper()}": str(value) for name, value in variables.items()}}
         return subprocess.run(images.command(image, again), env=environment, check=False,
                               timeout=save_rows.LIMIT).returncode
@@ -62,9 +82,14 @@ def failing_from(found, place, start, is_full):
         if wrong := wrong or save_rows.next_save(images, image):
             return wrong
         image.reset()
-        code = save(image, True, at=number, **lasting_too)
+        # What cannot be read, another program cannot change.
+        other = "" if start else f"{images.saver} change {image.root}"
+        code = save(image, True, other, at=number, **lasting_too)
         if code < 0 or code & (save_rows.SECOND_FAILED | save_rows.LEAKED):
             return f"the next save of the same process ended with {code}"
+        if other:
+            left = image.temporary_files()
+            return wrong_merge(image) or (f"temporary files are left: {left}" if left else "")
         return image.wrong_files() or ("" if image.is_new() else "the next save of the same process wrote nothing")
     return [(number, lasting) for number in numbers for lasting in (False, True)], judge
 
