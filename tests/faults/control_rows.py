@@ -95,18 +95,25 @@ def run_row(control, make, found, place):
     return bad, [text for _, text in bad if re.search(control.sign, text)]
 
 
-def try_controls(rows, directory):
-    """A case for each control unchanged, and one for it changed."""
+def possible_controls(why_skipped):
+    """Those whose row can be tried here. The others are told of."""
+    possible = []
+    for control in CONTROLS:
+        if reason := why_skipped(control.row):
+            print(f"     Q3 {control.name}: skipped, row {control.row} {reason}", flush=True)
+        else:
+            possible.append(control)
+    return possible
+
+
+def try_controls(rows, controls, directory):
+    """A case for each control: its row with the unchanged programs, then with the changed ones."""
     (directory / "copy").mkdir()
     copy = Copy(directory / "copy")
-    wrong, count = [], 0
-    unchanged = copy.build(sorted({target for control in CONTROLS for target in control.targets}))
-    for control in CONTROLS:
-        if control.row not in rows:
-            print(f"     Q3 {control.name}: skipped, this needs row {control.row}", flush=True)
-            continue
+    wrong = []
+    unchanged = copy.build(sorted({target for control in controls for target in control.targets}))
+    for control in controls:
         begin = time.monotonic()
-        count += 1
         _, make = rows[control.row]
         bad, _ = run_row(control, make, unchanged, directory / "unchanged")
         if bad:
@@ -121,11 +128,11 @@ def try_controls(rows, directory):
         if not signs:
             wrong.append((control.name, f"row {control.row} does not notice"))
     shutil.rmtree(directory / "copy")
-    return count, wrong
+    return len(controls), wrong
 
 
-def rows_about(rows):
-    """The row that tries the given ones."""
+def rows_about(rows, why_skipped):
+    """The row that tries the given ones, but for those of which `why_skipped` has something to say."""
     def controls(_found, directory, _is_full):
-        return try_controls(rows, directory)
+        return try_controls(rows, possible_controls(why_skipped), directory)
     return {"Q3": ("programs that are wrong on purpose turn their rows red", controls)}

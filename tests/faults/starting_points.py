@@ -2,6 +2,7 @@
 cannot be and must be kept under a second name first, and settings that a load did not get."""
 
 import collections
+import functools
 import os
 import stat
 
@@ -116,19 +117,25 @@ class StartedCase(collections.namedtuple("StartedCase", "start fault")):
 
 
 class Images:
-    """One image for each worker, and the calls of a save that are to be tried."""
+    """One image for each worker, and `calls`, those of a save that are to be tried."""
 
     def __init__(self, tools, directory, start="", workers=2):
-        make, self.work, first, end = STARTS[start]
+        make, self.work, self._first, self._end = STARTS[start]
+        self._start = start
         self.saver = tools["fault_saver"]
         self.images = [make(tools, directory / f"image{start.replace(' ', '-')}{i}") for i in range(workers)]
         for image in self.images:
             image.learn(self.command(image), image.environment())
-        self.calls = self._calls(first)
-        if end:
-            self.calls = self.calls[:-len(self._calls(end))]
-        if not self.calls:
-            raise SystemExit(f"a save of {start} settings makes none of the calls that are to be tried")
+
+    @functools.cached_property
+    def calls(self):
+        """For the rows that hit them: it takes the right to trace to find them."""
+        calls = self._calls(self._first)
+        if self._end:
+            calls = calls[:-len(self._calls(self._end))]
+        if not calls:
+            raise SystemExit(f"a save of {self._start} settings makes none of the calls that are to be tried")
+        return calls
 
     def _calls(self, first):
         return matrix.always([self._traced(first) for _ in range(3)])
