@@ -207,16 +207,19 @@ void listWhatWasNotSeen(const Observation& before, RecordAccounting& result) {
   });
 }
 
+std::string whereTheyAre(std::int64_t count, const DataclassReport& line, const char* place) {
+  return amount(count, line.dataclass) + " of account " + line.account +
+         (count == 1 ? " is " : " are ") + place;
+}
+
 void listWhatIsNotLocal(RecordAccounting& result) {
   for (const DataclassReport& line : result.dataclasses) {
     if (line.leftBehind > 0)
-      result.leftBehind.push_back(amount(line.leftBehind, line.dataclass) + " of account " +
-                                  line.account + " are still in the account's own store alone.");
-    if (line.retired > 0)
       result.leftBehind.push_back(
-          amount(line.retired, line.dataclass) + " of account " + line.account +
-          " are in a retired store alone, from where they can be exported or "
-          "brought back.");
+          whereTheyAre(line.leftBehind, line, "still in the account's own store alone."));
+    if (line.retired > 0)
+      result.leftBehind.push_back(whereTheyAre(
+          line.retired, line, "in a retired store alone, which can be exported or brought back."));
   }
 }
 

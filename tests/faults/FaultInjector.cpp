@@ -10,7 +10,8 @@
 // to the process before the call acts, "cut" to all processes, as when the power goes; else the
 // call does nothing and fails with the errno. The calls are those from the command's execve on.
 //
-// What the command prints is thrown away. The exit status is the command's own, or its signal. The
+// What the command prints is thrown away; with INJECTOR_OUTPUT=F its standard output goes to the
+// file F. The exit status is the command's own, or its signal. The
 // end is that of the last process: one that outlives the command is waited for.
 //
 // A filter in the processes stops them at the wanted calls alone, so a run is as fast as without.
@@ -80,6 +81,10 @@ bool installFilter(int call) {
   const int null = open("/dev/null", O_RDWR);
   for (int descriptor = 0; descriptor <= 2; ++descriptor) dup2(null, descriptor);
   close(null);
+  if (const char* path = std::getenv("INJECTOR_OUTPUT")) {
+    const int output = open(path, O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, 0600);
+    dup2(output, STDOUT_FILENO);
+  }
   ptrace(PTRACE_TRACEME, 0, nullptr, nullptr);
   std::raise(SIGSTOP);
   if (personality(ADDR_NO_RANDOMIZE) >= 0 && installFilter(call)) execvp(command[0], command);

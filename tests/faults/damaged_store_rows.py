@@ -5,6 +5,8 @@ import sqlite3
 import subprocess
 
 import matrix
+import migration_log
+import migration_report
 from migration_image import environment
 from migration_rows import DONE, LEFT_BEHIND, LIMIT, prepared
 from migration_state import DATABASES
@@ -67,6 +69,20 @@ DAMAGES = {
 # Ways to hold a database, and what the rest of the world may still do with it.
 HELD = {"locked": "BEGIN EXCLUSIVE", "about to be written": "BEGIN IMMEDIATE"}
 READ_ONLY = "read-only"
+# What cannot even be read. Of the others is known what they hold, and that it is nowhere else: all but the one
+# record of each kind that the device has too.
+UNREAD = {*DAMAGES, "locked"}
+DATACLASSES = {"Contacts": ["contacts"], "Calendars": ["calendars", "reminders"], "Bookmarks": ["bookmarks"],
+               "Notes": ["notes"]}
+STILL_THERE = {
+    "Contacts": ["5 records of contacts of account Q1 are"], "Bookmarks": ["5 records of bookmarks of account Q1 are"],
+    "Notes": ["5 records of notes of account Q1 are"],
+    "Calendars": ["1 record of calendars of account Q1 is", "5 records of reminders of account Q1 are",
+                  "2 records of calendars of account Q2 are", "2 records of calendars of account V1 are"]}
+REMEDY = "; bring back a sound copy, or wait for who uses it."
+REMEDIES = {
+    "about to be written": "; wait for who uses it.",
+    READ_ONLY: "; give the right to write, or mount the image so that it can be written."}
 READ_ONLY_RUN = 'mount --bind "$1" "$1" && mount -o remount,ro,bind "$1" && shift && exec "$@"'
 
 
@@ -102,6 +118,19 @@ def wrong_others(migration, state, name):
     return "" if state.settings == migration.end.settings else f"the accounts are {sorted(state.accounts)}"
 
 
+def wrong_reasons(kind, name, path, reasons):
+    """What is wrong with what the report says was left: the database, and what is in it of each account."""
+    *owners, last = reasons
+    if not last.startswith(f"{path} was left alone: ") or not last.endswith(REMEDIES.get(kind, REMEDY)):
+        return f"the report does not say what was left, and why: {last}"
+    if kind in UNREAD:
+        wanted = [migration_report.UNSEEN.format(account, dataclass)
+                  for account in ("Q1", "Q2", "V1") for dataclass in DATACLASSES[name]]
+    else:
+        wanted = [f"{what} still in the account's own store alone." for what in STILL_THERE[name]]
+    return "" if owners == wanted else f"the report does not say whose records were left: {owners}"
+
+
 def damaged_stores(found, directory, _is_full):
     """All cases, always."""
     migration = prepared(found, directory, RECORDS, "m6")
@@ -123,14 +152,9 @@ def damaged_stores(found, directory, _is_full):
             return f"the host ended with {done.returncode}: {done.stdout[-300:]}"
         if what_is_at(path) != before:
             return "what could not be used has changed"
-        # One that is only read by others is found out when it is to be written.
-        if kind != "about to be written" and f"{path} was left alone" not in done.stdout:
-            return f"the report does not say what was left: {done.stdout[-300:]}"
-        if kind in DAMAGES and "What account Q1 has of" not in done.stdout:
-            return f"the report does not say whose records were left: {done.stdout[-300:]}"
-        if not (image / "var/log/system.log").read_text():
-            return "nothing is logged"
-        return wrong_others(migration, migration.look(image, left_out=name), name)
+        return wrong_reasons(kind, name, path, migration_report.read(done.stdout)["reasons"]) or \
+            migration_log.wrong_log(image, name) or \
+            wrong_others(migration, migration.look(image, left_out=name), name)
     # Those that are held wait most of the time.
     return len(cases), matrix.judge_all(cases, judge, workers=4)
 

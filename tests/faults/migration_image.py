@@ -15,6 +15,8 @@ from migration_state import Rules, State
 # The accounts that are to be retired, and the stores with their records.
 SELECTED = {"Q1", "Q2", "V1"}
 SELECTED_STORES = {"Quillnet:ada", "Q2-calendars", "V1-calendars"}
+# The store of the agent is that of each account of its types.
+STORES = {"Q1": {"Quillnet:ada"}, "Q2": {"Quillnet:ada", "Q2-calendars"}, "V1": {"Quillnet:ada", "V1-calendars"}}
 DATACLASSES = ["contacts", "calendars", "reminders", "bookmarks", "notes"]
 # Of 1,000 records of the service, so many lie in each of the three stores with calendars, 10 are on the
 # device too, and 10 in another version.
@@ -137,7 +139,7 @@ class MigrationImage:
             file.unlink()
 
     def command(self, image):
-        return [self.found["migration-host"], "run", "--image", str(image), "--quiet"]
+        return [self.found["migration-host"], "run", "--image", str(image), "--quiet", "--json"]
 
     def copy(self, worker):
         """An image of the worker's own, as it was in the beginning; its parent holds what lies outside."""

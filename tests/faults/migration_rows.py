@@ -9,7 +9,8 @@ import random
 import subprocess
 
 import matrix
-from migration_image import LIMIT, MigrationImage, environment
+from migration_image import LIMIT, STORES, MigrationImage, environment
+from migration_report import wrong_report
 from migration_state import State
 
 # The exit codes of the manual page that a run without a signal to the host itself may have.
@@ -31,7 +32,14 @@ class Migration(MigrationImage):
         self._learn_settings()
 
     def _traced(self):
-        return matrix.traced_calls(self.command(self.copy("traced")), environment(), FIRST_CALL)
+        return matrix.traced_calls(self.command(self.copy("traced")), self._reporting("traced"), FIRST_CALL)
+
+    def _reporting(self, worker):
+        """The environment of a host whose report goes to a file."""
+        return {**environment(), "INJECTOR_OUTPUT": str(self._report(worker))}
+
+    def _report(self, worker):
+        return self.directory / f"report{worker}"
 
     def _learn_settings(self):
         """The settings file of every moment: that before each rename of a run, and the last one."""
@@ -49,20 +57,26 @@ class Migration(MigrationImage):
         return State(image.parent, self.directory, left_out)
 
     def run(self, image):
-        return subprocess.run(self.command(image), env=environment(), check=False, timeout=LIMIT,
-                              stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL).returncode
+        """The exit code, and the report."""
+        done = subprocess.run(self.command(image), env=environment(), check=False, timeout=LIMIT,
+                              stdout=subprocess.PIPE, stderr=subprocess.DEVNULL, text=True)
+        return done.returncode, done.stdout
 
     def run_under(self, case, worker):
         """The image of the worker after a run with the fault, and the exit code. How often the host asks for
         its child depends on the moment: when it ends before the call, an earlier one of the name is hit."""
         def attempt(case):
             image = self.copy(worker)
-            return image, matrix.run_with(case, self.command(image), environment(), LIMIT)
+            return image, matrix.run_with(case, self.command(image), self._reporting(worker), LIMIT)
         return matrix.where_it_comes(case, attempt, may_be_earlier=case.generation == HOST)
+
+    def report_of(self, worker):
+        """What the last run under a fault has printed."""
+        return self._report(worker).read_text(encoding="utf-8")
 
     def rerun(self, image):
         """What is wrong after another run, which must do all that was left to do."""
-        code = self.run(image)
+        code, _ = self.run(image)
         return f"the run after that ended with {code}" if code != DONE else self.rules.wrong_at_end(self.look(image))
 
 
@@ -149,13 +163,16 @@ def fail_and_rerun(found, directory, is_full):
         left = migration.look(image)
         if code not in DOCUMENTED:
             return f"the host ended with {code}"
-        if wrong := rules.wrong_always(left) or rules.wrong_in_run(migration.begin, left, code):
+        wrong = rules.wrong_always(left) or rules.wrong_in_run(migration.begin, left, code) or \
+            wrong_report(STORES, migration.begin, left, code, migration.report_of(worker))
+        if wrong:
             return f"{wrong}; the host had ended with {code}"
-        again = migration.run(image)
+        again, report = migration.run(image)
         if again not in (DONE, LEFT_BEHIND):
             return f"the run after that ended with {again}, the first with {code}"
         end = migration.look(image)
-        wrong = rules.wrong_always(end) or rules.wrong_in_run(left, end, again) or rules.wrong_remains(end)
+        wrong = rules.wrong_always(end) or rules.wrong_in_run(left, end, again) or rules.wrong_remains(end) or \
+            wrong_report(STORES, left, end, again, report)
         return f"{wrong}; the host had ended with {code}, then {again}" if wrong else ""
     return len(cases), matrix.judge_all(cases, judge)
 

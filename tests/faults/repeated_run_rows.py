@@ -4,12 +4,14 @@ import subprocess
 import sys
 
 import matrix
-from migration_image import environment
+import migration_report as report
+from migration_image import SELECTED, environment
 from migration_rows import BUSY, DONE, LIMIT, prepared
 from migration_state import DATABASES, SETTINGS
 
 RECORDS = 6  # of each kind
 AT_ONCE = 10
+NOT_SELECTED = dict.fromkeys(("stays", "dav", "directory"), "not selected")
 # A program that is killed when it has changed the database and not yet removed its journal.
 HALF_A_CHANGE = """import sqlite3, sys
 database = sqlite3.connect(sys.argv[1])
@@ -59,11 +61,15 @@ KEPT = {
 
 
 def two_at_once(migration, image):
-    hosts = [subprocess.Popen(migration.command(image), env=environment(), stdout=subprocess.DEVNULL,
-                              stderr=subprocess.DEVNULL) for _ in range(2)]
-    codes = sorted(host.wait(LIMIT) for host in hosts)
-    if codes not in ([DONE, DONE], [DONE, BUSY]):
-        return f"two hosts ended with {codes}"
+    """One of them retires every account; the other one is turned away, or comes when nothing is left to do."""
+    hosts = [subprocess.Popen(migration.command(image), env=environment(), stdout=subprocess.PIPE,
+                              stderr=subprocess.DEVNULL, text=True) for _ in range(2)]
+    reports = [report.read(host.communicate(timeout=LIMIT)[0]) for host in hosts]
+    ends = [(host.returncode, each and report.outcomes(each)) for host, each in zip(hosts, reports)]
+    ends.sort(key=lambda end: SELECTED <= (end[1] or {}).keys())
+    if ends[1] != (DONE, {**dict.fromkeys(SELECTED, "retired"), **NOT_SELECTED}) or \
+            ends[0] not in ((BUSY, {}), (DONE, NOT_SELECTED)):
+        return f"two hosts ended with {ends}"
     return migration.rules.wrong_at_end(migration.look(image)) or migration.rerun(image)
 
 
@@ -84,7 +90,7 @@ def run_again(migration, image):
 def run_over_what_is_kept(migration, image, name, plant):
     plant(image)
     before = migration.look(image).files[f"image/{name}"]
-    code = migration.run(image)
+    code, _ = migration.run(image)
     after = migration.look(image)
     if code != DONE or after.files.pop(f"image/{name}", None) != before:
         return f"the host ended with {code}, and {name} has changed or is gone"

@@ -81,6 +81,16 @@ class Output(hosttest.HostTestCase):
         self.assertIn("could not be written to its end", run.errors)
         self.assertEqual(mode, os.stat("/dev/full").st_mode)
 
+    def test_a_report_that_cannot_be_written_is_a_failure(self):
+        for accounts, code in ((), 0), ([account("Q", "Quillnet", ["contacts"], status=1)], 3):
+            with self.subTest(code=code):
+                self.write_settings(*accounts)
+                self.assertEqual(code, self.run_host("--bundle", GOOD, "--quiet").code)
+                with open("/dev/full", "wb") as full:
+                    done = subprocess.run(self.command("--bundle", GOOD, "--quiet"), stdout=full,
+                                          check=False)
+                self.assertEqual(1, done.returncode)
+
     def test_the_images_system_log_gets_the_lines(self):
         self.run_host("--bundle", GOOD)
         lines = (self.image / "var/log/system.log").read_text().splitlines()

@@ -24,6 +24,12 @@ bool print(const std::string& text) {
          std::fflush(stdout) == 0;
 }
 
+// Makes a failure of a run that was done, but for what cannot be written.
+void fail(host::MigrationReport& report) {
+  if (report.outcome == host::RunOutcome::done || report.outcome == host::RunOutcome::leftBehind)
+    report.outcome = host::RunOutcome::failed;
+}
+
 int run(const CommandLine& command) {
   // A reader of the output that goes away does not stop a migration.
   std::signal(SIGPIPE, SIG_IGN);
@@ -47,13 +53,11 @@ int run(const CommandLine& command) {
   if (!logProblem.empty()) {
     std::fprintf(stderr, "migration-host: %s\n", logProblem.c_str());
     report.reasons.push_back(logProblem);
-    if (report.outcome == host::RunOutcome::done || report.outcome == host::RunOutcome::leftBehind)
-      report.outcome = host::RunOutcome::failed;
+    fail(report);
   }
   const bool colours = isatty(STDOUT_FILENO) != 0;
-  if (!print(command.json ? jsonReport(report) : textReport(report, colours)) &&
-      report.outcome == host::RunOutcome::done)
-    return EXIT_FAILURE;  // done, but nobody can have read the report
+  // When nobody can have read the report, it lists nothing.
+  if (!print(command.json ? jsonReport(report) : textReport(report, colours))) fail(report);
   return static_cast<int>(report.outcome);
 }
 
