@@ -4,6 +4,8 @@
 //   MEDDLER_LATER=PATH  the same when its bytes are about to be brought to the disk
 //   MEDDLER_GROW=PATH   the file grows by a MiB before each read of it, without end
 //   MEDDLER_SWAP=A:B    A and B change places before each opening, so that no look at a path holds
+//   MEDDLER_SWAP_AT=C   the same before each "rename", "unlink" or "fchown" (give one) and before
+//                       no opening
 #include <dlfcn.h>
 #include <fcntl.h>
 #include <sys/stat.h>
@@ -14,6 +16,7 @@
 #include <cstdlib>
 #include <cstring>
 #include <string>
+#include <string_view>
 
 namespace {
 
@@ -45,10 +48,24 @@ EXPORTED char* tempnam(const char* directory, const char* prefix) {
 
 namespace {
 
+// At one of the calls, given by its name.
+void swapPlacesAt(std::string_view call) {
+  static const char* const swapped = std::getenv("MEDDLER_SWAP");
+  static const char* const at = std::getenv("MEDDLER_SWAP_AT");
+  if (swapped == nullptr || call != (at != nullptr ? at : "open")) return;
+  const std::string both = swapped;
+  const std::size_t colon = both.find(':');
+  if (original<decltype(renameat2)>("renameat2")(AT_FDCWD, both.substr(0, colon).c_str(), AT_FDCWD,
+                                                 both.substr(colon + 1).c_str(),
+                                                 RENAME_EXCHANGE) != 0)
+    std::abort();
+}
+
 void replaceByLink(int descriptor, const char* target) {
   if (target == nullptr) return;
   const std::string name = nameOf(descriptor);
-  if (unlink(name.c_str()) != 0 || symlink(target, name.c_str()) != 0) std::abort();
+  if (original<decltype(unlink)>("unlink")(name.c_str()) != 0 || symlink(target, name.c_str()) != 0)
+    std::abort();
 }
 
 bool isRegular(int descriptor) {
@@ -58,7 +75,29 @@ bool isRegular(int descriptor) {
 
 }  // namespace
 
+EXPORTED int rename(const char* from, const char* to) noexcept {
+  swapPlacesAt("rename");
+  return original<decltype(rename)>("rename")(from, to);
+}
+
+EXPORTED int renameat2(int fromDirectory, const char* from, int toDirectory, const char* to,
+                       unsigned flags) noexcept {
+  swapPlacesAt("rename");
+  return original<decltype(renameat2)>("renameat2")(fromDirectory, from, toDirectory, to, flags);
+}
+
+EXPORTED int unlink(const char* path) noexcept {
+  swapPlacesAt("unlink");
+  return original<decltype(unlink)>("unlink")(path);
+}
+
+EXPORTED int unlinkat(int directory, const char* path, int flags) noexcept {
+  swapPlacesAt("unlink");
+  return original<decltype(unlinkat)>("unlinkat")(directory, path, flags);
+}
+
 EXPORTED int fchown(int descriptor, uid_t user, gid_t group) noexcept {
+  swapPlacesAt("fchown");
   replaceByLink(descriptor, std::getenv("MEDDLER_LINK"));
   return original<decltype(fchown)>("fchown")(descriptor, user, group);
 }
@@ -79,16 +118,6 @@ EXPORTED ssize_t read(int descriptor, void* buffer, std::size_t size) {
 
 namespace {
 
-void swapPlaces() {
-  static const char* const swapped = std::getenv("MEDDLER_SWAP");
-  if (swapped == nullptr) return;
-  const std::string both = swapped;
-  const std::size_t colon = both.find(':');
-  if (renameat2(AT_FDCWD, both.substr(0, colon).c_str(), AT_FDCWD, both.substr(colon + 1).c_str(),
-                RENAME_EXCHANGE) != 0)
-    std::abort();
-}
-
 mode_t modeAmong(int flags, __builtin_va_list& arguments) {
   return (flags & O_CREAT) != 0 ? __builtin_va_arg(arguments, mode_t) : 0;
 }
@@ -102,7 +131,7 @@ mode_t modeAmong(int flags, __builtin_va_list& arguments) {
     __builtin_va_start(arguments, flags);                                                  \
     const mode_t mode = modeAmong(flags, arguments);                                       \
     __builtin_va_end(arguments);                                                           \
-    swapPlaces();                                                                          \
+    swapPlacesAt("open");                                                                  \
     return original<int(int, const char*, int, ...)>(#name)(directory, path, flags, mode); \
   }
 #define EXPORTED_OPEN(name)                                                \
@@ -111,7 +140,7 @@ mode_t modeAmong(int flags, __builtin_va_list& arguments) {
     __builtin_va_start(arguments, flags);                                  \
     const mode_t mode = modeAmong(flags, arguments);                       \
     __builtin_va_end(arguments);                                           \
-    swapPlaces();                                                          \
+    swapPlacesAt("open");                                                  \
     return original<int(const char*, int, ...)>(#name)(path, flags, mode); \
   }
 

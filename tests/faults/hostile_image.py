@@ -13,6 +13,8 @@ OTHER_USER = 12345  # a number that nobody has
 SECRET = b"a secret of root"
 MARK = "SECRETNAME"  # in the settings outside the image; to be seen nowhere
 LIMIT = 60  # seconds
+# What commands() are, in their order.
+PROGRAMS = ("save", "migrate", "check", "show", "add an account", "import", "list accounts", "set a property")
 
 HOSTILE_CARD = (
     "BEGIN:VCARD\r\nVERSION:3.0\r\nUID:'); DROP TABLE records; --\r\nFN:%n %s %@ %d\r\nN:x;;;;\r\n"
@@ -102,10 +104,12 @@ class HostileImage:
         return {"TMPDIR": str(self.root / "tmp"), "PATH": os.environ["PATH"], "LC_ALL": "C", **more}
 
     def run(self, command, **more):
-        """The ended command; its output is text. Past the limit it raises TimeoutExpired."""
+        """The ended command, with words in front of it if there is a `prefix`; its output is bytes. Past the limit
+        it raises TimeoutExpired."""
         environment = more.pop("environment", self.environment())
-        return subprocess.run([str(word) for word in command], env=environment, check=False, timeout=LIMIT,
-                              capture_output=True, stdin=subprocess.DEVNULL, **more)
+        words = [str(word) for word in [*more.pop("prefix", []), *command]]
+        return subprocess.run(words, env=environment, check=False, timeout=LIMIT, capture_output=True,
+                              stdin=subprocess.DEVNULL, **more)
 
     def save(self, **environment):
         return self.run([self.found["fault_saver"], "once", self.root],
@@ -129,6 +133,23 @@ class HostileImage:
                  self.directory / "cards.vcf"],
                 [self.found["account-settings"], "list", "--image", image],
                 [self.found["account-settings"], "set", "A", "Key", "value", "--image", image]]
+
+    def wrong_ends(self, codes, wrong=lambda program, done: "", **more):
+        """Runs one program after the other: what is wrong with an exit code, which is to be that of the same place
+        in `codes`, or with what a program has done."""
+        for program, command, code in zip(PROGRAMS, self.commands(), codes, strict=True):
+            if text := self.wrong_end(command, code, lambda done, program=program: wrong(program, done), **more):
+                return f"{program}: {text}"
+        return ""
+
+    def wrong_end(self, command, code, wrong=lambda done: "", **more):
+        """What is wrong with the end of a command. The secret is to be seen nowhere."""
+        done = self.run(command, **more)
+        if done.returncode != code:
+            return f"ended with {done.returncode} instead of {code}: {(done.stdout + done.stderr)[-200:]}"
+        if SECRET in done.stdout + done.stderr:
+            return "the secret was printed"
+        return wrong(done)
 
     def is_secret_kept(self):
         status = self.secret.lstat()

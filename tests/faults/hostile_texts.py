@@ -7,7 +7,6 @@ import plistlib
 import re
 import sqlite3
 
-from hostile_image import SECRET
 from settings_image import PREFERENCES, account
 
 FORGED = "\n2026-01-01T00:00:00Z migration-host[1]: all is well"
@@ -17,6 +16,7 @@ TEXTS = {
     "with format letters": "%n %s %@ %d %1$n", "with SQL": "x'); DROP TABLE records; --",
     "that steer a terminal": "\x1b[2J\x1b]0;x\x07\r", "that are two points": "..", "that are empty": "",
 }
+REFUSED = 7
 LOG_LINE = re.compile(r"\d{4}-\d\d-\d\dT\d\d:\d\d:\d\dZ [\w-]+\[\d+\]: [^\x00-\x1f\x7f]*")
 CONTACTS = "var/mobile/Library/Contacts/Contacts.sqlite"
 
@@ -73,9 +73,8 @@ def hostile_text(text):
         if [entry["Identifier"] for entry in entries] != ["A"] or entries[0]["DisplayName"] != text:
             return f"the accounts are {entries}"
         for command in image.commands()[2:]:
-            done = image.run(command)
-            if done.returncode < 0 or (wrong := wrong_output(done)):
-                return f"{os.path.basename(command[0])} {command[1]}: {done.returncode} {wrong}"
+            if wrong := image.wrong_end(command, 0, wrong_output):
+                return f"{os.path.basename(command[0])} {command[1]}: {wrong}"
         names = {path.name for path in image.directory.iterdir()}
         return "" if names == {"image", "outside", "base", "cards.vcf", "log"} else f"there is {names}"
     return case
@@ -94,7 +93,7 @@ def log_of_a_plugin(image):
     """A plug-in writes a line with a break in it."""
     bundle = os.path.join(image.found["bundles"], "LogsAndSucceeds.migrator")
     done = image.host("--bundle", bundle, "--log", image.directory / "log")
-    if done.returncode not in (0, 3):
+    if done.returncode != 3:  # this plug-in leaves the account where it is
         return f"the host ended with {done.returncode}"
     shown, kept = done.stderr.splitlines(), (image.directory / "log").read_bytes().splitlines()
     if len(shown) != 2 or len(kept) != 2:
@@ -116,14 +115,9 @@ def hostile_argument(make):
     def case(image):
         argument = make(image)
         for command in image.commands()[1:]:
-            done = image.run([argument if word == image.root else word for word in command])
-            what = f"{os.path.basename(command[0])} {command[1]}"
-            if done.returncode not in (2, 6, 7):
-                return f"{what} ended with {done.returncode}: {done.stderr[-200:]}"
-            if wrong := wrong_output(done):
-                return f"{what}: {wrong}"
-            if SECRET in done.stdout + done.stderr:
-                return f"{what} has printed the secret"
+            if wrong := image.wrong_end([argument if word == image.root else word for word in command], REFUSED,
+                                        wrong_output):
+                return f"{os.path.basename(command[0])} {command[1]}: {wrong}"
         return ""
     return case
 
@@ -134,10 +128,9 @@ def image_with_a_line_break(image):
     image.root.rename(strange)
     try:
         for command in image.commands()[1:]:
-            done = image.run([strange if word == image.root else word for word in command],
-                             environment=image.environment(TMPDIR=str(strange / "tmp")))
-            if done.returncode not in (0, 3) or (wrong := wrong_output(done)):
-                return f"{os.path.basename(command[0])} {command[1]}: {done.returncode} {wrong}"
+            if wrong := image.wrong_end([strange if word == image.root else word for word in command], 0, wrong_output,
+                                        environment=image.environment(TMPDIR=str(strange / "tmp"))):
+                return f"{os.path.basename(command[0])} {command[1]}: {wrong}"
     finally:
         strange.rename(image.root)
     return ""

@@ -14,8 +14,8 @@ LINE = re.compile(r"\d{4}-\d\d-\d\dT\d\d:\d\d:\d\dZ migration-host\[\d+\]: (.*)"
 def lines_of(dataclass, error):
     """Those about one dataclass of one account; `error` is that of its database, or empty."""
     full = f"com.vantor.Dataclass.{dataclass}"
-    none_made = f"Could not create the datasource for the dataclass {full} of the Device Local Account. Error {error}"
-    none_enabled = f"Could not ENABLE the datasource for the dataclass {full} of the Device Local Account. Error {error}"
+    of_whom = f"the datasource for the dataclass {full} of the Device Local Account. Error {error}"
+    none_made, none_enabled = f"Could not create {of_whom}", f"Could not ENABLE {of_whom}"
     begin = f"Merging {full} to the localstore"
     if dataclass == "Bookmarks":
         failed = [none_enabled, none_made, none_made] if error else []

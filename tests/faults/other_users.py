@@ -9,10 +9,11 @@ import shutil
 import signal
 import subprocess
 
-from hostile_image import OTHER_USER, SECRET, as_other
-from planted_files import DOCUMENTED, PLANTS, REFUSED, look, plant, wrong_accounts
+from hostile_image import OTHER_USER, as_other
+from planted_files import PLANTS, REFUSED, look, plant, wrong_accounts
 
 HELD = 11
+LEFT_BEHIND = 3
 # A property list of an older version, in the binary form: the integer that is 12.
 OLDER = (b"\x10\x0c", b"\x10\x0b")
 PYTHON = "/usr/bin/python3"  # one that other users can run
@@ -37,15 +38,16 @@ MAKING_CALL = re.compile(r'\b(openat|open|mkdir|mkdirat|mknod|mknodat|creat)\(.*
 
 
 def change_everything(image):
-    """One command each that makes settings, records, copies and logs."""
+    """One command each that makes settings, records, copies and logs, with its exit code: the notes are of an
+    account that has none, and are left behind."""
     root, outside = image.root, image.outside
-    yield [image.found["fault_saver"], "many", root, "A", 50]
-    yield [image.found["device-image"], "add-account", root, "--type", "CalDAV", "--identifier", "New"]
+    yield [image.found["fault_saver"], "many", root, "A", 50], 0
+    yield [image.found["device-image"], "add-account", root, "--type", "CalDAV", "--identifier", "New"], 0
     yield [image.found["device-image"], "import", root, "--dataclass", "notes", "--account", "Q1",
-           image.directory / "note.txt"]
-    yield [image.found["account-settings"], "set", "A", "Key", "value", "--image", root]
-    yield [image.found["migration-host"], "run", "--image", root, "--log", outside / "log"]
-    yield [image.found["device-image"], "export", root, "--dataclass", "contacts", "--output", outside / "cards"]
+           image.directory / "note.txt"], 0
+    yield [image.found["account-settings"], "set", "A", "Key", "value", "--image", root], 0
+    yield [image.found["migration-host"], "run", "--image", root, "--log", outside / "log"], LEFT_BEHIND
+    yield [image.found["device-image"], "export", root, "--dataclass", "contacts", "--output", outside / "cards"], 0
 
 
 def intruder_in_a_loop(image):
@@ -61,10 +63,9 @@ def intruder_in_a_loop(image):
             path.chmod(0o600)
         image.directory.joinpath("base").chmod(0o700)
         intruder.stdout.readline()
-        for command in change_everything(image):
-            done = image.run(command, umask=0)
-            if done.returncode not in (0, 3):
-                return f"{command[:2]} ended with {done.returncode}: {done.stderr[-200:]}"
+        for command, code in change_everything(image):
+            if wrong := image.wrong_end(command, code, umask=0):
+                return f"{command[:2]}: {wrong}"
     finally:
         output, _ = intruder.communicate("stop\n", timeout=60)
         (image.directory / "cards.vcf").chmod(0o644)
@@ -77,14 +78,13 @@ def modes_when_made(image):
     (image.directory / "note.txt").write_text("Subject: x\n\ny\n")
     trace = image.directory / "trace"
     made_some = 0
-    for command in change_everything(image):
+    for command, code in change_everything(image):
         # With a file for each process no call is told of in two halves.
         shutil.rmtree(trace, ignore_errors=True)
         trace.mkdir()
-        done = image.run(["strace", "-ff", "-qq", "-o", trace / "of", "-e",
-                          "trace=openat,open,mkdir,mkdirat,mknod,creat", "--", *command], umask=0)
-        if done.returncode not in (0, 3):
-            return f"{command[:2]} ended with {done.returncode}"
+        if wrong := image.wrong_end(command, code, umask=0, prefix=[
+                "strace", "-ff", "-qq", "-o", trace / "of", "-e", "trace=openat,open,mkdir,mkdirat,mknod,creat", "--"]):
+            return f"{command[:2]}: {wrong}"
         for line in [line for path in trace.iterdir() for line in path.read_text(errors="replace").splitlines()]:
             made = MAKING_CALL.search(line)
             if made is None or not ("O_CREAT" in line or "mk" in made[1]):
@@ -98,7 +98,7 @@ def modes_when_made(image):
 def nothing_is_public(image):
     """After all of it no file of the image can be used by others."""
     (image.directory / "note.txt").write_text("Subject: x\n\ny\n")
-    for command in change_everything(image):
+    for command, _ in change_everything(image):
         image.run(command, umask=0)
     for path in [*image.root.rglob("*"), image.outside / "log", image.outside / "cards"]:
         if path.lstat().st_mode & 0o077:
@@ -119,14 +119,16 @@ def plugin(change, in_image=False):
             shutil.copytree(pathlib.Path(image.found["bundles"]) / bundle.name, bundle)
             for path in [bundle, *bundle.rglob("*")]:
                 path.chmod(0o755)
-            if image.host(*([] if in_image else ["--bundle", bundle])).returncode not in (0, 3):
+            # Alone it leaves the account where it is.
+            good = image.host(*([] if in_image else ["--bundle", bundle]))
+            if good.returncode != (0 if in_image else LEFT_BEHIND):
                 return "the plug-in is refused as it is"
             image.reset()
             if in_image:
                 shutil.copytree(pathlib.Path(image.found["bundles"]) / bundle.name, bundle)
             change(bundle)
             done = image.host(*([] if in_image else ["--bundle", bundle]))
-            if done.returncode != 7 or b"first line of" in done.stderr:
+            if done.returncode != REFUSED or b"first line of" in done.stderr:
                 return f"the host ended with {done.returncode}"
             return ""
         finally:
@@ -186,9 +188,7 @@ def held_by_another(image):
 def lock_that_others_may_not_take(name):
     def case(image):
         image.open_to_others()
-        for command in change_everything(image):
-            image.run(command)
-            break
+        image.run(next(change_everything(image))[0])
         image.run([image.found["fault_saver"], "add", image.root, "L", 1], umask=0)
         image.host()
         path = image.root / name
@@ -228,7 +228,7 @@ def lock_planted_by_another(name):
             code = image.host().returncode
         finally:
             end(holder)
-        if code not in ((0,) if "migration" in name else (HELD, REFUSED)):
+        if code != (0 if "migration" in name else HELD):
             return f"the host ended with {code}"
         return image.wrong_settings(image.old) if code else wrong_accounts(image.settings)
     return case
@@ -271,6 +271,12 @@ def install_migrator(image):
         shutil.rmtree(whole, ignore_errors=True)
 
 
+# In the order of hostile_image.PROGRAMS: where the image's lock cannot be taken; and where the lock can be, because
+# a hard link is a file like any other, or is none that these programs take.
+LOCK_REFUSED = (0, REFUSED, 6, 0, REFUSED, REFUSED, 0, REFUSED)
+LOCK_NOT_NEEDED = (0, 0, 6, 0, 0, 0, 0, 0)
+
+
 def something_in_the_place_of(name, kind):
     """Another user put something else where a lock is looked for: nobody waits, opens it or follows it."""
     def case(image):
@@ -280,11 +286,13 @@ def something_in_the_place_of(name, kind):
         path.parent.chmod(0o1777)
         plant(image, path, kind)
         before = look(path)
-        for command in [*image.commands(), [image.found["fault_saver"], "add", image.root, "L", 1],
-                        [image.found["migration-host"], "run", "--image", image.root, "--legacy", "--timeout", 5]]:
-            done = image.run(command)
-            if done.returncode not in DOCUMENTED or SECRET in done.stdout + done.stderr:
-                return f"{os.path.basename(command[0])} {command[1]} ended with {done.returncode}"
+        codes = LOCK_REFUSED if "image" in name and "hard link" not in kind else LOCK_NOT_NEEDED
+        host = [image.found["migration-host"], "run", "--image", image.root, "--legacy", "--timeout", 5]
+        wrong = image.wrong_ends(codes) or \
+            image.wrong_end([image.found["fault_saver"], "add", image.root, "L", 1], 0) or \
+            image.wrong_end(host, codes[1])
+        if wrong:
+            return wrong
         if look(path) != before or (image.outside / "nothing").exists():
             return "what was planted has changed"
         return wrong_accounts(image.settings)

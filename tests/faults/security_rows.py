@@ -4,9 +4,10 @@ import hostile_texts
 import matrix
 import other_users
 import planted_files
+import swapped_names
 from hostile_image import HostileImage
 
-CASES = {**planted_files.CASES, **hostile_texts.CASES, **other_users.CASES}
+CASES = {**planted_files.CASES, **swapped_names.CASES, **hostile_texts.CASES, **other_users.CASES}
 
 
 def security(found, directory, is_full):
