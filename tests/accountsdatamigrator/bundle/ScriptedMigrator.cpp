@@ -6,6 +6,7 @@
 //   writes version 7  writes a settings file of that version
 //   writes, answers false    writes a settings file and fails all the same
 //   writes, says LINE        writes a settings file; the line is in the log
+//   writes, logs 65 MiB      writes a settings file, and lines of a MiB each
 #include <unistd.h>
 
 #include <cstdlib>
@@ -44,6 +45,9 @@ class ScriptedMigrator : public accountsettings::AccountsDataMigrator {
     while (what == "stays") ::pause();
     if (what == "writes version 7") write(7);
     if (what.starts_with("writes, ")) write(12);
+    if (what == "writes, logs 65 MiB")
+      for (int count = 0; count < 65; ++count)
+        platform::services().systemLog.writeLine(std::string(std::size_t{1} << 20U, 'x'));
     return !what.ends_with("answers false");
   }
 };

@@ -65,6 +65,12 @@ class StopDaemon(SettingsTest):
         self.assertEqual(self.log(), [ASKED])
         self.assertEqual(self.notified(), ["com.vantor.Orvette.BackupAgent.WillStart"])
 
+    def test_says_to_programs_that_a_daemon_has_left(self):
+        daemon = self.start_daemon("obeys")
+        self.assertEqual(self.answer("stop-daemon"), {"image": str(self.image), "outcome": "left",
+                                                      "process": daemon.pid, "signalled": False, "running": None})
+        self.assertEqual(daemon.wait(timeout=100), 0)
+
     def test_kills_a_daemon_that_ignores_the_notification(self):
         daemon = self.start_daemon("ignores")
         self.assertEqual(self.answer("stop-daemon"), {"image": str(self.image), "outcome": "killed",
@@ -91,8 +97,10 @@ class StopDaemon(SettingsTest):
         for folder in (self.image, self.image / "var", self.image / "var/log"):
             folder.chmod(0o755)
         daemon = self.start_daemon("ignores", user=65534)
-        ended = run("--bounding-set=-kill", TOOL, "stop-daemon", "--image", self.image, tool="setpriv")
-        self.assertEqual((ended.returncode, ended.stdout), (10, b""))
+        ended = run("--bounding-set=-kill", TOOL, "stop-daemon", "--image", self.image, "--json", tool="setpriv")
+        self.assertEqual(ended.returncode, 10)
+        self.assertEqual(json.loads(ended.stdout), {"image": str(self.image), "outcome": "still running",
+                                                    "process": daemon.pid, "signalled": False, "running": daemon.pid})
         self.assertEqual(ended.stderr.decode(),
                          f"account-settings: the data-access daemon, process {daemon.pid}, still runs although it was "
                          f"asked to leave; cannot signal process {daemon.pid}: Operation not permitted; end it as its "
