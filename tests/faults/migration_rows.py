@@ -28,6 +28,7 @@ class Migration(MigrationImage):
 
     def __init__(self, found, directory, count):
         super().__init__(found, directory, count)
+        self._reruns = {}  # what was wrong after another run, for each identity of an image before it
         self.calls = matrix.always([self._traced() for _ in range(TRACES)])
         self._learn_settings()
 
@@ -79,6 +80,15 @@ class Migration(MigrationImage):
         code, _ = self.run(image)
         return f"the run after that ended with {code}" if code != DONE else self.rules.wrong_at_end(self.look(image))
 
+    def rerun_once(self, image, state):
+        """The same for an image in this state, but another run is not tried for what has been tried before."""
+        identity = state.identity()
+        if identity is None:
+            return self.rerun(image)
+        if identity not in self._reruns:
+            self._reruns[identity] = self.rerun(image)
+        return self._reruns[identity]
+
 
 def prepared(found, directory, count, name):
     place = directory / name
@@ -113,13 +123,16 @@ def wrong_end_of_killed(case, code):
 
 
 def kill_and_rerun(found, directory, is_full):
+    """In full at every call of the migrator."""
     migration = prepared(found, directory, RECORDS if is_full else 6, "m1")
-    cases = sampled("M1", matrix.kills(migration.calls), *((3000, 300) if is_full else (240, 60)))
+    kills = matrix.kills(migration.calls)
+    cases = sampled("M1", kills, *((len(kills), 300) if is_full else (240, 60)))
 
     def judge(case, worker):
         image, code = migration.run_under(case, worker)
-        return wrong_end_of_killed(case, code) or migration.rules.wrong_after_kill(migration.look(image)) or \
-            migration.rerun(image)
+        state = migration.look(image)
+        return wrong_end_of_killed(case, code) or migration.rules.wrong_after_kill(state) or \
+            migration.rerun_once(image, state)
     return len(cases), matrix.judge_all(cases, judge)
 
 

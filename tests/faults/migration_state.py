@@ -5,10 +5,9 @@ import hashlib
 import pathlib
 import plistlib
 import re
-import shutil
-import sqlite3
 import stat
 
+from database_look import look_at_database, together
 from settings_image import NAME, PREFERENCES
 
 LIBRARY = "var/mobile/Library"
@@ -20,52 +19,47 @@ LEFTOVER = re.compile(r"image/.*/\.new-[^/]*")
 SET_ASIDE = re.compile(re.escape(f"image/{SETTINGS}.unreadable-") + r"\d+")
 JOURNALS = {f"image/{path}-journal" for path in DATABASES.values()}
 
-# A record with all that is told of it but the numbers of its row and store. `account` is empty in the local
-# store.
-Row = collections.namedtuple(
-    "Row", "account kind uid base_uid content modified_at source_account source_uid collection")
-_ROWS = """SELECT ifnull(stores.account, ''), records.kind, uid, base_uid, content, modified_at, source_account,
-  source_uid, collections.name, stores.retired_at IS NOT NULL FROM records
-  JOIN stores ON stores.id = records.store JOIN collections ON collections.id = records.collection"""
+# What is different in each line of a log.
+LOG = "image/var/log/system.log"
+LOG_PREFIX = re.compile(rb"(?m)^\S+ ([\w-]+)\[\d+\]: ")
 
 
 class State:
-    """Of an image at place/image, and the files beside it, without the database that is left out. Reads only: a
-    journal that is to be rolled back is so in a copy in the `scratch` directory."""
+    """Of an image at place/image, and the files beside it, without the database that is left out. Reads only; the
+    directory `scratch` is for copies."""
 
     def __init__(self, place, scratch, left_out=""):
-        self.active, self.retired, self.damage = collections.Counter(), collections.Counter(), ""
-        self.files = {}
+        self.damage, self.files = "", {}
         place = pathlib.Path(place)
         for path in sorted(place.rglob("*")):
             self.files[str(path.relative_to(place))] = _look_at(path)
+        keys = []
         for name, path in DATABASES.items():
             if name != left_out and (place / "image" / path).exists():
-                self._read(name, place / "image" / path, pathlib.Path(scratch) / f"{place.name}-look")
+                found = look_at_database(place / "image" / path, pathlib.Path(scratch) / f"{place.name}-look")
+                keys.append(found.key)
+                self.damage = self.damage or found.damage and f"{name}: {found.damage}"
+        self.records = tuple(keys)  # equal for states with equal records
+        self.active, self.retired = together(self.records)
         self.settings = (place / "image" / SETTINGS).read_bytes()
         entries = plistlib.loads(self.settings)["Accounts"]
         self.accounts = {entry["Identifier"]: entry for entry in entries}
         if len(self.accounts) != len(entries):
             self.damage = "an account is in the settings more than once"
+        journals = [(place / name).read_bytes() for name in JOURNALS & self.files.keys()]
+        self._has_hot_journal = any(journal[:1] not in (b"", b"\0") for journal in journals)
+        self._log = b""
+        if LOG in self.files:
+            self._log = LOG_PREFIX.sub(rb"\1: ", (place / LOG).read_bytes())
 
-    def _read(self, name, path, scratch):
-        journal = pathlib.Path(f"{path}-journal")
-        if journal.exists():
-            scratch.mkdir(exist_ok=True)
-            for file in (path, journal):
-                shutil.copy(file, scratch / file.name)
-            path = scratch / path.name
-        database = sqlite3.connect(f"file:{path}?mode=rw", uri=True)
-        try:
-            for pragma in ("integrity_check", "foreign_key_check"):
-                found = database.execute(f"PRAGMA {pragma}").fetchall()
-                if found not in ([], [("ok",)]):
-                    self.damage = f"{name}: {pragma} says {found[:3]}"
-            for *row, is_retired in database.execute(_ROWS):
-                (self.retired if is_retired else self.active)[Row(*row)] += 1
-        finally:
-            database.close()
-            shutil.rmtree(scratch, ignore_errors=True)
+    def identity(self):
+        """The same for images that a program cannot tell from one another but by times, numbers of processes,
+        names of temporary files, and what is in a journal that was not begun and is never read. None when there is
+        one to be rolled back, which is another one each time."""
+        if self._has_hot_journal:
+            return None
+        files = [(TEMPORARY.sub("image/tmp/file", name), *look) for name, look in self.files.items() if name != LOG]
+        return self.records, self._log, tuple(files)
 
     def rows_of(self, accounts):
         """The rows of active stores; the local one has the account ''."""
@@ -109,10 +103,19 @@ class Rules:
         self.changing = {name for name in begin.files.keys() | end.files.keys()
                          if begin.files.get(name) != end.files.get(name)}
         self.changing |= {f"image/{path}" for path in [*DATABASES.values(), SETTINGS]}
+        self._verdicts = {}
+
+    def _of_records(self, judge, state):
+        """judge(state), of which a state with the same records has been given the answer before."""
+        key = judge.__name__, state.records
+        if key not in self._verdicts:
+            self._verdicts[key] = judge(state)
+        return self._verdicts[key]
 
     def wrong_always(self, state):
         """What is wrong at whatever moment the migration was left."""
-        return state.damage or self._wrong_records(state) or self._wrong_accounts(state) or self._wrong_files(state)
+        return state.damage or self._of_records(self._wrong_records, state) or self._wrong_accounts(state) or \
+            self._wrong_files(state)
 
     def wrong_after_kill(self, state):
         """What is wrong when a run was killed, and each call that it made was carried out."""
@@ -189,15 +192,18 @@ class Rules:
             return f"temporary files are left: {temporary}"
         return ""
 
+    def _wrong_last_records(self, state):
+        if state.local != self.end.local:
+            missing, more = self.end.local - state.local, state.local - self.end.local
+            return f"local rows are missing: {_some(missing)}, and there are more: {_some(more)}"
+        return "the service's stores are not retired" if state.rows_of(self.stores) else ""
+
     def wrong_at_end(self, state):
         """What is wrong after a migration that was carried out to its end."""
         if wrong := self.wrong_always(state):
             return wrong
-        if state.local != self.end.local:
-            missing, more = self.end.local - state.local, state.local - self.end.local
-            return f"local rows are missing: {_some(missing)}, and there are more: {_some(more)}"
-        if state.rows_of(self.stores):
-            return "the service's stores are not retired"
+        if wrong := self._of_records(self._wrong_last_records, state):
+            return wrong
         if state.settings != self.end.settings:
             return f"the settings are not those of a run that nothing disturbed: {sorted(state.accounts)}"
         if wrong := self.wrong_remains(state):

@@ -112,7 +112,8 @@ def cut_migrations(found, directory, is_full):
     end = matrix.kills(migration.calls_of(migration_rows.HOST)[-1:], matrix.POWER_CUT)
     if end[0].call != "exit_group":
         raise RuntimeError(f"the host's last call is {end[0].call}")
-    sample = migration_rows.told("M4", migration_rows.spread(kills, 80 if is_full else 9) + end, kills + end)
+    some = [*kills[:-1:10], kills[-1]] if is_full else migration_rows.spread(kills, 9)
+    sample = migration_rows.told("M4", some + end, kills + end)
     bases = file_systems(("ext4", "xfs"), migration.directory, migration.base)
     cases = [(name, kill, sync) for name in bases for kill in sample for sync in ("", "sync")]
 
