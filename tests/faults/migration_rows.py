@@ -78,7 +78,8 @@ class Migration(MigrationImage):
     def rerun(self, image):
         """What is wrong after another run, which must do all that was left to do."""
         code, _ = self.run(image)
-        return f"the run after that ended with {code}" if code != DONE else self.rules.wrong_at_end(self.look(image))
+        wrong = self.rules.wrong_at_end(self.look(image))
+        return wrong if code == DONE else f"the run after that ended with {code}: {wrong}"
 
     def rerun_once(self, image, state):
         """The same for an image in this state, but another run is not tried for what has been tried before."""
