@@ -6,7 +6,6 @@
 #include <map>
 #include <memory>
 #include <optional>
-#include <set>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -15,6 +14,7 @@
 #include "QuillnetAccountTypeRemoval/ASSDeviceLocalAccount.h"
 #include "QuillnetAccountTypeRemoval/ASSRuntimeFixMailAccount.h"
 #include "QuillnetAccountTypeRemoval/AccountChanges.h"
+#include "QuillnetAccountTypeRemoval/IdentifierTable.h"
 #include "QuillnetAccountTypeRemoval/StringLists.h"
 #include "platform/ExclusiveFileLock.h"
 #include "propertylist/Value.h"
@@ -229,31 +229,28 @@ class ASSAccountsManager {
   virtual std::vector<RuntimeFixerPtr> _createRuntimeFixers();
 
   void _loadChildrenFromAccount(const AccountPtr& parent);
-  void _removeChildrenForAccountWithIdentifier(const std::optional<std::string>& identifier);
+  void _removeChildrenForAccountWithIdentifier(std::optional<std::string_view> identifier);
   // Takes the snapshot of what was loaded or saved, which change notifications compare with.
   void _setOriginalAccountDictionaries();
 
-  const std::map<std::string, propertylist::Dictionary, std::less<>>& originalAccountsByID() const {
+  const IdentifierTable<propertylist::Dictionary>& originalAccountsByID() const {
     return originalAccountsByID_;
   }
-  const std::map<std::string, AccountPtr, std::less<>>& childAccountsByID() const {
-    return childAccountsByID_;
-  }
-  const std::map<std::string, std::string, std::less<>>& childAccountIDToParentAccountID() const {
+  const IdentifierTable<AccountPtr>& childAccountsByID() const { return childAccountsByID_; }
+  const IdentifierTable<std::string>& childAccountIDToParentAccountID() const {
     return childAccountIDToParentAccountID_;
   }
 
  private:
-  using AccountsByID = std::map<std::string, AccountPtr, std::less<>>;
+  using AccountsByID = IdentifierTable<AccountPtr>;
 
   static std::atomic<bool> shouldSkipNotifications;
   static std::atomic<bool> migrationAttempted;
 
   void _loadAccount(const propertylist::Value& info, bool& fixedAny);
   void _register(const AccountPtr& account);
-  void _registerChild(const std::string& identifier, const AccountPtr& child,
-                      const std::string& parentIdentifier);
-  void _forgetChild(const std::string& identifier);
+  void _registerChild(std::string_view identifier, const AccountPtr& child,
+                      std::string_view parentIdentifier);
   bool _everyChildHasItsParent(const StringList& types, const AccountArray& accounts) const;
   void _placeChild(const AccountPtr& child, const AccountsByID& placed);
   bool _fixAccountsBeforeSaving();
@@ -265,12 +262,15 @@ class ASSAccountsManager {
   // replaceAccountWithAccount is listed here and not registered by its identifier.
   AccountsByID topLevelAccountsByID_;
   std::shared_ptr<AccountArray> orderedTopLevelAccounts_;
+  // Until a caller chose what is listed, each record is listed once, and a deletion need not look
+  // for more of it.
+  bool mayListOneTwice_ = false;
   AccountsByID childAccountsByID_;
-  std::map<std::string, std::string, std::less<>> childAccountIDToParentAccountID_;
-  // The same map the other way round, so that one parent's children are found without a walk over
-  // all.
-  std::map<std::string, std::set<std::string>> childIDsByParentID_;
-  std::map<std::string, propertylist::Dictionary, std::less<>> originalAccountsByID_;
+  IdentifierTable<std::string> childAccountIDToParentAccountID_;
+  // The same table the other way round, so that one parent's children are found without a walk over
+  // all. A child may be listed that has gone to another parent since.
+  IdentifierTable<StringList> childIDsByParentID_;
+  IdentifierTable<propertylist::Dictionary> originalAccountsByID_;
   std::int64_t dataVersion_ = 0;
   std::vector<RuntimeFixerPtr> runtimeFixers_;
   // The file existed and could not be read as a dictionary when this store was made from it. What

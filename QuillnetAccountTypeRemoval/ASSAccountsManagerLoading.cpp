@@ -17,7 +17,7 @@ class MadeStore final : public ASSAccountsManager {};
 constexpr const char* kInitWithAccountsInfo = "-[ASSAccountsManager _initWithAccountsInfo:]";
 
 AccountPtr accountFromInfo(const Dictionary& info) {
-  const std::string* type = propertylist::findString(info, kAccountType);
+  const propertylist::Text* type = propertylist::findString(info, kAccountType);
   if (type != nullptr && *type == kOnMyDeviceAccountType)
     return ASSDeviceLocalAccount::initWithProperties(info);
   return ASSBasicAccount::initWithProperties(info);
@@ -69,6 +69,7 @@ std::vector<RuntimeFixerPtr> ASSAccountsManager::_createRuntimeFixers() {
 
 void ASSAccountsManager::_initWithAccountsInfo(const std::optional<Array>& accounts) {
   runtimeFixers_ = _createRuntimeFixers();
+  mayListOneTwice_ = runtimeFixers_.size() > 1;
   if (accounts) {
     bool fixedAny = false;
     for (const Value& info : *accounts) _loadAccount(info, fixedAny);
@@ -98,14 +99,14 @@ void ASSAccountsManager::_loadAccount(const Value& info, bool& fixedAny) {
 }
 
 void ASSAccountsManager::_register(const AccountPtr& account) {
-  if (const std::optional<std::string> identifier = account->identifier())
-    topLevelAccountsByID_[*identifier] = account;
+  if (const std::optional<propertylist::Text> identifier = account->identifier())
+    topLevelAccountsByID_.set(*identifier, account);
   orderedTopLevelAccounts_->push_back(account);
   _loadChildrenFromAccount(account);
 }
 
 void ASSAccountsManager::_loadChildrenFromAccount(const AccountPtr& parent) {
-  const std::optional<std::string> parentIdentifier = parent->identifier();
+  const std::optional<propertylist::Text> parentIdentifier = parent->identifier();
   _removeChildrenForAccountWithIdentifier(parentIdentifier);
   const Value* children = parent->accountPropertyForKey(kAccountChildAccounts);
   if (children == nullptr || children->asArray() == nullptr) return;
@@ -115,7 +116,7 @@ void ASSAccountsManager::_loadChildrenFromAccount(const AccountPtr& parent) {
         properties != nullptr ? ASSBasicAccount::initWithProperties(*properties) : nullptr;
     // A record made from a dictionary without an identifier has a fresh one, which nobody stores:
     // the child could never be found or removed by it.
-    const std::string* identifier =
+    const propertylist::Text* identifier =
         properties != nullptr ? propertylist::findString(*properties, kAccountIdentifier) : nullptr;
     if (!child || identifier == nullptr || !parentIdentifier) {
       platform::logToSystem("Ignoring unknown child account with properties %@", info);
@@ -126,39 +127,31 @@ void ASSAccountsManager::_loadChildrenFromAccount(const AccountPtr& parent) {
   }
 }
 
-void ASSAccountsManager::_registerChild(const std::string& identifier, const AccountPtr& child,
-                                        const std::string& parentIdentifier) {
-  _forgetChild(identifier);
-  childAccountsByID_[identifier] = child;
+void ASSAccountsManager::_registerChild(std::string_view identifier, const AccountPtr& child,
+                                        std::string_view parentIdentifier) {
+  childIDsByParentID_[parentIdentifier].emplace_back(identifier);
+  childAccountsByID_.set(identifier, child);
   childAccountIDToParentAccountID_[identifier] = parentIdentifier;
-  childIDsByParentID_[parentIdentifier].insert(identifier);
-}
-
-void ASSAccountsManager::_forgetChild(const std::string& identifier) {
-  const auto entry = childAccountIDToParentAccountID_.find(identifier);
-  if (entry == childAccountIDToParentAccountID_.end()) return;
-  childIDsByParentID_[entry->second].erase(identifier);
-  childAccountIDToParentAccountID_.erase(entry);
-  childAccountsByID_.erase(identifier);
 }
 
 void ASSAccountsManager::_removeChildrenForAccountWithIdentifier(
-    const std::optional<std::string>& identifier) {
-  if (!identifier) return;
-  const auto children = childIDsByParentID_.find(*identifier);
-  if (children == childIDsByParentID_.end()) return;
-  for (const std::string& child : children->second) {
-    childAccountIDToParentAccountID_.erase(child);
-    childAccountsByID_.erase(child);
+    std::optional<std::string_view> identifier) {
+  const StringList* const children = identifier ? childIDsByParentID_.find(*identifier) : nullptr;
+  if (children == nullptr) return;
+  for (const std::string& child : *children) {
+    const std::string* const parent = childAccountIDToParentAccountID_.find(child);
+    if (parent == nullptr || *parent != *identifier) continue;  // another parent's by now
+    childAccountIDToParentAccountID_.remove(child);
+    childAccountsByID_.remove(child);
   }
-  childIDsByParentID_.erase(children);
+  childIDsByParentID_.remove(*identifier);
 }
 
 void ASSAccountsManager::_setOriginalAccountDictionaries() {
   originalAccountsByID_.clear();
   for (const AccountPtr& account : *orderedTopLevelAccounts_) {
-    if (const std::optional<std::string> identifier = account->identifier())
-      originalAccountsByID_[*identifier] = account->propertiesToSave();
+    if (const std::optional<propertylist::Text> identifier = account->identifier())
+      originalAccountsByID_.set(*identifier, account->propertiesToSave());
     else
       platform::logToSystem("%@ returned a nil identifier. Account properties may not get saved",
                             account);

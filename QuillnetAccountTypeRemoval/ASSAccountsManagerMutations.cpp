@@ -15,9 +15,9 @@ using propertylist::Value;
 namespace {
 
 // The property "Identifier", which for the device-local account is not what `identifier` answers.
-std::optional<std::string> identifierProperty(const AccountPtr& account) {
+std::optional<propertylist::Text> identifierProperty(const AccountPtr& account) {
   const Value* value = account->accountPropertyForKey(kAccountIdentifier);
-  const std::string* identifier = value != nullptr ? value->asString() : nullptr;
+  const propertylist::Text* identifier = value != nullptr ? value->asString() : nullptr;
   return identifier != nullptr ? std::optional(*identifier) : std::nullopt;
 }
 
@@ -26,11 +26,11 @@ const Array* childrenOf(const AccountPtr& parent) {
   return children != nullptr ? children->asArray() : nullptr;
 }
 
-std::map<std::string, AccountPtr> byIdentifierProperty(const AccountArray& accounts) {
-  std::map<std::string, AccountPtr> result;
+IdentifierTable<AccountPtr> byIdentifierProperty(const AccountArray& accounts) {
+  IdentifierTable<AccountPtr> result;
   for (const AccountPtr& account : accounts) {
-    if (const std::optional<std::string> identifier = identifierProperty(account))
-      result[*identifier] = account;
+    if (const std::optional<propertylist::Text> identifier = identifierProperty(account))
+      result.set(*identifier, account);
   }
   return result;
 }
@@ -45,15 +45,17 @@ void ASSAccountsManager::updateAccount(const AccountPtr& account) {
   for (auto place = accounts.rbegin(); place != accounts.rend(); ++place) {
     if ((*place)->identifier() != identifier) continue;
     *place = account;
-    topLevelAccountsByID_[*identifier] = account;
+    mayListOneTwice_ = true;
+    topLevelAccountsByID_.set(*identifier, account);
     _loadChildrenFromAccount(account);
   }
 }
 
 void ASSAccountsManager::insertAccount(const AccountPtr& account) {
   ASLog("Inserting account:", account->properties());
-  const std::optional<std::string> identifier = account->identifier();
+  const std::optional<propertylist::Text> identifier = account->identifier();
   if (identifier && topLevelAccountsByID_.contains(*identifier)) return;
+  mayListOneTwice_ = true;
   // A copy, because the caller's may be an element of the very array that it is appended to.
   _register(AccountPtr(account));
 }
@@ -63,20 +65,24 @@ void ASSAccountsManager::deleteAccount(const AccountPtr& account) {
   const std::optional<std::string> identifier = account->identifier();
   if (!identifier) return;
   _removeChildrenForAccountWithIdentifier(identifier);
-  topLevelAccountsByID_.erase(*identifier);
+  topLevelAccountsByID_.remove(*identifier);
   AccountArray& accounts = *orderedTopLevelAccounts_;
   const auto last = std::find_if(accounts.rbegin(), accounts.rend(), [&](const AccountPtr& stored) {
     return stored->identifier() == identifier;
   });
   if (last == accounts.rend()) return;
-  const AccountPtr found = *last;
-  std::erase(accounts, found);
+  if (mayListOneTwice_) {
+    const AccountPtr found = *last;
+    std::erase(accounts, found);
+  } else {
+    accounts.erase(std::next(last).base());
+  }
 }
 
 void ASSAccountsManager::deleteAccountWithIdentifier(std::string_view identifier) {
-  const auto found = topLevelAccountsByID_.find(identifier);
-  if (found == topLevelAccountsByID_.end()) return;
-  const AccountPtr account = found->second;
+  const AccountPtr* const found = topLevelAccountsByID_.find(identifier);
+  if (found == nullptr) return;
+  const AccountPtr account = *found;
   deleteAccount(account);
 }
 
@@ -87,31 +93,31 @@ void ASSAccountsManager::replaceAccountWithAccount(const AccountPtr& current,
   if (place == accounts->end()) return;
   const std::optional<std::string> identifier = current->identifier();
   _removeChildrenForAccountWithIdentifier(identifier);
-  if (identifier) topLevelAccountsByID_.erase(*identifier);
+  if (identifier) topLevelAccountsByID_.remove(*identifier);
   *place = replacement;
+  mayListOneTwice_ = true;
   _loadChildrenFromAccount(replacement);
   orderedTopLevelAccounts_ = std::move(accounts);
 }
 
 bool ASSAccountsManager::_everyChildHasItsParent(const StringList& types,
                                                  const AccountArray& accounts) const {
-  const std::map<std::string, AccountPtr> replacements = byIdentifierProperty(accounts);
-  std::set<std::string> placed;
+  const IdentifierTable<AccountPtr> replacements = byIdentifierProperty(accounts);
+  IdentifierTable<bool> placed;
   std::unordered_set<AccountPtr> replacing;
   for (const AccountPtr& stored : *orderedTopLevelAccounts_) {
-    const std::optional<std::string> identifier = identifierProperty(stored);
+    const std::optional<propertylist::Text> identifier = identifierProperty(stored);
     if (!identifier) continue;
-    const auto replacement = replacements.find(*identifier);
-    if (replacement != replacements.end()) replacing.insert(replacement->second);
-    if (replacement != replacements.end() || !isOfOneType(*stored, types))
-      placed.insert(*identifier);
+    const AccountPtr* const replacement = replacements.find(*identifier);
+    if (replacement != nullptr) replacing.insert(*replacement);
+    if (replacement != nullptr || !isOfOneType(*stored, types)) placed.set(*identifier, true);
   }
   for (const AccountPtr& account : accounts) {
     if (replacing.contains(account)) continue;
-    if (const std::optional<std::string> parent = account->parentAccountIdentifier()) {
+    if (const std::optional<propertylist::Text> parent = account->parentAccountIdentifier()) {
       if (!placed.contains(*parent)) return false;
-    } else if (const std::optional<std::string> identifier = identifierProperty(account)) {
-      placed.insert(*identifier);
+    } else if (const std::optional<propertylist::Text> identifier = identifierProperty(account)) {
+      placed.set(*identifier, true);
     }
   }
   return true;
@@ -121,7 +127,7 @@ void ASSAccountsManager::replaceAccountsWithTypesWithAccounts(const StringList& 
                                                               const AccountArray& accounts) {
   ASLog("Replacing accounts");
   if (!_everyChildHasItsParent(types, accounts)) return;
-  const std::map<std::string, AccountPtr> replacements = byIdentifierProperty(accounts);
+  const IdentifierTable<AccountPtr> replacements = byIdentifierProperty(accounts);
   AccountsByID placed;
   std::unordered_set<AccountPtr> replacing;
   auto remaining = std::make_shared<AccountArray>();  // last account first, until the walk is over
@@ -130,16 +136,16 @@ void ASSAccountsManager::replaceAccountsWithTypesWithAccounts(const StringList& 
   // registered.
   const AccountArray& stored = *orderedTopLevelAccounts_;
   for (auto it = stored.rbegin(); it != stored.rend(); ++it) {
-    const std::optional<std::string> identifier = identifierProperty(*it);
-    const auto replacement = identifier ? replacements.find(*identifier) : replacements.end();
-    if (replacement != replacements.end()) {
-      remaining->push_back(replacement->second);
-      placed[*identifier] = replacement->second;
-      replacing.insert(replacement->second);
-      _loadChildrenFromAccount(replacement->second);
+    const std::optional<propertylist::Text> identifier = identifierProperty(*it);
+    const AccountPtr* const replacement = identifier ? replacements.find(*identifier) : nullptr;
+    if (replacement != nullptr) {
+      remaining->push_back(*replacement);
+      placed.set(*identifier, *replacement);
+      replacing.insert(*replacement);
+      _loadChildrenFromAccount(*replacement);
     } else if (!isOfOneType(**it, types)) {
       remaining->push_back(*it);
-      if (identifier) placed[*identifier] = *it;
+      if (identifier) placed.set(*identifier, *it);
     } else {
       _removeChildrenForAccountWithIdentifier(identifier);
     }
@@ -153,10 +159,11 @@ void ASSAccountsManager::replaceAccountsWithTypesWithAccounts(const StringList& 
       continue;
     }
     remaining->push_back(account);
-    if (const std::optional<std::string> identifier = identifierProperty(account))
-      placed[*identifier] = account;
+    if (const std::optional<propertylist::Text> identifier = identifierProperty(account))
+      placed.set(*identifier, account);
     _loadChildrenFromAccount(account);
   }
+  mayListOneTwice_ = true;
   orderedTopLevelAccounts_ = std::move(remaining);
   topLevelAccountsByID_ = std::move(placed);
 }
@@ -166,10 +173,9 @@ void ASSAccountsManager::replaceAccountsWithTypesWithAccounts(const StringList& 
 void ASSAccountsManager::_placeChild(const AccountPtr& child, const AccountsByID& placed) {
   const AccountPtr parent = placed.at(*child->parentAccountIdentifier());
   if (const std::optional<std::string> identifier = child->identifier()) {
-    const auto known = childAccountIDToParentAccountID_.find(*identifier);
-    if (known != childAccountIDToParentAccountID_.end()) {
+    if (const std::string* const known = childAccountIDToParentAccountID_.find(*identifier)) {
       const AccountPtr oldParent =
-          parent->identifier() == known->second ? parent : accountWithIdentifier(known->second);
+          parent->identifier() == *known ? parent : accountWithIdentifier(*known);
       if (oldParent) removeChildWithIdentifierFromAccount(*identifier, oldParent);
     }
   }

@@ -32,9 +32,10 @@ StringList enabledOf(const std::optional<Dictionary>& properties) {
 }
 
 // A string of the current properties or, where they have none, of the original ones.
-const std::string* stringOfEither(const std::optional<Dictionary>& current,
-                                  const std::optional<Dictionary>& original, std::string_view key) {
-  const std::string* string = current ? propertylist::findString(*current, key) : nullptr;
+const propertylist::Text* stringOfEither(const std::optional<Dictionary>& current,
+                                         const std::optional<Dictionary>& original,
+                                         std::string_view key) {
+  const propertylist::Text* string = current ? propertylist::findString(*current, key) : nullptr;
   if (string == nullptr && original) string = propertylist::findString(*original, key);
   return string;
 }
@@ -72,8 +73,8 @@ std::set<std::string> affectedDataclasses(AccountChangeType change,
 }
 
 // Ends at the first value that is missing.
-AccountChangeRecord changeRecord(AccountChangeType change, const std::string* identifier,
-                                 const std::string* type,
+AccountChangeRecord changeRecord(AccountChangeType change, const propertylist::Text* identifier,
+                                 const propertylist::Text* type,
                                  const std::optional<Dictionary>& original) {
   AccountChangeRecord record{{kASChangeAccountChangeTypeKey, static_cast<int>(change)}};
   if (identifier == nullptr) return record;
@@ -88,7 +89,7 @@ AccountChangeRecord changeRecord(AccountChangeType change, const std::string* id
 }
 
 void loadFramework(const Dictionary& description, const std::optional<std::string>& type) {
-  const std::string* framework = propertylist::findString(description, "Framework");
+  const propertylist::Text* framework = propertylist::findString(description, "Framework");
   if (framework == nullptr)
     raiseAssertionFailure(kSourceFile, kNoFrameworkLine,
                           "Malformed AccountCreators information. Could not find the path to the "
@@ -128,7 +129,7 @@ StringList ASSAccountsManager::_notifierClassNamesForAccountTypeDataclass(
   StringList names;
   for (const Value& value : *entries) {
     const Dictionary* entry = value.asDictionary();
-    const std::string* entryType =
+    const propertylist::Text* entryType =
         entry != nullptr ? propertylist::findString(*entry, "Type") : nullptr;
     if (entryType == nullptr || *entryType != "NotifierAccount") continue;
     const Dictionary* description = propertylist::findDictionary(*entry, "Description");
@@ -137,7 +138,7 @@ StringList ASSAccountsManager::_notifierClassNamesForAccountTypeDataclass(
                                    : nullptr;
     if (dataclasses == nullptr || !dataclasses->contains(dataclass)) continue;
     loadFramework(*description, type);
-    const std::string* className = propertylist::findString(*description, "Class");
+    const propertylist::Text* className = propertylist::findString(*description, "Class");
     if (className == nullptr || className->empty())
       raiseAssertionFailure(kSourceFile, kNoClassNameLine,
                             "Malformed AccountCreators information. Could not find the name of the "
@@ -172,8 +173,8 @@ void ASSAccountsManager::
     _addNotificationToDictionaryForChangeTypeOriginalPropertiesCurrentProperties(
         NotificationTable& table, AccountChangeType change,
         const std::optional<Dictionary>& original, const std::optional<Dictionary>& current) const {
-  const std::string* type = stringOfEither(current, original, kAccountType);
-  const std::string* identifier = stringOfEither(current, original, kAccountIdentifier);
+  const propertylist::Text* type = stringOfEither(current, original, kAccountType);
+  const propertylist::Text* identifier = stringOfEither(current, original, kAccountIdentifier);
   std::set<std::string> names;
   for (const std::string& dataclass : affectedDataclasses(change, original, current)) {
     for (std::string& name : _notifierClassNamesForAccountTypeDataclass(
@@ -200,9 +201,8 @@ void ASSAccountsManager::_sendNotificationsForChangedAccounts() const {
       add(AccountChangeType::added, std::nullopt, account->propertiesToSave());
   }
   for (const auto& [identifier, original] : originalAccountsByID_) {
-    const auto current = topLevelAccountsByID_.find(identifier);
-    if (current != topLevelAccountsByID_.end())
-      add(AccountChangeType::modified, original, current->second->propertiesToSave());
+    if (const AccountPtr* const current = topLevelAccountsByID_.find(identifier))
+      add(AccountChangeType::modified, original, (*current)->propertiesToSave());
   }
   for (const auto& [name, changes] : table) {
     platform::RuntimeClass& found = notifierClass(name, kSendingLine);

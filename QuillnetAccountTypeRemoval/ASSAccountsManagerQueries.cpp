@@ -18,18 +18,16 @@ AccountPtr firstWithSyncIdentifier(const Accounts& accountsByID, std::string_vie
 }  // namespace
 
 AccountPtr ASSAccountsManager::accountWithIdentifier(std::string_view identifier) const {
-  if (const auto found = topLevelAccountsByID_.find(identifier);
-      found != topLevelAccountsByID_.end())
-    return found->second;
-  const auto child = childAccountsByID_.find(identifier);
-  if (child == childAccountsByID_.end()) return nullptr;
+  if (const AccountPtr* const found = topLevelAccountsByID_.find(identifier)) return *found;
+  const AccountPtr* const child = childAccountsByID_.find(identifier);
+  if (child == nullptr) return nullptr;
   // By the identifier that the child has now, which may have been changed since it was loaded.
-  const std::optional<std::string> current = child->second->identifier();
+  const std::optional<propertylist::Text> current = (*child)->identifier();
   if (!current) return nullptr;
-  const auto parent = childAccountIDToParentAccountID_.find(*current);
-  if (parent == childAccountIDToParentAccountID_.end()) return nullptr;
-  const auto found = topLevelAccountsByID_.find(parent->second);
-  return found != topLevelAccountsByID_.end() ? found->second : nullptr;
+  const std::string* const parent = childAccountIDToParentAccountID_.find(*current);
+  if (parent == nullptr) return nullptr;
+  const AccountPtr* const found = topLevelAccountsByID_.find(*parent);
+  return found != nullptr ? *found : nullptr;
 }
 
 AccountPtr ASSAccountsManager::syncableAccountWithSyncIdentifier(
@@ -42,7 +40,7 @@ AccountPtr ASSAccountsManager::syncableAccountWithSyncIdentifier(
 AccountPtr ASSAccountsManager::displayAccountWithSyncIdentifier(
     std::string_view syncIdentifier) const {
   const AccountPtr account = syncableAccountWithSyncIdentifier(syncIdentifier);
-  const std::optional<std::string> identifier = account ? account->identifier() : std::nullopt;
+  const auto identifier = account ? account->identifier() : std::nullopt;
   return identifier ? accountWithIdentifier(*identifier) : nullptr;
 }
 
@@ -83,12 +81,9 @@ DeviceLocalAccountPtr ASSAccountsManager::fullDeviceLocalAccount() {
 FullAccountPtr ASSAccountsManager::fullAccountWithIdentifierLoader(std::string_view identifier,
                                                                    FullAccountLoader* loader) {
   if (identifier.empty()) return nullptr;
-  if (const auto found = topLevelAccountsByID_.find(identifier);
-      found != topLevelAccountsByID_.end())
-    return found->second->fullAccountUsingLoader(loader);
-  const auto child = childAccountsByID_.find(identifier);
-  return child != childAccountsByID_.end() ? child->second->fullAccountUsingLoader(loader)
-                                           : nullptr;
+  const AccountPtr* found = topLevelAccountsByID_.find(identifier);
+  if (found == nullptr) found = childAccountsByID_.find(identifier);
+  return found != nullptr ? (*found)->fullAccountUsingLoader(loader) : nullptr;
 }
 
 std::vector<FullAccountPtr> ASSAccountsManager::accountsWithTypes(const StringList& types) {
@@ -101,7 +96,7 @@ std::vector<FullAccountPtr> ASSAccountsManager::accountsWithTypesWithLoader(
   std::unordered_map<const ASSBasicAccount*, StringList> matchingChildren;
   for (const auto& [identifier, child] : childAccountsByID_) {
     if (isOfOneType(*child, types))
-      matchingChildren[child->parentAccount().get()].push_back(identifier);
+      matchingChildren[child->parentAccount().get()].emplace_back(identifier);
   }
   std::vector<FullAccountPtr> accounts;
   for (const AccountPtr& account : *orderedTopLevelAccounts_) {

@@ -20,6 +20,9 @@ namespace {
 // with very many keys stays linear.
 Dictionary merged(const Dictionary& inMemory, const Dictionary& original,
                   const Dictionary& onDisk) {
+  // What did not change on one side is what the other has.
+  if (inMemory.sharesStorageWith(original)) return onDisk;
+  if (onDisk.sharesStorageWith(original)) return inMemory;
   std::vector<Dictionary::Entry> entries;
   entries.reserve(onDisk.size() + inMemory.size());
   for (const Dictionary::Entry& disk : onDisk) {
@@ -60,9 +63,9 @@ bool ASSAccountsManager::_fixAccountsBeforeSaving() {
       if (verdict != FixVerdict::nothingToDo) fixedAny = true;
       if (verdict != FixVerdict::couldNotFix) continue;
       // The account stays listed, so this save still writes it; the next load drops it.
-      const std::optional<std::string> identifier = (*it)->identifier();
+      const std::optional<propertylist::Text> identifier = (*it)->identifier();
       _removeChildrenForAccountWithIdentifier(identifier);
-      if (identifier) topLevelAccountsByID_.erase(*identifier);
+      if (identifier) topLevelAccountsByID_.remove(*identifier);
     }
   }
   return fixedAny;
@@ -74,14 +77,14 @@ Array ASSAccountsManager::_mergedAccounts(const std::vector<Dictionary>& inMemor
   accounts.reserve(inMemory.size());
   for (const Dictionary& properties : inMemory) {
     const AccountPtr& account = (*orderedTopLevelAccounts_)[accounts.size()];
-    const std::optional<std::string> identifier = account->identifier();
+    const std::optional<propertylist::Text> identifier = account->identifier();
     const AccountPtr stored = identifier ? onDisk.accountWithIdentifier(*identifier) : nullptr;
     const Dictionary result = mergeInMemoryPropertiesOriginalPropertiesOnDiskProperties(
         properties, account->originalProperties(),
         stored ? std::optional(stored->propertiesToSave()) : std::nullopt);
-    // The list is computed whether or not tracing is on, and never printed.
+    // The list is asked for whether or not tracing is on, and never printed.
     const StringList enabled = account->enabledDataclasses().value_or(StringList());
-    ASLog("%@:%@", account->type(), result, arrayOfStrings(enabled));
+    if (getASLoggingEnabled()) ASLog("%@:%@", account->type(), result, arrayOfStrings(enabled));
     accounts.emplace_back(result);
   }
   return Array(std::move(accounts));

@@ -52,13 +52,13 @@ AccountPtr ASSBasicAccount::_initWithTypeClass(const std::optional<std::string>&
 std::optional<ASSBasicAccount::CheckedProperties> ASSBasicAccount::_checkProperties(
     const Dictionary& properties) {
   const Value* type = properties.find(kAccountType);
-  const std::string* typeName = type != nullptr ? type->asString() : nullptr;
-  const bool typeIsValid =
-      _isValidAccountType(typeName != nullptr ? std::optional(*typeName) : std::nullopt);
+  const propertylist::Text* typeName = type != nullptr ? type->asString() : nullptr;
+  const bool typeIsValid = _isValidAccountType(
+      typeName != nullptr ? std::optional<std::string_view>(*typeName) : std::nullopt);
   if (!typeIsValid)
     platform::logToSystem("[%s] Invalid account type: %@", kInitWithProperties, type);
   // A missing class is told also of properties whose type was refused already.
-  const std::string* className = propertylist::findString(properties, kAccountClass);
+  const propertylist::Text* className = propertylist::findString(properties, kAccountClass);
   const bool classIsPresent = className != nullptr && !className->empty();
   if (!classIsPresent) platform::logToSystem("[%s] Missing account class.", kInitWithProperties);
   if (!typeIsValid || !classIsPresent) return std::nullopt;
@@ -111,36 +111,38 @@ void ASSBasicAccount::setOriginalProperties(Dictionary properties) noexcept {
   originalProperties_ = std::move(properties);
 }
 
-std::optional<std::string> ASSBasicAccount::_stringForKey(std::string_view key) const {
+std::optional<propertylist::Text> ASSBasicAccount::_textForKey(std::string_view key) const {
   const Value* value = accountPropertyForKey(key);
-  const std::string* string = value != nullptr ? value->asString() : nullptr;
+  const propertylist::Text* string = value != nullptr ? value->asString() : nullptr;
   return string != nullptr ? std::optional(*string) : std::nullopt;
 }
 
-std::optional<std::string> ASSBasicAccount::type() const { return _stringForKey(kAccountType); }
-
-std::optional<std::string> ASSBasicAccount::identifier() const {
-  return _stringForKey(kAccountIdentifier);
+std::optional<propertylist::Text> ASSBasicAccount::type() const {
+  return _textForKey(kAccountType);
 }
 
-std::optional<std::string> ASSBasicAccount::syncStoreIdentifier() const {
-  return _stringForKey(kAccountSyncIdentifier);
+std::optional<propertylist::Text> ASSBasicAccount::identifier() const {
+  return _textForKey(kAccountIdentifier);
 }
 
-std::optional<std::string> ASSBasicAccount::accountClass() const {
-  return _stringForKey(kAccountClass);
+std::optional<propertylist::Text> ASSBasicAccount::syncStoreIdentifier() const {
+  return _textForKey(kAccountSyncIdentifier);
+}
+
+std::optional<propertylist::Text> ASSBasicAccount::accountClass() const {
+  return _textForKey(kAccountClass);
 }
 
 std::optional<std::string> ASSBasicAccount::displayName() const {
-  return _stringForKey(kAccountDisplayName);
+  return _textForKey(kAccountDisplayName);
 }
 
 std::optional<std::string> ASSBasicAccount::typeString() const {
-  return _stringForKey(kAccountTypeString);
+  return _textForKey(kAccountTypeString);
 }
 
 std::optional<std::string> ASSBasicAccount::shortTypeString() const {
-  return _stringForKey(kAccountShortTypeString);
+  return _textForKey(kAccountShortTypeString);
 }
 
 void ASSBasicAccount::setAccountClass(const std::string& className) {
@@ -148,20 +150,20 @@ void ASSBasicAccount::setAccountClass(const std::string& className) {
 }
 
 void ASSBasicAccount::setDisplayName(const std::string& name) {
-  const std::string* current = propertylist::findString(properties_, kAccountDisplayName);
+  const propertylist::Text* current = propertylist::findString(properties_, kAccountDisplayName);
   if (current == nullptr || *current != name) properties_.set(kAccountDisplayName, name);
 }
 
-std::optional<std::string> ASSBasicAccount::parentAccountIdentifier() const {
+std::optional<propertylist::Text> ASSBasicAccount::parentAccountIdentifier() const {
   return parentAccount_ ? parentAccount_->identifier() : std::nullopt;
 }
 
 std::string ASSBasicAccount::description() const {
-  return "<" + className() + ": " + identifier().value_or("(null)") + ">";
+  return "<" + className() + ": " + std::string(identifier().value_or("(null)")) + ">";
 }
 
 bool isOfOneType(const ASSBasicAccount& account, const StringList& types) {
-  const std::optional<std::string> type = account.type();
+  const std::optional<propertylist::Text> type = account.type();
   return type && contains(types, *type);
 }
 

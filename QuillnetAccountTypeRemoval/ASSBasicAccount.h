@@ -81,11 +81,12 @@ class ASSBasicAccount : public platform::Describable,
   void setOriginalProperties(propertylist::Dictionary properties) noexcept;
 
   // Strings of the record or, where it has none, of its parent. A value that is no string counts as
-  // none.
-  std::optional<std::string> type() const;
-  virtual std::optional<std::string> identifier() const;
-  virtual std::optional<std::string> syncStoreIdentifier() const;
-  std::optional<std::string> accountClass() const;
+  // none. A Text belongs to the record that has it, until that one changes or goes: whoever goes on
+  // to change accounts takes it as a std::string.
+  std::optional<propertylist::Text> type() const;
+  virtual std::optional<propertylist::Text> identifier() const;
+  virtual std::optional<propertylist::Text> syncStoreIdentifier() const;
+  std::optional<propertylist::Text> accountClass() const;
   virtual std::optional<std::string> displayName() const;
   std::optional<std::string> typeString() const;
   std::optional<std::string> shortTypeString() const;
@@ -98,7 +99,7 @@ class ASSBasicAccount : public platform::Describable,
 
   const AccountPtr& parentAccount() const { return parentAccount_; }
   virtual void setParentAccount(const AccountPtr& parent) { parentAccount_ = parent; }
-  std::optional<std::string> parentAccountIdentifier() const;
+  std::optional<propertylist::Text> parentAccountIdentifier() const;
 
   // The name of the record's own class, as log lines print it; not the property "Class".
   virtual std::string className() const { return "ASSBasicAccount"; }
@@ -206,7 +207,7 @@ class ASSBasicAccount : public platform::Describable,
   static AccountPtr _initWithTypeClass(const std::optional<std::string>& type,
                                        const std::optional<std::string>& className);
   // Whether the catalogue has an entry under exactly this type.
-  static bool _isValidAccountType(const std::optional<std::string>& type);
+  static bool _isValidAccountType(std::optional<std::string_view> type);
   // Reads the catalogue of dataclasses afresh; empty when it is missing or unreadable.
   static std::optional<propertylist::Dictionary> _dataclassesProperties();
 
@@ -233,7 +234,7 @@ class ASSBasicAccount : public platform::Describable,
   static StringList _profileRestrictedDataclasses();
 
  private:
-  std::optional<std::string> _stringForKey(std::string_view key) const;
+  std::optional<propertylist::Text> _textForKey(std::string_view key) const;
   static bool _flagOfDataclass(std::string_view dataclass, std::string_view flag);
 
   AccountPtr parentAccount_;

@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <array>
+#include <atomic>
 #include <iterator>
 #include <mutex>
 #include <vector>
@@ -26,6 +27,7 @@ constexpr std::string_view kSourceFile = "ASSBasicAccount";
 // Both catalogues live until the process ends and are never changed once loaded.
 std::mutex accountTypesLock;
 std::optional<Dictionary> AccountTypesCatalog;
+std::atomic<bool> accountTypesAreLoaded = false;
 std::once_flag dataclassesOnce;
 std::optional<Dictionary> DataclassesCatalog;
 
@@ -36,7 +38,7 @@ Array normalisedDataclasses(const Array& dataclasses, bool notesAreSynced) {
   const StringList& known = ASSBasicAccount::allSupportedDataclasses();
   std::vector<Value> kept;
   for (const Value& dataclass : dataclasses) {
-    const std::string* name = dataclass.asString();
+    const propertylist::Text* name = dataclass.asString();
     if (name == nullptr || !contains(known, *name)) continue;
     if (*name == kAccountDataclassNotes && !notesAreSynced) continue;
     kept.push_back(dataclass);
@@ -92,11 +94,13 @@ std::optional<StringList> toggleActions(std::string_view dataclass, std::string_
 }  // namespace
 
 void ASSBasicAccount::initialize() {
+  if (accountTypesAreLoaded) return;
   const std::lock_guard lock(accountTypesLock);
   if (!AccountTypesCatalog) AccountTypesCatalog = loadedAccountTypes();
+  accountTypesAreLoaded = true;
 }
 
-bool ASSBasicAccount::_isValidAccountType(const std::optional<std::string>& type) {
+bool ASSBasicAccount::_isValidAccountType(std::optional<std::string_view> type) {
   initialize();
   return type && !type->empty() && AccountTypesCatalog->contains(*type);
 }

@@ -26,7 +26,7 @@ std::optional<Dictionary> CreatorsCatalog;
 
 void loadFramework(const Dictionary& description, std::string_view creatorType,
                    const std::optional<std::string>& type) {
-  const std::string* framework = propertylist::findString(description, "Framework");
+  const propertylist::Text* framework = propertylist::findString(description, "Framework");
   if (framework == nullptr)
     raiseAssertionFailure(kSourceFile, __LINE__,
                           "Malformed AccountCreators information. Could not find the path to the "
@@ -76,7 +76,7 @@ std::optional<std::string> ASSBasicAccount::_creatorClassNameForAccountTypeCreat
   std::optional<std::string> result;
   for (const Value& value : *entries) {
     const Dictionary* entry = value.asDictionary();
-    const std::string* entryType =
+    const propertylist::Text* entryType =
         entry != nullptr ? propertylist::findString(*entry, "Type") : nullptr;
     if (entryType == nullptr || *entryType != creatorType) continue;
     const Dictionary* description = propertylist::findDictionary(*entry, "Description");
@@ -88,7 +88,7 @@ std::optional<std::string> ASSBasicAccount::_creatorClassNameForAccountTypeCreat
     const bool loaderLoadedIt = loader != nullptr && creatorType == kFullAccountCreator &&
                                 loader->loadBundleForAccountWithProperties(properties_);
     if (!loaderLoadedIt) loadFramework(*description, creatorType, type);
-    const std::string* className = propertylist::findString(*description, "Class");
+    const propertylist::Text* className = propertylist::findString(*description, "Class");
     if (className == nullptr || className->empty())
       raiseAssertionFailure(kSourceFile, __LINE__,
                             "Malformed AccountCreators information. Could not find the name of the "

@@ -13,13 +13,31 @@ using platform::RestrictedFeature;
 
 namespace {
 
+// Whether a list has a string. Most lists have a handful, for which a walk is faster than a set;
+// for lists of any length, which a file may hold, a walk for each string would take too long.
+class Members {
+ public:
+  explicit Members(const StringList& strings) : _strings(strings) {
+    constexpr std::size_t kHandful = 16;
+    if (strings.size() > kHandful) _many.insert(strings.begin(), strings.end());
+  }
+  bool contain(std::string_view wanted) const {
+    return _many.empty() ? contains(_strings, wanted) : _many.contains(wanted);
+  }
+
+ private:
+  const StringList& _strings;
+  std::set<std::string_view> _many;
+};
+
 // The members of `dataclasses` that are (not) among `others`, in order.
 StringList filtered(const StringList& dataclasses, const StringList& others,
                     bool keepThoseInOthers) {
-  const std::set<std::string_view> members(others.begin(), others.end());
+  const Members members(others);
   StringList kept;
+  kept.reserve(dataclasses.size());
   for (const std::string& dataclass : dataclasses) {
-    if (members.contains(dataclass) == keepThoseInOthers) kept.push_back(dataclass);
+    if (members.contain(dataclass) == keepThoseInOthers) kept.push_back(dataclass);
   }
   return kept;
 }
@@ -27,11 +45,11 @@ StringList filtered(const StringList& dataclasses, const StringList& others,
 }  // namespace
 
 StringList ASSBasicAccount::_orderedDataclasses(const StringList& dataclasses) {
-  const std::set<std::string_view> present(dataclasses.begin(), dataclasses.end());
   const StringList& known = allSupportedDataclasses();
   StringList ordered;
+  ordered.reserve(dataclasses.size());
   for (const std::string& dataclass : known) {
-    if (present.contains(dataclass)) ordered.push_back(dataclass);
+    if (contains(dataclasses, dataclass)) ordered.push_back(dataclass);
   }
   for (const std::string& dataclass : dataclasses) {
     if (!contains(known, dataclass)) ordered.push_back(dataclass);

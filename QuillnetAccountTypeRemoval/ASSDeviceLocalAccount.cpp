@@ -59,9 +59,11 @@ std::string ASSDeviceLocalAccount::classTypeString() {
   return services.bundleResources.localizedString(bundleAnchor(), key, "DeviceLocalAccount");
 }
 
-std::optional<std::string> ASSDeviceLocalAccount::identifier() const { return _identifier(); }
+std::optional<propertylist::Text> ASSDeviceLocalAccount::identifier() const {
+  return _identifier();
+}
 
-std::optional<std::string> ASSDeviceLocalAccount::syncStoreIdentifier() const {
+std::optional<propertylist::Text> ASSDeviceLocalAccount::syncStoreIdentifier() const {
   return identifier();
 }
 

@@ -38,8 +38,8 @@ class ASSDeviceLocalAccount : public ASSBasicAccount, public AccountFullAccountP
   // table where the table has no text for it. (The record's own typeString answers what is stored.)
   static std::string classTypeString();
 
-  std::optional<std::string> identifier() const override;
-  std::optional<std::string> syncStoreIdentifier() const override;
+  std::optional<propertylist::Text> identifier() const override;
+  std::optional<propertylist::Text> syncStoreIdentifier() const override;
   std::optional<std::string> displayName() const override;
   std::string className() const override { return "ASSDeviceLocalAccount"; }
   void setParentAccount(const AccountPtr& parent) override;
@@ -73,7 +73,7 @@ class ASSDeviceLocalAccount : public ASSBasicAccount, public AccountFullAccountP
   void hideLocalStoreForDataclass(std::string_view dataclass);
 
  protected:
-  static std::string _identifier() { return "DeviceLocalAccount"; }
+  static propertylist::Text _identifier() { return "DeviceLocalAccount"; }
   // True when tethered syncing of the dataclass was turned on or off.
   bool _setTetheredDataSourceEnabledForDataclass(bool enabled, std::string_view dataclass);
   // With a source: whether closing it succeeded, whatever removing the store gave. Without one:

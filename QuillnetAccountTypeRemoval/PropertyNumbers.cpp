@@ -59,7 +59,7 @@ std::int64_t integerValue(const propertylist::Value* value) {
   if (value->asUnsigned()) return std::numeric_limits<std::int64_t>::max();
   if (const auto boolean = value->asBoolean()) return *boolean ? 1 : 0;
   if (const auto real = value->asReal()) return integerOfReal(*real);
-  if (const std::string* string = value->asString()) return integerOfString(*string);
+  if (const propertylist::Text* string = value->asString()) return integerOfString(*string);
   return 0;
 }
 
@@ -67,7 +67,7 @@ bool booleanValue(const propertylist::Value* value) {
   if (value == nullptr) return false;
   if (const auto boolean = value->asBoolean()) return *boolean;
   if (const auto real = value->asReal()) return *real != 0.0;
-  if (const std::string* string = value->asString()) return booleanOfString(*string);
+  if (const propertylist::Text* string = value->asString()) return booleanOfString(*string);
   return integerValue(value) != 0;
 }
 

@@ -10,7 +10,7 @@ std::optional<StringList> stringsOfArray(const propertylist::Value* value) {
   StringList strings;
   strings.reserve(array->size());
   for (const propertylist::Value& member : *array) {
-    if (const std::string* string = member.asString()) strings.push_back(*string);
+    if (const propertylist::Text* string = member.asString()) strings.push_back(*string);
   }
   return strings;
 }

@@ -157,10 +157,10 @@ class Builder {
   }
 
   void _addEntry(const Dictionary& entry, const List& list, Remarks& remarks) {
-    const std::string* const className = propertylist::findString(entry, kAccountClass);
+    const propertylist::Text* const className = propertylist::findString(entry, kAccountClass);
     if (className == nullptr) return remarks.add(" is left out: it has no string \"Class\"");
     std::string_view type = typeFor(list.classes, *className);
-    const std::string* const host = propertylist::findString(entry, kLegacyHost);
+    const propertylist::Text* const host = propertylist::findString(entry, kLegacyHost);
     if (type == kMailAccountType && *className == "IMAPAccount" && host != nullptr)
       if (const std::string_view ofHost = typeFor(list.hosts, *host); !ofHost.empty())
         type = ofHost;
@@ -184,7 +184,7 @@ class Builder {
     for (const std::string_view key : {kAccountIdentifier, kLegacyIdentifier}) {
       const Value* const value = entry.find(key);
       if (value == nullptr) continue;
-      const std::string* const own = value->asString();
+      const propertylist::Text* const own = value->asString();
       if (own != nullptr && !own->empty() && _identifiers.take(*own)) return *own;
       if (own != nullptr && !own->empty()) {
         remarks.add(" gets a new identifier: \"%@\" is taken", *own);
@@ -207,7 +207,7 @@ class Builder {
     }
     Array enabled;
     for (const Value& value : *listed) {
-      const std::string* const name = value.asString();
+      const propertylist::Text* const name = value.asString();
       const std::string dataclass = name == nullptr ? std::string() : wholeDataclass(*name);
       if (!possible.contains(dataclass))
         remarks.add(": dataclass %@ is left out: type \"%@\" has none", value, type);

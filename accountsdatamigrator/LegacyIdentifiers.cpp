@@ -36,7 +36,7 @@ Dictionary digestedPart(const Dictionary& entry) {
     const std::string& key = each.key();
     const Value& value = each.value();
     if (isLong(key) || value.asDictionary() != nullptr || value.asArray() != nullptr) continue;
-    const std::string* const text = value.asString();
+    const propertylist::Text* const text = value.asString();
     const Bytes* const data = value.asData();
     if (text != nullptr && isLong(*text))
       part.emplace_back(key, beginningOf(*text));

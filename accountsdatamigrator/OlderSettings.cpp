@@ -16,7 +16,7 @@ namespace {
 bool identifyAll(Dictionary& holder, std::string_view key, bool areChildren);
 
 bool identify(Dictionary& account, bool isChild) {
-  const std::string* const type = propertylist::findString(account, kAccountType);
+  const propertylist::Text* const type = propertylist::findString(account, kAccountType);
   // A child of that type is like any other.
   const bool isDevice = !isChild && type != nullptr && *type == kOnMyDeviceAccountType;
   if (!isDevice && propertylist::findString(account, kAccountIdentifier) == nullptr) {

@@ -18,7 +18,7 @@ ServiceAccountClass::ServiceAccountClass(std::string name) : NamedClass(std::mov
 
 accountsettings::FullAccountPtr ServiceAccountClass::initWithProperties(
     const propertylist::Dictionary& properties) {
-  const std::string* const identifier =
+  const propertylist::Text* const identifier =
       propertylist::findString(properties, accountsettings::kAccountIdentifier);
   if (identifier == nullptr) return nullptr;
   return std::make_shared<ServiceAccount>(className(), *identifier);

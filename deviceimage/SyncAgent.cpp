@@ -5,7 +5,7 @@ namespace {
 
 std::optional<std::string> stringIn(const propertylist::Dictionary& dictionary,
                                     std::string_view key) {
-  const std::string* const found = propertylist::findString(dictionary, key);
+  const propertylist::Text* const found = propertylist::findString(dictionary, key);
   return found == nullptr ? std::nullopt : std::optional<std::string>(*found);
 }
 

@@ -140,7 +140,7 @@ Value unshared(const Value& value) {
     for (const auto& entry : *dictionary) copy.set(entry.key(), unshared(entry.value()));
     return copy;
   }
-  if (const std::string* const text = value.asString()) return std::string(*text);
+  if (const propertylist::Text* const text = value.asString()) return std::string(*text);
   if (const Bytes* const data = value.asData()) return Bytes(*data);
   return value;
 }

@@ -39,7 +39,7 @@ std::vector<std::string> stringsUnder(const Dictionary& information, std::string
   const propertylist::Array* array = propertylist::findArray(information, key);
   if (array == nullptr) return strings;
   for (const propertylist::Value& value : *array)
-    if (const std::string* text = value.asString()) strings.push_back(*text);
+    if (const propertylist::Text* text = value.asString()) strings.push_back(*text);
   return strings;
 }
 
@@ -78,7 +78,7 @@ class Reader {
       return;
     }
     _checkKind(*information);
-    const std::string* name = propertylist::findString(*information, "Name");
+    const propertylist::Text* name = propertylist::findString(*information, "Name");
     bundle.name = name != nullptr ? *name : std::filesystem::path(_folder).stem().string();
     _readCode(*information, bundle);
     _readSelection(*information, bundle);
@@ -86,7 +86,7 @@ class Reader {
   }
 
   void _checkKind(const Dictionary& information) {
-    const std::string* kind = propertylist::findString(information, "Kind");
+    const propertylist::Text* kind = propertylist::findString(information, "Kind");
     if (kind == nullptr || *kind != kKind) _complain("does not name a data-class migrator");
     const propertylist::Value* version = information.find("PlatformInterfaceVersion");
     const auto number = version != nullptr ? version->asInteger() : std::nullopt;
@@ -99,12 +99,13 @@ class Reader {
   }
 
   void _readCode(const Dictionary& information, MigratorBundle& bundle) {
-    const std::string* principalClass = propertylist::findString(information, "PrincipalClass");
+    const propertylist::Text* principalClass =
+        propertylist::findString(information, "PrincipalClass");
     if (principalClass == nullptr || principalClass->empty())
       _complain("names no principal class");
     else
       bundle.principalClass = *principalClass;
-    const std::string* executable = propertylist::findString(information, "Executable");
+    const propertylist::Text* executable = propertylist::findString(information, "Executable");
     if (executable == nullptr || !isPlainName(*executable)) {
       _complain("names no executable in the bundle");
       return;
@@ -133,9 +134,9 @@ class Reader {
   void _checkResources(const Dictionary& information, MigratorBundle& bundle) {
     for (const std::string& name : stringsUnder(information, "RequiredResources"))
       _checkResource(name);
-    const std::string* types = propertylist::findString(information, "AccountTypesResource");
+    const propertylist::Text* types = propertylist::findString(information, "AccountTypesResource");
     if (types == nullptr) return;
-    const auto catalogue = _checkResource(*types + ".plist");
+    const auto catalogue = _checkResource(std::string(*types) + ".plist");
     const Dictionary* byType = catalogue ? catalogue->asDictionary() : nullptr;
     if (byType == nullptr) return;
     bundle.accountTypes.emplace();
@@ -195,7 +196,7 @@ std::vector<ReadBundle> readMigratorBundlesOfImage(const deviceimage::DeviceImag
         std::string(deviceimage::DeviceImage::kMigratorsDirectory) + "/" + name;
     const auto read = image.readPropertyList(folder + "/Info.plist");
     const Dictionary* information = read.value ? read.value->asDictionary() : nullptr;
-    const std::string* kind =
+    const propertylist::Text* kind =
         information != nullptr ? propertylist::findString(*information, "Kind") : nullptr;
     if (kind == nullptr || *kind != kKind) continue;
     bundles.push_back(Reader(image.absolutePath(folder)).read());

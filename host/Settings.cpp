@@ -74,7 +74,7 @@ bool isSameFile(const struct stat& a, const struct stat& b) {
 }
 
 std::string textUnder(const Dictionary& account, std::string_view key) {
-  const std::string* text = propertylist::findString(account, key);
+  const propertylist::Text* text = propertylist::findString(account, key);
   return text != nullptr ? *text : std::string();
 }
 
@@ -84,7 +84,7 @@ std::int64_t integerValue(const Value* value) {
   if (value->asUnsigned()) return kLargest;
   if (const auto boolean = value->asBoolean()) return *boolean ? 1 : 0;
   if (const auto real = value->asReal()) return truncated(*real);
-  if (const std::string* text = value->asString()) return leadingInteger(*text);
+  if (const propertylist::Text* text = value->asString()) return leadingInteger(*text);
   return 0;
 }
 

@@ -13,7 +13,7 @@ std::set<Dataclass> enabledDataclasses(const Dictionary& account) {
   const propertylist::Array* names = propertylist::findArray(account, "Enabled Dataclasses");
   if (names == nullptr) return enabled;
   for (const propertylist::Value& name : *names)
-    if (const std::string* text = name.asString())
+    if (const propertylist::Text* text = name.asString())
       if (const auto dataclass = deviceimage::dataclassWithIdentifier(*text))
         enabled.insert(*dataclass);
   return enabled;

@@ -43,7 +43,7 @@ std::optional<std::string> syncAgentStoreIdentifier() {
   const std::optional<propertylist::Value> name =
       platform::services().preferences.readApplicationPreference("com.vantor.OTASyncAgent",
                                                                  "AccountName");
-  const std::string* text = name ? name->asString() : nullptr;
+  const propertylist::Text* text = name ? name->asString() : nullptr;
   if (text == nullptr) return std::nullopt;
   return platform::formatLogLine("Quillnet:%@", {*text});
 }

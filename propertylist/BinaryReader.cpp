@@ -4,7 +4,7 @@
 #include <bit>
 #include <cmath>
 #include <string_view>
-#include <utility>
+#include <unordered_map>
 
 #include "propertylist/BinaryForm.h"
 #include "propertylist/UTF8.h"
@@ -13,18 +13,24 @@ namespace propertylist {
 
 using namespace binary;
 
+namespace {
+
+// Keys up to this size are compared wherever they come; see _sortLongKeys for the others.
+constexpr std::size_t kLongKey = 64;
+
+}  // namespace
+
 ReadResult readBinaryPropertyList(std::span<const std::uint8_t> bytes) {
   return BinaryReader(bytes).read();
 }
 
 BinaryReader::BinaryReader(std::span<const std::uint8_t> bytes)
-    : _bytes(bytes), _limit(std::max(kMinimumValueLimit, bytes.size())) {}
+    : _bytes(bytes), _limit(std::max(kMinimumValueLimit, bytes.size())), _arena(3 * bytes.size()) {}
 
 ReadResult BinaryReader::read() {
   if (!_readTrailer() || !_scan()) return {std::nullopt, _error};
-  _rankKeys();
-  for (const std::uint32_t object : _order) _build(_objects[object]);
-  return {std::move(_objects.front().value), {}};
+  _sortLongKeys();
+  return {_arena->value(_objects[static_cast<std::size_t>(_topObject)].raw()), {}};
 }
 
 bool BinaryReader::_readTrailer() {
@@ -54,131 +60,195 @@ bool BinaryReader::_readTrailer() {
   return true;
 }
 
-// First pass
+// Following references
 
 bool BinaryReader::_scan() {
-  _objectOfNumber.resize(static_cast<std::size_t>(_objectCount));
-  std::vector<Step> way;
-  bool isNew = false;
-  const std::size_t trailer = _bytes.size() - kTrailerSize;
-  const std::optional<std::uint32_t> top = _reach(_topObject, trailer + kTopObjectAt, isNew);
-  if (!top) return false;
-  if (_isContainer(_objects[*top].header)) {
-    way.push_back({*top, 0});
-  } else {
-    _close(*top);
-  }
-  while (!way.empty()) {
-    Step& step = way.back();
-    const std::uint32_t index = step.object;
-    if (step.nextReference < _referenceCount(_objects[index].header)) {
-      const Step current = step;
-      ++step.nextReference;
-      if (!_follow(current, way)) return false;
-      continue;
+  _objects.resize(static_cast<std::size_t>(_objectCount));
+  if (!_reach(_objects[static_cast<std::size_t>(_topObject)], _topObject)) return false;
+  while (!_way.empty()) {
+    Step& step = _way.back();
+    const std::uint64_t count = step.header.count;
+    const bool isDictionary = step.object->kind == Kind::dictionary;
+    if (isDictionary && step.nextReference < count) {
+      if (!_followKey(step)) return false;
+    } else if (step.nextReference < (isDictionary ? 2 * count : count)) {
+      if (!_followValue(step)) return false;
+    } else if (!_close()) {
+      return false;
     }
-    _close(index);
-    way.pop_back();
-    if (way.empty()) break;
-    if (!_account(_objects[way.back().object], _objects[index], way.size())) return false;
   }
   return true;
 }
 
-// Follows one reference of the container at the end of `way`, which grows when it leads to a
-// container that was not reached before.
-bool BinaryReader::_follow(Step step, std::vector<Step>& way) {
-  const Header header = _objects[step.object].header;
-  const std::size_t place = _placeOfReference(header, step.nextReference);
-  bool isNew = false;
-  const std::optional<std::uint32_t> reached = _reach(_number(place, _referenceSize), place, isNew);
-  if (!reached) return false;
-  Object& member = _objects[*reached];
-  if (header.marker == kDictionary && step.nextReference < header.count) {
-    if (!_isString(member.header)) return _fail(place, "a key that is no string");
-    if (isNew) _close(*reached);
-    if (!std::exchange(member.isKey, true)) _keys.push_back(*reached);
-    return true;
-  }
-  if (!isNew && member.isOpen) return _fail(place, "an object that contains itself");
-  if (isNew && _isContainer(member.header)) {
-    if (way.size() >= kMaximumDepth) return _fail(member.header.at, "nested too deep");
-    way.push_back({*reached, 0});
-    return true;
-  }
-  if (isNew) _close(*reached);
-  return _account(_objects[step.object], member, way.size());
+// The object to which the reference points, reached or not; null when there is none.
+BinaryReader::Object* BinaryReader::_objectAt(std::size_t placeOfReference) {
+  const std::uint64_t number = _number(placeOfReference, _referenceSize);
+  if (number < _objectCount) return &_objects[static_cast<std::size_t>(number)];
+  _fail(placeOfReference, "a reference to an object that does not exist");
+  return nullptr;
 }
 
-// The object under `number`, to which the reference at `from` points.
-std::optional<std::uint32_t> BinaryReader::_reach(std::uint64_t number, std::size_t from,
-                                                  bool& isNew) {
-  isNew = false;
-  if (number >= _objectCount) {
-    _fail(from, "a reference to an object that does not exist");
-    return std::nullopt;
+// Follows the references to all keys of a dictionary.
+bool BinaryReader::_followKey(Step& step) {
+  for (; step.nextReference < step.header.count; ++step.nextReference) {
+    const auto index = static_cast<std::size_t>(step.nextReference);
+    const std::size_t place = step.header.contents + index * _referenceSize;
+    Object* const key = _objectAt(place);
+    if (key == nullptr) return false;
+    if (key->state == State::unknown) {
+      const auto number = static_cast<std::uint64_t>(key - _objects.data());
+      if (!_reach(*key, number)) return false;
+    }
+    if (key->kind != Kind::string) return _fail(place, "a key that is no string");
+    const Arena::Raw text = key->raw();
+    Arena::putKey(step.container, index, text);
+    if (Arena::textOf(text).size() > kLongKey) step.hasLongKey = true;
   }
-  std::uint32_t& known = _objectOfNumber[static_cast<std::size_t>(number)];
-  if (known != 0) return known - 1;
+  return true;
+}
+
+// Follows the references to members, up to one that leads to a container not reached before.
+bool BinaryReader::_followValue(Step& step) {
+  const std::uint64_t end = step.header.count * (step.object->kind == Kind::dictionary ? 2 : 1);
+  while (step.nextReference < end) {
+    const std::size_t place =
+        step.header.contents + static_cast<std::size_t>(step.nextReference) * _referenceSize;
+    Object* const member = _objectAt(place);
+    if (member == nullptr) return false;
+    if (member->state == State::open) return _fail(place, "an object that contains itself");
+    if (member->state == State::unknown) {
+      const std::size_t containers = _way.size();
+      if (!_reach(*member, static_cast<std::uint64_t>(member - _objects.data()))) return false;
+      if (_way.size() > containers) return true;  // `step` is gone; it goes on when that is closed
+    } else if (member->isContainer()) {
+      Arena::noteShared(member->raw());
+    }
+    if (!_account(step, *member)) return false;
+    _put(step, *member);
+    ++step.nextReference;
+  }
+  return true;
+}
+
+// Makes the object under `number`, which was not reached before. A container is put at the end of
+// the way.
+bool BinaryReader::_reach(Object& object, std::uint64_t number) {
   const std::size_t entry = _offsetTable + static_cast<std::size_t>(number) * _offsetSize;
   const std::uint64_t at = _number(entry, _offsetSize);
   if (at < kMagic.size() || at >= _offsetTable) {
-    _fail(entry, "an object outside of its region");
-    return std::nullopt;
+    return _fail(entry, "an object outside of its region");
   }
-  const std::optional<Header> header = _readHeader(static_cast<std::size_t>(at));
-  if (!header || !_checkLeaf(*header)) return std::nullopt;
-  Object object;
-  object.header = *header;
-  object.isOpen = _isContainer(*header);
-  object.depth = object.isOpen ? 1 : 0;
-  _objects.push_back(std::move(object));
-  known = static_cast<std::uint32_t>(_objects.size());
-  isNew = true;
-  return known - 1;
-}
-
-void BinaryReader::_close(std::uint32_t object) {
-  _objects[object].isOpen = false;
-  _order.push_back(object);
+  Header header{};
+  if (!_readHeader(static_cast<std::size_t>(at), header) || !_checkLeaf(header)) return false;
+  if (header.marker != kArray && header.marker != kDictionary) {
+    object.hold(_make(header));
+    object.state = State::done;
+    return true;
+  }
+  if (_way.size() >= kMaximumDepth) return _fail(header.at, "nested too deep");
+  const auto count = static_cast<std::size_t>(header.count);
+  const Arena::Raw container =
+      header.marker == kArray ? _arena->newArray(count) : _arena->newDictionary(count);
+  object.hold(container);
+  object.state = State::open;
+  object.depth = 1;
+  _way.push_back({&object, header, container});
+  return true;
 }
 
 // Adds a finished member to what its container stands for.
-bool BinaryReader::_account(Object& container, const Object& member, std::size_t containersAbove) {
-  container.values += member.values;  // both are within the limit, so their sum does not overflow
-  if (container.values > _limit) return _fail(container.header.at, "too many values");
-  container.depth = std::max(container.depth, member.depth + 1);
-  if (containersAbove + member.depth > kMaximumDepth) {
+bool BinaryReader::_account(const Step& container, const Object& member) {
+  Object& object = *container.object;
+  object.values += member.values;  // both are within the limit, so their sum does not overflow
+  if (object.values > _limit) return _fail(container.header.at, "too many values");
+  object.depth = static_cast<std::uint16_t>(std::max<int>(object.depth, member.depth + 1));
+  if (_way.size() + member.depth > kMaximumDepth) {
     return _fail(container.header.at, "nested too deep");
   }
   return true;
 }
 
+void BinaryReader::_put(const Step& container, const Object& member) {
+  const auto index = static_cast<std::size_t>(container.nextReference);
+  if (container.object->kind == Kind::array) {
+    Arena::put(container.container, index, member.raw());
+  } else {
+    const auto count = static_cast<std::size_t>(container.header.count);
+    Arena::putValue(container.container, index - count, member.raw());
+  }
+}
+
+// Finishes the container at the end of the way and puts it into the one around it.
+bool BinaryReader::_close() {
+  const Step closed = _way.back();
+  _way.pop_back();
+  closed.object->state = State::done;
+  if (closed.object->kind == Kind::dictionary) _sortDictionary(closed);
+  if (_way.empty()) return true;
+  Step& around = _way.back();
+  if (!_account(around, *closed.object)) return false;
+  _put(around, *closed.object);
+  ++around.nextReference;
+  return true;
+}
+
+void BinaryReader::_sortDictionary(const Step& step) {
+  const auto count = static_cast<std::size_t>(step.header.count);
+  if (step.hasLongKey) {
+    _withLongKeys.push_back(step.container);
+    return;
+  }
+  for (std::size_t i = 1; i < count; ++i) {
+    if (Arena::keyAt(step.container, i - 1) >= Arena::keyAt(step.container, i)) {
+      Arena::sort(step.container, [](const auto& a, const auto& b) { return a.text < b.text; });
+      return;
+    }
+  }
+}
+
+// Sorts what waits for it by the places of the texts among all long keys: sorting each dictionary
+// by its texts could cost far more than the size of the file when many share a few long keys.
+void BinaryReader::_sortLongKeys() {
+  std::vector<const Text*> keys;
+  for (const Arena::Raw& dictionary : _withLongKeys) {
+    for (std::size_t i = 0; i < Arena::sizeOf(dictionary); ++i) {
+      const Text& key = Arena::keyAt(dictionary, i);
+      if (key.size() > kLongKey) keys.push_back(&key);
+    }
+  }
+  std::sort(keys.begin(), keys.end());
+  keys.erase(std::unique(keys.begin(), keys.end()), keys.end());
+  std::sort(keys.begin(), keys.end(), [](const Text* a, const Text* b) { return *a < *b; });
+  std::unordered_map<const Text*, std::size_t> ranks;
+  std::size_t rank = 0;
+  for (std::size_t i = 0; i < keys.size(); ++i) {
+    if (i > 0 && *keys[i - 1] != *keys[i]) ++rank;
+    ranks.emplace(keys[i], rank);
+  }
+  const auto isBefore = [&](const auto& a, const auto& b) {
+    const bool areLong = a.text.size() > kLongKey && b.text.size() > kLongKey;
+    return areLong ? ranks.at(&a.text) < ranks.at(&b.text) : a.text < b.text;
+  };
+  for (const Arena::Raw& dictionary : _withLongKeys) Arena::sort(dictionary, isBefore);
+}
+
 // Headers
 
-std::optional<BinaryReader::Header> BinaryReader::_readHeader(std::size_t at) {
-  Header header{_bytes[at], 0, at, at + 1};
+bool BinaryReader::_readHeader(std::size_t at, Header& header) {
+  header = {_bytes[at], 0, at, at + 1};
   const std::uint8_t type = header.marker & 0xF0U;
   if (type == kData || type == kASCII || type == kUTF16 || type == kArray || type == kDictionary) {
-    if (!_readCount(header)) return std::nullopt;
+    if (!_readCount(header)) return false;
     header.marker = type;
   }
   const std::optional<std::uint64_t> size = _sizeOf(header);
-  if (!size) {
-    _fail(at, "an object of an unknown type");
-    return std::nullopt;
-  }
+  if (!size) return _fail(at, "an object of an unknown type");
   if (*size > _offsetTable - header.contents) {
-    _fail(at, "an object that does not end before the offset table");
-    return std::nullopt;
+    return _fail(at, "an object that does not end before the offset table");
   }
   // Objects may overlap, but not so that a small file stands for a large amount of bytes.
   _bytesReached += header.contents - at + static_cast<std::size_t>(*size);
-  if (_bytesReached > _limit) {
-    _fail(at, "objects that overlap without measure");
-    return std::nullopt;
-  }
-  return header;
+  return _bytesReached <= _limit || _fail(at, "objects that overlap without measure");
 }
 
 // Reads the count that a marker holds or that follows it.
@@ -265,22 +335,6 @@ bool BinaryReader::_checkUTF16(const Header& header) {
 }
 
 // Small things
-
-bool BinaryReader::_isContainer(const Header& header) {
-  return header.marker == kArray || header.marker == kDictionary;
-}
-
-bool BinaryReader::_isString(const Header& header) {
-  return header.marker == kASCII || header.marker == kUTF16;
-}
-
-std::uint64_t BinaryReader::_referenceCount(const Header& header) {
-  return header.marker == kDictionary ? header.count * 2 : header.count;
-}
-
-std::size_t BinaryReader::_placeOfReference(const Header& header, std::uint64_t index) const {
-  return header.contents + static_cast<std::size_t>(index) * _referenceSize;
-}
 
 bool BinaryReader::_fail(std::size_t at, std::string what) {
   _error.what = std::move(what);

@@ -5,9 +5,9 @@
 #include <optional>
 #include <span>
 #include <string>
-#include <utility>
 #include <vector>
 
+#include "propertylist/Arena.h"
 #include "propertylist/BigEndian.h"
 #include "propertylist/Reading.h"
 #include "propertylist/Value.h"
@@ -16,9 +16,9 @@ namespace propertylist {
 
 // One reading of a binary property list.
 //
-// It goes over the objects twice. The first pass follows the references from the top object, checks
-// everything, and lists the objects that are reached with what they hold before themselves; the
-// second makes the values in that order, each object's once. Neither recurses.
+// It follows the references from the top object, checks everything that it reaches, and makes the
+// value of each object once, in the arena: a leaf when it is reached, a container when it is
+// reached with room for its members, which are put in one by one. It does not recurse.
 class BinaryReader {
  public:
   // `bytes` outlives the reader.
@@ -33,51 +33,59 @@ class BinaryReader {
     std::size_t at = 0;        // of the marker
     std::size_t contents = 0;  // behind marker and count
   };
-  // An object that is reached from the top.
+  enum class State : std::uint8_t { unknown, open, done };
+  // What is known of an object, by its number.
   struct Object {
-    Header header;
-    std::uint64_t values = 1;   // how many values it stands for with all that it holds
-    std::size_t depth = 0;      // how many containers lie in one another, itself included
-    bool isOpen = false;        // some reference in it is still to be followed
-    bool isKey = false;         // listed in _keys
-    std::uint32_t keyRank = 0;  // the place of a key's text among the texts of all keys
-    std::optional<Value> value;
+    std::uint64_t bitsOrNode = 0;
+    std::uint32_t values = 1;  // how many values it stands for with all that it holds
+    std::uint16_t depth = 0;   // how many containers lie in one another, itself included
+    Kind kind = Kind::dictionary;
+    State state : 4 = State::unknown;  // open: some reference in it is still to be followed
+    bool isNegative : 4 = false;
+
+    Arena::Raw raw() const { return Arena::scalar(kind, bitsOrNode, isNegative); }
+    void hold(const Arena::Raw& raw) {
+      kind = raw.kind;
+      isNegative = raw.isNegative;
+      bitsOrNode = raw.bits;
+    }
+    bool isContainer() const { return kind == Kind::dictionary || kind == Kind::array; }
   };
   // A container on the way from the top to the object that is looked at.
   struct Step {
-    std::uint32_t object;
-    std::uint64_t nextReference;
+    Object* object;
+    Header header;
+    Arena::Raw container;
+    std::uint64_t nextReference = 0;
+    bool hasLongKey = false;
   };
 
   bool _readTrailer();
   bool _scan();
-  bool _follow(Step step, std::vector<Step>& way);
-  std::optional<std::uint32_t> _reach(std::uint64_t number, std::size_t from, bool& isNew);
-  void _close(std::uint32_t object);
-  bool _account(Object& container, const Object& member, std::size_t containersAbove);
+  bool _followKey(Step& step);
+  bool _followValue(Step& step);
+  Object* _objectAt(std::size_t placeOfReference);
+  bool _reach(Object& object, std::uint64_t number);
+  bool _account(const Step& container, const Object& member);
+  void _put(const Step& container, const Object& member);
+  bool _close();
+  void _sortDictionary(const Step& step);
+  void _sortLongKeys();
 
-  std::optional<Header> _readHeader(std::size_t at);
+  bool _readHeader(std::size_t at, Header& header);
   bool _readCount(Header& header);
   std::optional<std::uint64_t> _sizeOf(const Header& header) const;
   bool _checkLeaf(const Header& header);
   bool _checkInteger(const Header& header);
   bool _checkUTF16(const Header& header);
 
-  void _rankKeys();
-  void _build(Object& object);
-  Value _leaf(const Header& header) const;
-  Value _array(const Header& header) const;
-  Value _dictionary(const Header& header) const;
-  std::string _text(const Header& header) const;
+  Arena::Raw _make(const Header& header);
+  Arena::Raw _integer(const Header& header) const;
+  Arena::Raw _wideText(const Header& header);
 
-  static bool _isContainer(const Header& header);
-  static bool _isString(const Header& header);
-  static std::uint64_t _referenceCount(const Header& header);
   std::uint64_t _number(std::size_t at, std::size_t size) const {
     return bigEndianNumber(_bytes.data() + at, size);
   }
-  std::size_t _placeOfReference(const Header& header, std::uint64_t index) const;
-  const Object& _member(const Header& header, std::uint64_t index) const;
   bool _fail(std::size_t at, std::string what);
 
   std::span<const std::uint8_t> _bytes;
@@ -88,10 +96,10 @@ class BinaryReader {
   std::size_t _offsetTable = 0;
   std::uint64_t _objectCount = 0;
   std::uint64_t _topObject = 0;
-  std::vector<std::uint32_t> _objectOfNumber;  // index in _objects and 1, or 0
-  std::vector<Object> _objects;                // in the order in which they are reached
-  std::vector<std::uint32_t> _order;           // in the order in which they are made
-  std::vector<std::uint32_t> _keys;            // the objects that are keys
+  Arena::Holder _arena;
+  std::vector<Object> _objects;  // by number
+  std::vector<Step> _way;
+  std::vector<Arena::Raw> _withLongKeys;  // dictionaries that are not sorted yet
   ReadError _error;
 };
 

@@ -118,7 +118,7 @@ std::optional<BinaryWriter::Number> BinaryWriter::_numberOf(const Value& value,
 
 // A text that stands where one stood before is the same, and is not looked at: most keys, and much
 // of what accounts have in common.
-std::optional<BinaryWriter::Number> BinaryWriter::_numberOfText(const std::string& text) {
+std::optional<BinaryWriter::Number> BinaryWriter::_numberOfText(const Text& text) {
   const auto address = reinterpret_cast<std::uintptr_t>(&text);
   Recent& recent = _recent[(address >> 4U ^ address >> 14U) & (kRecent - 1)];
   if (recent.text == &text) return recent.number;
@@ -127,7 +127,7 @@ std::optional<BinaryWriter::Number> BinaryWriter::_numberOfText(const std::strin
   return number;
 }
 
-std::optional<BinaryWriter::Number> BinaryWriter::_numberOfNewText(const std::string& text) {
+std::optional<BinaryWriter::Number> BinaryWriter::_numberOfNewText(const Text& text) {
   if (text.size() > kShort) {
     const auto known = _byAddress.find(&text);
     if (known != _byAddress.end()) return known->second;

@@ -3,7 +3,6 @@
 #include <cstddef>
 #include <cstdint>
 #include <optional>
-#include <string>
 #include <string_view>
 #include <unordered_map>
 #include <vector>
@@ -29,13 +28,13 @@ class BinaryWriter {
   // A text, for a string or a key, or any other value.
   struct Object {
     const Value* value;
-    const std::string* text;
+    const Text* text;
     std::uint32_t firstReference = 0;  // of a container, in _references
     std::uint32_t depth = 0;           // of a container: containers around it and itself
   };
   // Where a text stands in memory, and its number; see _numberOfText.
   struct Recent {
-    const std::string* text = nullptr;
+    const Text* text = nullptr;
     Number number = 0;
   };
 
@@ -43,8 +42,8 @@ class BinaryWriter {
   bool _numberMembers(std::size_t container);
   bool _refer(std::optional<Number> number);
   std::optional<Number> _numberOf(const Value& value, std::uint32_t depth);
-  std::optional<Number> _numberOfText(const std::string& text);
-  std::optional<Number> _numberOfNewText(const std::string& text);
+  std::optional<Number> _numberOfText(const Text& text);
+  std::optional<Number> _numberOfNewText(const Text& text);
   Number _numberOfData(const Bytes& data, const Value& value);
   std::optional<Number> _numberOfScalar(const Value& value);
   Number _add(const Object& object);

@@ -44,7 +44,7 @@ std::string_view withoutBlanks(std::string_view text) {
   return text.substr(first, text.find_last_not_of(kBlanks) - first + 1);
 }
 
-std::optional<Value> parseIntegerText(std::string_view text) {
+std::optional<IntegerText> parseIntegerText(std::string_view text) {
   text = withoutBlanks(text);
   const bool isNegative = takeSign(text);
   const bool isHexadecimal = text.starts_with("0x") || text.starts_with("0X");
@@ -53,9 +53,9 @@ std::optional<Value> parseIntegerText(std::string_view text) {
   const char* const end = text.data() + text.size();
   const auto [stop, error] = std::from_chars(text.data(), end, magnitude, isHexadecimal ? 16 : 10);
   if (error != std::errc() || stop != end) return std::nullopt;
-  if (!isNegative) return Value(magnitude);
+  if (!isNegative || magnitude == 0) return IntegerText{magnitude, false};
   if (magnitude > std::uint64_t{1} << 63U) return std::nullopt;
-  return Value(static_cast<std::int64_t>(0 - magnitude));
+  return IntegerText{0 - magnitude, true};
 }
 
 std::optional<double> parseRealText(std::string_view text) {

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstdint>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -12,7 +13,11 @@
 namespace propertylist {
 
 // Decimal, or hexadecimal after "0x", with an optional sign; empty when 64 bits cannot hold it.
-std::optional<Value> parseIntegerText(std::string_view text);
+struct IntegerText {
+  std::uint64_t bits;
+  bool isNegative;
+};
+std::optional<IntegerText> parseIntegerText(std::string_view text);
 // In decimal.
 std::string integerText(const Value& integer);
 

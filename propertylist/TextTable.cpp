@@ -61,7 +61,7 @@ std::uint64_t TextTable::hashOf(std::string_view text) {
 }
 
 void TextTable::add(std::uint64_t hash, std::size_t index) {
-  if (2 * (_count + 1) > _slots.size()) _grow();
+  makeRoomForOne();
   std::size_t at = hash & _mask;
   while (_slots[at].indexAndOne != 0) at = (at + 1) & _mask;
   _slots[at] = {static_cast<std::uint32_t>(hash >> 32U), static_cast<std::uint32_t>(index + 1),

@@ -5,12 +5,14 @@
 #include <string_view>
 #include <vector>
 
+#include "propertylist/Export.h"
+
 namespace propertylist {
 
 // Finds what was seen before by its content: the caller keeps the contents in a list, and the table
 // their indexes. The hash has a key that is chosen at random for each process, so that whoever
 // writes a file cannot choose contents that collide.
-class TextTable {
+class PROPERTYLIST_EXPORT TextTable {
  public:
   static constexpr std::size_t kNone = ~std::size_t{0};
 
@@ -31,6 +33,10 @@ class TextTable {
   }
   // Adds what find did not find. `index` is less than 2^32 - 1.
   void add(std::uint64_t hash, std::size_t index);
+  // After this the next add does not fail.
+  void makeRoomForOne() {
+    if (2 * (_count + 1) > _slots.size()) _grow();
+  }
 
  private:
   struct Slot {

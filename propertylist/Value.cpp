@@ -1,118 +1,154 @@
 #include "propertylist/Value.h"
 
 #include <algorithm>
-#include <string>
+#include <new>
 #include <utility>
 #include <vector>
 
+#include "propertylist/Nodes.h"
+
 namespace propertylist {
+
+using storage::Owner;
+
 namespace {
 
-// What array and dictionary storage have in common: they hold further values.
-struct ContainerStorage {
-  ContainerStorage() = default;
-  ContainerStorage(const ContainerStorage&) = delete;
-  ContainerStorage& operator=(const ContainerStorage&) = delete;
-  virtual ~ContainerStorage() = default;
-  ContainerStorage* next = nullptr;  // in the list of what is to be destroyed
+// What owned arrays and dictionaries have in common: they hold further values. One that dies while
+// another is being destroyed is put on a list instead of being destroyed inside of it, so that no
+// nesting is deep enough for the stack; the list runs through the owners themselves, because an
+// allocation could fail.
+class ContainerOwner : public Owner {
+ protected:
+  ContainerOwner() : Owner(false) {}
+
+ private:
+  void _destroy() noexcept override;
+  ContainerOwner* _next = nullptr;
 };
 
-thread_local ContainerStorage* toBeDestroyed = nullptr;
+thread_local ContainerOwner* toBeDestroyed = nullptr;
 thread_local bool isDestroying = false;
 
-// The deleter of every storage. A storage that dies while another one is being destroyed is put on
-// a list instead of being destroyed inside of it, so that no nesting is deep enough for the stack;
-// the list runs through the storages themselves, because an allocation could fail.
-void destroyStorage(ContainerStorage* storage) noexcept {
-  storage->next = toBeDestroyed;
-  toBeDestroyed = storage;
+void ContainerOwner::_destroy() noexcept {
+  _next = toBeDestroyed;
+  toBeDestroyed = this;
   if (isDestroying) return;
   isDestroying = true;
   while (toBeDestroyed != nullptr) {
-    ContainerStorage* const first = toBeDestroyed;
-    toBeDestroyed = first->next;
+    ContainerOwner* const first = toBeDestroyed;
+    toBeDestroyed = first->_next;
     delete first;
   }
   isDestroying = false;
 }
 
-// Whether nobody else shares `storage`, so that it may be changed.
-template <typename Storage>
-bool isSole(const std::shared_ptr<Storage>& storage) {
-  if (storage.use_count() != 1) return false;
-  // The count is read without ordering. Taking another reference orders what the last other owner
-  // did on its thread before what is done here.
-  // NOLINTNEXTLINE(performance-unnecessary-copy-initialization): the copy is made for that order
-  const std::shared_ptr<Storage> ordering = storage;
-  return true;
-}
-
-std::shared_ptr<const std::string> sharedText(std::string text) {
-  return std::make_shared<const std::string>(std::move(text));
-}
-
 }  // namespace
 
-struct Array::Storage : ContainerStorage {
-  explicit Storage(std::vector<Value> v) : values(std::move(v)) {}
-  std::vector<Value> values;
+// Text and data
+
+// The text follows the object.
+struct Value::OwnTextNode final : Owner, TextNode {
+  explicit OwnTextNode(std::string_view t)
+      : Owner(false), TextNode(this, {reinterpret_cast<char*>(this + 1), t.size()}) {
+    t.copy(reinterpret_cast<char*>(this + 1), t.size());
+  }
+  static OwnTextNode* make(std::string_view t) {
+    void* const memory = ::operator new(sizeof(OwnTextNode) + t.size());
+    return new (memory) OwnTextNode(t);
+  }
+  void _destroy() noexcept override {
+    this->~OwnTextNode();
+    ::operator delete(this);
+  }
 };
 
-struct Dictionary::Storage : ContainerStorage {
-  explicit Storage(std::vector<Entry> e) : entries(std::move(e)) {}
-  std::vector<Entry> entries;
+struct Value::SharedTextNode final : Owner, TextNode {
+  explicit SharedTextNode(std::shared_ptr<const std::string> s)
+      : Owner(false), TextNode(this, *s), string(std::move(s)) {}
+  std::shared_ptr<const std::string> string;
 };
+
+struct Value::OwnDataNode final : Owner, DataNode {
+  explicit OwnDataNode(Bytes bytes) : Owner(false), DataNode(this, std::move(bytes)) {}
+};
+
+storage::Node* Value::_newText(std::string_view text) { return OwnTextNode::make(text); }
+
+const Value::TextNode& Value::_textNode() const {
+  return *static_cast<const TextNode*>(_content.reference._node());
+}
+const Value::DataNode& Value::_dataNode() const {
+  return *static_cast<const DataNode*>(_content.reference._node());
+}
 
 // Array
 
-Array::Array() = default;
-Array::Array(const Array&) = default;
-Array::Array(Array&&) noexcept = default;
-Array& Array::operator=(const Array&) = default;
-Array& Array::operator=(Array&&) noexcept = default;
-Array::~Array() = default;
+struct Array::OwnNode final : ContainerOwner, Node {
+  explicit OwnNode(std::vector<Value> v) : Node(this, v.data(), v.size()), values(std::move(v)) {}
+  void update() {
+    first = values.data();
+    size = values.size();
+  }
+  std::vector<Value> values;
+};
+
+const Array::Node* Array::_array() const { return static_cast<const Node*>(_node()); }
 
 Array::Array(std::initializer_list<Value> values) : Array(std::vector<Value>(values)) {}
 
 Array::Array(std::vector<Value> values) {
-  if (!values.empty()) _storage.reset(new Storage(std::move(values)), destroyStorage);
+  if (!values.empty()) _bits = storage::bitsOf(new OwnNode(std::move(values)));
 }
 
-std::size_t Array::size() const { return _storage ? _storage->values.size() : 0; }
-const Value& Array::operator[](std::size_t index) const { return _storage->values[index]; }
-const Value* Array::begin() const { return _storage ? _storage->values.data() : nullptr; }
+std::size_t Array::size() const { return _bits != 0 ? _array()->size : 0; }
+const Value& Array::operator[](std::size_t index) const { return _array()->first[index]; }
+const Value* Array::begin() const { return _bits != 0 ? _array()->first : nullptr; }
 const Value* Array::end() const { return begin() + size(); }
 
 bool Array::contains(const Value& value) const { return std::find(begin(), end(), value) != end(); }
 
-void Array::append(Value value) { _mutable().push_back(std::move(value)); }
-void Array::replace(std::size_t index, Value value) { _mutable()[index] = std::move(value); }
-void Array::removeAt(std::size_t index) {
-  std::vector<Value>& values = _mutable();
-  values.erase(values.begin() + static_cast<std::ptrdiff_t>(index));
+void Array::append(Value value) {
+  OwnNode& own = _mutable();
+  own.values.push_back(std::move(value));
+  own.update();
 }
 
-std::vector<Value>& Array::_mutable() {
-  if (!isSole(_storage)) {
-    _storage.reset(new Storage(std::vector<Value>(begin(), end())), destroyStorage);
-  }
-  return _storage->values;
+void Array::replace(std::size_t index, Value value) { _mutable().values[index] = std::move(value); }
+
+void Array::removeAt(std::size_t index) {
+  OwnNode& own = _mutable();
+  own.values.erase(own.values.begin() + static_cast<std::ptrdiff_t>(index));
+  own.update();
+}
+
+// This array's own node, which nobody shares. What an arena holds is never changed.
+Array::OwnNode& Array::_mutable() {
+  if (_bits == 0 || _node()->owner->isArena() || !_node()->owner->isSole())
+    *this = Array(new OwnNode(std::vector<Value>(begin(), end())));
+  return static_cast<OwnNode&>(*static_cast<Node*>(_node()));
 }
 
 // Dictionary
 
-Dictionary::Dictionary() = default;
-Dictionary::Dictionary(const Dictionary&) = default;
-Dictionary::Dictionary(Dictionary&&) noexcept = default;
-Dictionary& Dictionary::operator=(const Dictionary&) = default;
-Dictionary& Dictionary::operator=(Dictionary&&) noexcept = default;
-Dictionary::~Dictionary() = default;
+struct Dictionary::OwnNode final : ContainerOwner, Node {
+  explicit OwnNode(std::vector<Entry> e) : Node(this, e.data(), e.size()), entries(std::move(e)) {}
+  void update() {
+    first = entries.data();
+    size = entries.size();
+  }
+  std::vector<Entry> entries;
+};
+
+const Dictionary::Node* Dictionary::_dictionary() const {
+  return static_cast<const Node*>(_node());
+}
 
 Dictionary::Entry::Entry(std::string_view key, Value value)
-    : _key(sharedText(std::string(key))), _value(std::move(value)) {}
+    : _key(Reference(Value::_newText(key))), _value(std::move(value)) {}
 
-Dictionary::Entry::Entry(std::shared_ptr<const std::string> key, Value value)
-    : _key(std::move(key)), _value(std::move(value)) {}
+const Text& Dictionary::Entry::key() const {
+  return static_cast<const Value::TextNode*>(_key._node())->text;
+}
 
 Dictionary::Dictionary(std::initializer_list<std::pair<std::string_view, Value>> entries)
     : Dictionary(std::vector<Entry>([&entries] {
@@ -133,18 +169,12 @@ Dictionary::Dictionary(std::vector<Entry> entries) {
                     [](const Entry& a, const Entry& b) { return a.key() == b.key(); });
     entries.erase(entries.begin(), kept.base());
   }
-  *this = _fromAscending(std::move(entries));
+  if (!entries.empty()) _bits = storage::bitsOf(new OwnNode(std::move(entries)));
 }
 
-Dictionary Dictionary::_fromAscending(std::vector<Entry> entries) {
-  Dictionary dictionary;
-  if (!entries.empty()) dictionary._storage.reset(new Storage(std::move(entries)), destroyStorage);
-  return dictionary;
-}
-
-std::size_t Dictionary::size() const { return _storage ? _storage->entries.size() : 0; }
+std::size_t Dictionary::size() const { return _bits != 0 ? _dictionary()->size : 0; }
 const Dictionary::Entry* Dictionary::begin() const {
-  return _storage ? _storage->entries.data() : nullptr;
+  return _bits != 0 ? _dictionary()->first : nullptr;
 }
 const Dictionary::Entry* Dictionary::end() const { return begin() + size(); }
 
@@ -153,7 +183,14 @@ const Dictionary::Entry* Dictionary::_lowerBound(std::string_view key) const {
                           [](const Entry& entry, std::string_view k) { return entry.key() < k; });
 }
 
+// Few entries are faster walked over than searched: most differ in the length of their key.
 const Value* Dictionary::find(std::string_view key) const {
+  constexpr std::size_t kFew = 32;
+  if (size() <= kFew) {
+    const Entry* const found =
+        std::find_if(begin(), end(), [key](const Entry& entry) { return entry.key() == key; });
+    return found != end() ? &found->value() : nullptr;
+  }
   const Entry* const entry = _lowerBound(key);
   return entry != end() && entry->key() == key ? &entry->value() : nullptr;
 }
@@ -163,113 +200,96 @@ void Dictionary::set(std::string_view key, Value value) {
       !empty() && (end() - 1)->key() < key ? end() : _lowerBound(key);  // ascending keys: no search
   const std::ptrdiff_t index = place - begin();
   if (place != end() && place->key() == key) {
-    _mutable()[static_cast<std::size_t>(index)]._value = std::move(value);
+    _mutable().entries[static_cast<std::size_t>(index)]._value = std::move(value);
     return;
   }
   Entry entry(key, std::move(value));
-  std::vector<Entry>& entries = _mutable();
-  entries.insert(entries.begin() + index, std::move(entry));
+  OwnNode& own = _mutable();
+  own.entries.insert(own.entries.begin() + index, std::move(entry));
+  own.update();
 }
 
 bool Dictionary::remove(std::string_view key) {
   const Entry* const entry = _lowerBound(key);
   if (entry == end() || entry->key() != key) return false;
   const std::ptrdiff_t index = entry - begin();
-  std::vector<Entry>& entries = _mutable();
-  entries.erase(entries.begin() + index);
+  OwnNode& own = _mutable();
+  own.entries.erase(own.entries.begin() + index);
+  own.update();
   return true;
 }
 
-std::vector<Dictionary::Entry>& Dictionary::_mutable() {
-  if (!isSole(_storage)) {
-    _storage.reset(new Storage(std::vector<Entry>(begin(), end())), destroyStorage);
-  }
-  return _storage->entries;
+Dictionary::OwnNode& Dictionary::_mutable() {
+  if (_bits == 0 || _node()->owner->isArena() || !_node()->owner->isSole())
+    *this = Dictionary(new OwnNode(std::vector<Entry>(begin(), end())));
+  return static_cast<OwnNode&>(*static_cast<Node*>(_node()));
 }
 
 // Value
 
-Value::Value(Dictionary dictionary) : _content(std::move(dictionary)) {}
-Value::Value(Array array) : _content(std::move(array)) {}
-Value::Value(std::string string) : _content(sharedText(std::move(string))) {}
-Value::Value(std::string_view string) : Value(std::string(string)) {}
-Value::Value(const char* string) : Value(std::string(string)) {}
-Value::Value(std::shared_ptr<const std::string> string) : _content(std::move(string)) {}
-Value::Value(Date date) : _content(date) {}
-Value::Value(Bytes data) : _content(std::make_shared<const Bytes>(std::move(data))) {}
+Value::Value(Dictionary dictionary)
+    : _kind(Kind::dictionary), _content(Reference(std::move(dictionary))) {}
+Value::Value(Array array) : _kind(Kind::array), _content(Reference(std::move(array))) {}
+// NOLINTNEXTLINE(performance-unnecessary-value-param): whoever has a string to give away does
+Value::Value(std::string string) : Value(std::string_view(string)) {}
+Value::Value(std::string_view string) : Value(NodeTag(), Kind::string, _newText(string)) {}
+Value::Value(const char* string) : Value(std::string_view(string)) {}
+Value::Value(std::shared_ptr<const std::string> string)
+    : Value(NodeTag(), Kind::string, new SharedTextNode(std::move(string))) {}
+Value::Value(Date date)
+    : Value(Kind::date, std::bit_cast<std::uint64_t>(date.secondsSince2001), false) {}
+Value::Value(Bytes data) : Value(NodeTag(), Kind::data, new OwnDataNode(std::move(data))) {}
 
-Value::Value(const Value&) = default;
-Value::~Value() = default;
-
-// A value that was moved from is an empty dictionary, so that a string always has a text.
-Value::Value(Value&& other) noexcept : _content(std::move(other._content)) {
-  other._content.emplace<Dictionary>();
-}
-
-Value& Value::operator=(const Value& other) {
-  Value copy(other);  // first, because `other` may live inside of what this value holds
-  _content.swap(copy._content);
-  return *this;
+Value& Value::operator=(const Value& other) noexcept {
+  return *this = Value(other);  // a copy first, because `other` may live inside of what this holds
 }
 
 Value& Value::operator=(Value&& other) noexcept {
   Value taken(std::move(other));
-  _content.swap(taken._content);
+  std::swap(_kind, taken._kind);
+  std::swap(_isNegative, taken._isNegative);
+  std::swap(_content.bits, taken._content.bits);  // of a reference too: it is moved, not counted
   return *this;
 }
 
-Kind Value::kind() const { return static_cast<Kind>(_content.index()); }
-
-const Dictionary* Value::asDictionary() const { return std::get_if<Dictionary>(&_content); }
-const Array* Value::asArray() const { return std::get_if<Array>(&_content); }
-
-const std::string* Value::asString() const {
-  const auto* const text = std::get_if<std::shared_ptr<const std::string>>(&_content);
-  return text != nullptr ? text->get() : nullptr;
+const Dictionary* Value::asDictionary() const {
+  return _kind == Kind::dictionary ? &_content.dictionary : nullptr;
 }
 
+const Array* Value::asArray() const { return _kind == Kind::array ? &_content.array : nullptr; }
+
+const Text* Value::asString() const { return _kind == Kind::string ? &_textNode().text : nullptr; }
+
 std::optional<std::int64_t> Value::asInteger() const {
-  const Integer* const integer = std::get_if<Integer>(&_content);
-  if (integer == nullptr) return std::nullopt;
-  const auto asSigned = static_cast<std::int64_t>(integer->bits);
-  if ((asSigned < 0) != integer->negative) return std::nullopt;
+  if (_kind != Kind::integer) return std::nullopt;
+  const auto asSigned = static_cast<std::int64_t>(_content.bits);
+  if ((asSigned < 0) != _isNegative) return std::nullopt;
   return asSigned;
 }
 
 std::optional<std::uint64_t> Value::asUnsigned() const {
-  const Integer* const integer = std::get_if<Integer>(&_content);
-  if (integer == nullptr || integer->negative) return std::nullopt;
-  return integer->bits;
+  if (_kind != Kind::integer || _isNegative) return std::nullopt;
+  return _content.bits;
 }
 
 std::optional<double> Value::asReal() const {
-  const double* const real = std::get_if<double>(&_content);
-  return real != nullptr ? std::optional(*real) : std::nullopt;
+  return _kind == Kind::real ? std::optional(std::bit_cast<double>(_content.bits)) : std::nullopt;
 }
 
 std::optional<bool> Value::asBoolean() const {
-  const bool* const boolean = std::get_if<bool>(&_content);
-  return boolean != nullptr ? std::optional(*boolean) : std::nullopt;
+  return _kind == Kind::boolean ? std::optional(_content.bits != 0) : std::nullopt;
 }
 
 std::optional<Date> Value::asDate() const {
-  const Date* const date = std::get_if<Date>(&_content);
-  return date != nullptr ? std::optional(*date) : std::nullopt;
+  return _kind == Kind::date ? std::optional(Date{std::bit_cast<double>(_content.bits)})
+                             : std::nullopt;
 }
 
-const Bytes* Value::asData() const {
-  const auto* const data = std::get_if<std::shared_ptr<const Bytes>>(&_content);
-  return data != nullptr ? data->get() : nullptr;
-}
-
-std::shared_ptr<const std::string> Value::sharedString() const {
-  const auto* const text = std::get_if<std::shared_ptr<const std::string>>(&_content);
-  return text != nullptr ? *text : nullptr;
-}
+const Bytes* Value::asData() const { return _kind == Kind::data ? &_dataNode().data : nullptr; }
 
 // Lookups by key and kind
 
-const std::string* findString(const Dictionary& dictionary, std::string_view key) {
+const Text* findString(const Dictionary& dictionary, std::string_view key) {
   const Value* const value = dictionary.find(key);
   return value != nullptr ? value->asString() : nullptr;
 }

@@ -12,18 +12,18 @@
 #include <string_view>
 #include <type_traits>
 #include <utility>
-#include <variant>
 #include <vector>
 
 #include "propertylist/Export.h"
+#include "propertylist/Storage.h"
 
 namespace propertylist {
 
-class BinaryReader;
+class Arena;
 class Value;
 
 // The eight kinds of value that a property list holds.
-enum class Kind { dictionary, array, string, integer, real, boolean, date, data };
+enum class Kind : std::uint8_t { dictionary, array, string, integer, real, boolean, date, data };
 
 // An instant, in seconds since 2001-01-01 00:00:00 UTC. Compared bit by bit, so that a date always
 // equals itself, whatever its seconds are.
@@ -37,19 +37,60 @@ struct Date {
 
 using Bytes = std::vector<std::uint8_t>;
 
+// The text of a string or key, in UTF-8. Belongs to the value or entry that it was taken from.
+class Text : public std::string_view {
+ public:
+  using std::string_view::string_view;
+  explicit Text(std::string_view text) : std::string_view(text) {}
+  operator std::string() const {  // NOLINT(google-explicit-constructor): a copy of one's own
+    return std::string(data(), size());
+  }
+};
+
+// What arrays, dictionaries, texts and data have in common: a counted reference to a node, or null.
+class PROPERTYLIST_EXPORT Reference {
+ public:
+  Reference() = default;
+  Reference(const Reference& other) noexcept : _bits(other._bits) {
+    if (_bits != 0) _retain();
+  }
+  Reference(Reference&& other) noexcept : _bits(std::exchange(other._bits, 0)) {}
+  Reference& operator=(const Reference& other) noexcept {
+    Reference copy(other);  // first, because `other` may live inside of what this refers to
+    std::swap(_bits, copy._bits);
+    return *this;
+  }
+  Reference& operator=(Reference&& other) noexcept {
+    Reference taken(std::move(other));
+    std::swap(_bits, taken._bits);
+    return *this;
+  }
+  ~Reference() {
+    if (_bits != 0) _release();
+  }
+
+ protected:
+  // Takes over one count of the node's.
+  explicit Reference(const storage::Node* node) noexcept : _bits(storage::bitsOf(node)) {}
+  storage::Node* _node() const noexcept { return storage::nodeOf(_bits); }
+  std::uint64_t _bits = 0;  // the node's address
+
+ private:
+  friend class Value;
+  friend class Dictionary;
+  friend class Arena;
+  void _retain() const noexcept { _node()->owner->retain(); }
+  void _release() const noexcept { _node()->owner->release(); }
+};
+
 // An ordered list of values. A copy shares the storage; a change copies it first when somebody else
 // shares it. One thread at a time may change an object; copies of it may be used by other threads.
-class PROPERTYLIST_EXPORT Array {
+class PROPERTYLIST_EXPORT Array : private Reference {
  public:
-  Array();
+  Array() = default;
   // An array of one array is Array{Value(inner)}: some compilers take Array{inner} for a copy.
   Array(std::initializer_list<Value> values);
   explicit Array(std::vector<Value> values);
-  Array(const Array&);
-  Array(Array&&) noexcept;
-  Array& operator=(const Array&);
-  Array& operator=(Array&&) noexcept;
-  ~Array();
 
   std::size_t size() const;
   bool empty() const { return size() == 0; }
@@ -67,34 +108,32 @@ class PROPERTYLIST_EXPORT Array {
   void removeAt(std::size_t index);
 
   // Whether both are views of one storage, which makes them equal without a comparison.
-  bool sharesStorageWith(const Array& other) const { return _storage == other._storage; }
+  bool sharesStorageWith(const Array& other) const { return _bits == other._bits; }
   // Deep equality, strict by kind (see Value).
   PROPERTYLIST_EXPORT friend bool operator==(const Array& a, const Array& b);
 
  private:
   friend class Value;
-  struct Storage;
-  std::vector<Value>& _mutable();
-  std::shared_ptr<Storage> _storage;  // null for the empty array
+  friend class Arena;
+  struct Node;
+  struct OwnNode;
+  using Reference::Reference;
+  const Node* _array() const;
+  OwnNode& _mutable();
 };
 
 // Values by string key. Kept, visited and written in ascending order of the keys' UTF-8 bytes, so
 // that equal dictionaries are visited alike. Shares storage like Array.
-class PROPERTYLIST_EXPORT Dictionary {
+class PROPERTYLIST_EXPORT Dictionary : private Reference {
  public:
   // One key with its value. Keys read from one file share their text.
   class Entry;
 
-  Dictionary();
+  Dictionary() = default;
   // A key given twice keeps its last value.
   Dictionary(std::initializer_list<std::pair<std::string_view, Value>> entries);
   // Builds a dictionary of any size in one go. A key given twice keeps its last value.
   explicit Dictionary(std::vector<Entry> entries);
-  Dictionary(const Dictionary&);
-  Dictionary(Dictionary&&) noexcept;
-  Dictionary& operator=(const Dictionary&);
-  Dictionary& operator=(Dictionary&&) noexcept;
-  ~Dictionary();
 
   std::size_t size() const;
   bool empty() const { return size() == 0; }
@@ -110,25 +149,27 @@ class PROPERTYLIST_EXPORT Dictionary {
   // Removes `key`; false when it was not there.
   bool remove(std::string_view key);
 
-  bool sharesStorageWith(const Dictionary& other) const { return _storage == other._storage; }
+  bool sharesStorageWith(const Dictionary& other) const { return _bits == other._bits; }
   PROPERTYLIST_EXPORT friend bool operator==(const Dictionary& a, const Dictionary& b);
 
  private:
   friend class Value;
-  friend class BinaryReader;
-  struct Storage;
-  // Takes entries that are in ascending order of their keys already, each key once.
-  static Dictionary _fromAscending(std::vector<Entry> entries);
+  friend class Arena;
+  struct Node;
+  struct OwnNode;
+  using Reference::Reference;
+  const Node* _dictionary() const;
   const Entry* _lowerBound(std::string_view key) const;
-  std::vector<Entry>& _mutable();
-  std::shared_ptr<Storage> _storage;  // null for the empty dictionary
+  OwnNode& _mutable();
 };
 
 // One property-list value: a dictionary, array, string (UTF-8), integer (64 bits, signed or
 // unsigned), real, boolean, date or data. There is no null value: absence is an empty optional or a
 // null pointer.
 //
-// Copies share their storage, so a deep copy costs a reference count. Equality is deep and strict
+// Copies share their storage, so a deep copy costs a reference count. The values that were read
+// from one file share one storage, which goes when the last copy of any of them has gone; what is
+// changed has storage of its own. Equality is deep and strict
 // by kind: integer 1, real 1.0 and boolean true differ from one another; reals compare bit by bit.
 // A signed and an unsigned integer of equal value are equal.
 //
@@ -153,19 +194,21 @@ class PROPERTYLIST_EXPORT Value {
   template <std::floating_point T>
   Value(T real);  // NOLINT(google-explicit-constructor)
 
-  Value(const Value&);
-  Value(Value&&) noexcept;
-  Value& operator=(const Value&);
-  Value& operator=(Value&&) noexcept;
-  ~Value();
+  Value(const Value& other) noexcept;
+  Value(Value&& other) noexcept;
+  Value& operator=(const Value& other) noexcept;
+  Value& operator=(Value&& other) noexcept;
+  ~Value() {
+    if (_hasNode()) _content.reference.~Reference();
+  }
 
-  Kind kind() const;
+  Kind kind() const { return _kind; }
 
   // What the value holds when it is of that kind, else null or empty. Pointers are valid until the
   // value changes.
   const Dictionary* asDictionary() const;
   const Array* asArray() const;
-  const std::string* asString() const;
+  const Text* asString() const;
   // Empty also for an integer above the signed range.
   std::optional<std::int64_t> asInteger() const;
   // Empty also for a negative integer.
@@ -174,56 +217,107 @@ class PROPERTYLIST_EXPORT Value {
   std::optional<bool> asBoolean() const;
   std::optional<Date> asDate() const;
   const Bytes* asData() const;
-  // The shared text of a string, else null.
-  std::shared_ptr<const std::string> sharedString() const;
 
   PROPERTYLIST_EXPORT friend bool operator==(const Value& a, const Value& b);
 
  private:
   friend class Array;
   friend class Dictionary;
+  friend class Arena;
   class Comparison;
-  struct Integer {
-    std::uint64_t bits = 0;
-    bool negative = false;
-    friend bool operator==(Integer, Integer) = default;
+  class Counting;
+  friend std::uint64_t countValues(const Value& value, std::uint64_t limit);
+  struct TextNode;
+  struct OwnTextNode;
+  struct SharedTextNode;
+  struct DataNode;
+  struct OwnDataNode;
+  struct NodeTag {};
+
+  // Takes over one count of the node's, which is one of this kind; or, for a value that lies in an
+  // arena and is never destroyed, none.
+  Value(NodeTag /*tag*/, Kind kind, storage::Node* node) noexcept
+      : _kind(kind), _content(Reference(node)) {}
+  Value(Kind kind, std::uint64_t bits, bool isNegative) noexcept
+      : _kind(kind), _isNegative(isNegative), _content(bits) {}
+  static storage::Node* _newText(std::string_view text);
+  bool _hasNode() const {
+    return _kind == Kind::dictionary || _kind == Kind::array || _kind == Kind::string ||
+           _kind == Kind::data;
+  }
+  const TextNode& _textNode() const;
+  const DataNode& _dataNode() const;
+  bool _hasBitsOf(const Value& other) const {
+    return _content.bits == other._content.bits && _isNegative == other._isNegative;
+  }
+
+  // Numbers, booleans and dates by their bits; everything else by reference.
+  union Content {
+    explicit Content(std::uint64_t b) : bits(b) {}
+    explicit Content(Reference r) : reference(std::move(r)) {}
+    ~Content() {}  // NOLINT(modernize-use-equals-default): the value knows what there is
+    std::uint64_t bits;
+    Reference reference;
+    Dictionary dictionary;
+    Array array;
   };
-  using Content = std::variant<Dictionary, Array, std::shared_ptr<const std::string>, Integer,
-                               double, bool, Date, std::shared_ptr<const Bytes>>;
+  Kind _kind = Kind::dictionary;
+  bool _isNegative = false;  // an integer below zero
   Content _content;
 };
 
 class PROPERTYLIST_EXPORT Dictionary::Entry {
  public:
   Entry(std::string_view key, Value value);
-  // Shares the text of `key` with other entries; `key` is not null.
-  Entry(std::shared_ptr<const std::string> key, Value value);
-  const std::string& key() const { return *_key; }
+  const Text& key() const;
   const Value& value() const { return _value; }
 
  private:
   friend class Dictionary;
   friend class Value;
-  std::shared_ptr<const std::string> _key;
+  friend class Arena;
+  Entry(Reference key, Value value) : _key(std::move(key)), _value(std::move(value)) {}
+  Reference _key;  // a text
   Value _value;
 };
 
+inline Value::Value(const Value& other) noexcept
+    : _kind(other._kind), _isNegative(other._isNegative), _content(std::uint64_t{0}) {
+  if (_hasNode()) {
+    new (&_content.reference) Reference(other._content.reference);
+  } else {
+    _content.bits = other._content.bits;
+  }
+}
+
+// A value that was moved from is an empty dictionary, so that a string always has a text.
+inline Value::Value(Value&& other) noexcept
+    : _kind(other._kind), _isNegative(other._isNegative), _content(std::uint64_t{0}) {
+  if (_hasNode()) {
+    new (&_content.reference) Reference(std::move(other._content.reference));
+  } else {
+    _content.bits = other._content.bits;
+    new (&other._content.reference) Reference();
+  }
+  other._kind = Kind::dictionary;
+}
+
 template <typename T>
 requires std::same_as<T, bool> Value::Value(T boolean)
-    : _content(std::in_place_type<bool>, boolean) {}
+    : Value(Kind::boolean, boolean ? 1U : 0U, false) {}
 
 template <typename T>
 requires(std::integral<T> && !std::same_as<T, bool> &&
          !std::same_as<T, char>) Value::Value(T integer)
-    : _content(Integer{static_cast<std::uint64_t>(integer), std::cmp_less(integer, 0)}) {}
+    : Value(Kind::integer, static_cast<std::uint64_t>(integer), std::cmp_less(integer, 0)) {}
 
 template <std::floating_point T>
-Value::Value(T real) : _content(std::in_place_type<double>, static_cast<double>(real)) {}
+Value::Value(T real)
+    : Value(Kind::real, std::bit_cast<std::uint64_t>(static_cast<double>(real)), false) {}
 
 // The value under `key` when it is of the named kind, else null or empty: one step for the usual
 // two.
-PROPERTYLIST_EXPORT const std::string* findString(const Dictionary& dictionary,
-                                                  std::string_view key);
+PROPERTYLIST_EXPORT const Text* findString(const Dictionary& dictionary, std::string_view key);
 PROPERTYLIST_EXPORT const Array* findArray(const Dictionary& dictionary, std::string_view key);
 PROPERTYLIST_EXPORT const Dictionary* findDictionary(const Dictionary& dictionary,
                                                      std::string_view key);

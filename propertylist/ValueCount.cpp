@@ -4,61 +4,71 @@
 #include <unordered_map>
 #include <vector>
 
-namespace propertylist {
-namespace {
+#include "propertylist/Nodes.h"
 
-class Counting {
+namespace propertylist {
+
+// One count. A container to which several places refer is counted once and remembered.
+class Value::Counting {
  public:
   explicit Counting(std::uint64_t limit) : _limit(limit) {}
 
   std::uint64_t of(const Value& value) {
-    _open.push_back({nullptr, 1, 0, 0});  // stands around everything and gets the sum
-    _look(value);
+    _open.push_back({nullptr, 0, 0, 1, 0, false, false});  // stands around everything
+    _look(value, false);
     while (_open.size() > 1) _continue();
     return _open.front().values;
   }
 
  private:
   struct Container {
-    const void* storage;  // the address of its first member
+    const std::byte* members;  // values, or entries with a value each
     std::size_t size;
-    std::size_t next;  // the member whose turn it is
+    std::size_t next;    // the member whose turn it is
+    std::size_t stride;  // from one value to the next
     std::uint64_t values;
-    const Array* array = nullptr;
-    const Dictionary* dictionary = nullptr;
+    bool isInArena;
+    bool isRemembered;
+    const void* node = nullptr;
   };
 
-  void _look(const Value& value) {
-    const Array* const array = value.asArray();
-    const Dictionary* const dictionary = value.asDictionary();
-    if (array != nullptr && !array->empty()) {
-      _enter({array->begin(), array->size(), 0, 1, array, nullptr});
-    } else if (dictionary != nullptr && !dictionary->empty()) {
-      _enter({dictionary->begin(), dictionary->size(), 0, 1, nullptr, dictionary});
+  void _look(const Value& value, bool isInside) {
+    if (value._kind == Kind::dictionary && !value._content.dictionary.empty()) {
+      const auto& node = *value._content.dictionary._dictionary();
+      _enter(node, &node.first->_value, sizeof *node.first, isInside);
+    } else if (value._kind == Kind::array && !value._content.array.empty()) {
+      const auto& node = *value._content.array._array();
+      _enter(node, node.first, sizeof *node.first, isInside);
     } else {
       _add(1);
     }
   }
 
-  void _enter(const Container& container) {
-    const auto known = _known.find(container.storage);
-    if (known != _known.end()) {
-      _add(known->second);
-    } else {
-      _open.push_back(container);
+  template <typename Node>
+  void _enter(const Node& node, const Value* first, std::size_t stride, bool isInside) {
+    const bool isInArena = node.owner->isArena();
+    const bool hasOnePlace = isInArena ? isInside && !node.isShared : node.owner->isSole();
+    if (!hasOnePlace) {
+      const auto known = _known.find(&node);
+      if (known != _known.end()) return _add(known->second);
     }
+    _open.push_back({reinterpret_cast<const std::byte*>(first), node.size, 0, stride, 1, isInArena,
+                     !hasOnePlace, &node});
   }
 
   void _continue() {
     Container& container = _open.back();
-    if (container.next < container.size) {
-      const std::size_t index = container.next++;
-      _look(container.array != nullptr ? (*container.array)[index]
-                                       : container.dictionary->begin()[index].value());
-      return;
+    // Leaves are counted here; what is entered comes back to the next member.
+    while (container.next < container.size) {
+      const std::byte* const place = container.members + container.next * container.stride;
+      ++container.next;
+      const auto& member = *reinterpret_cast<const Value*>(place);
+      if (member._kind == Kind::dictionary || member._kind == Kind::array)
+        return _look(member, container.isInArena);
+      container.values = std::min(container.values + 1, _limit + 1);
     }
     const std::uint64_t values = container.values;
-    _known.emplace(container.storage, values);
+    if (container.isRemembered) _known.emplace(container.node, values);
     _open.pop_back();
     _add(values);
   }
@@ -73,10 +83,8 @@ class Counting {
   std::unordered_map<const void*, std::uint64_t> _known;
 };
 
-}  // namespace
-
 std::uint64_t countValues(const Value& value, std::uint64_t limit) {
-  return Counting(limit).of(value);
+  return Value::Counting(limit).of(value);
 }
 
 }  // namespace propertylist

@@ -1,8 +1,9 @@
-#include <memory>
+#include <algorithm>
 #include <string>
-#include <utility>
+#include <string_view>
 #include <vector>
 
+#include "propertylist/Arena.h"
 #include "propertylist/DateText.h"
 #include "propertylist/LeafText.h"
 #include "propertylist/Reading.h"
@@ -17,20 +18,24 @@ using Tag = XMLScanner::Tag;
 // One reading of an XML property list. The containers that are open wait in a list.
 class XMLReader {
  public:
-  explicit XMLReader(std::string_view text) : _scanner(text) {}
+  explicit XMLReader(std::string_view text) : _scanner(text), _arena(text.size() / 2) {}
 
   ReadResult read() {
-    if (_readDocument()) return {std::move(_top), {}};
+    if (_readDocument()) return {_arena->value(*_top), {}};
     return {std::nullopt, _scanner.error()};
   }
 
  private:
   struct Container {
     std::string_view name;  // of its tag
-    std::vector<Value> values;
-    std::vector<Dictionary::Entry> entries;
-    std::shared_ptr<const std::string> key;  // whose value comes next
-    bool isDictionary() const { return name == "dict"; }
+    bool isDictionary;
+    std::size_t firstMember;             // in _members
+    std::optional<Arena::Raw> key = {};  // whose value comes next
+  };
+  // A member of an open container; its key, when that is a dictionary.
+  struct Member {
+    Arena::Raw key;
+    Arena::Raw value;
   };
 
   bool _readDocument() {
@@ -58,44 +63,42 @@ class XMLReader {
   bool _readElement(const Tag& tag) {
     if (tag.name == "key") return _readKey(tag);
     if (_open.empty() && _top) return _scanner.fail(tag, "more than one value");
-    if (!_open.empty() && _open.back().isDictionary() && !_open.back().key) {
+    if (!_open.empty() && _open.back().isDictionary && !_open.back().key) {
       return _scanner.fail(tag, "a value without a key");
     }
     if (tag.name == "dict" || tag.name == "array") {
       if (_open.size() == kMaximumDepth) return _scanner.fail(tag, "nested too deep");
-      _open.push_back({tag.name, {}, {}, nullptr});
+      _open.push_back({tag.name, tag.name == "dict", _members.size()});
       return !tag.isEmpty || _close(tag);
     }
     return _readLeaf(tag);
   }
 
   bool _readKey(const Tag& tag) {
-    if (_open.empty() || !_open.back().isDictionary()) {
+    if (_open.empty() || !_open.back().isDictionary) {
       return _scanner.fail(tag, "a key outside of a dictionary");
     }
     if (_open.back().key) return _scanner.fail(tag, "a key without a value");
-    std::string text;
-    if (!_readContents(tag, text)) return false;
-    _open.back().key = _sharedKey(std::move(text));
+    if (!_readContents(tag)) return false;
+    const std::uint64_t hash = TextTable::hashOf(_text);
+    const auto isSame = [this](std::size_t index) { return Arena::textOf(_keys[index]) == _text; };
+    std::size_t index = _keyTable.find(hash, isSame);
+    if (index == TextTable::kNone) {
+      index = _keys.size();
+      _keys.push_back(_arena->newText(_text));
+      _keyTable.add(hash, index);
+    }
+    _open.back().key = _keys[index];
     return true;
   }
 
-  const std::shared_ptr<const std::string>& _sharedKey(std::string text) {
-    const std::uint64_t hash = TextTable::hashOf(text);
-    const std::size_t known =
-        _keyTable.find(hash, [&](std::size_t index) { return *_keys[index] == text; });
-    if (known != TextTable::kNone) return _keys[known];
-    _keyTable.add(hash, _keys.size());
-    return _keys.emplace_back(std::make_shared<const std::string>(std::move(text)));
-  }
-
   bool _readLeaf(const Tag& tag) {
-    std::string text;
     if (!_isLeaf(tag.name)) return _scanner.fail(tag, "an unknown element");
-    if (!_readContents(tag, text)) return false;
-    std::optional<Value> value = _leaf(tag.name, std::move(text));
+    if (!_readContents(tag)) return false;
+    const std::optional<Arena::Raw> value = _leaf(tag.name);
     if (!value) return _scanner.fail(tag, "a value that is not well formed");
-    return _put(std::move(*value));
+    _put(*value);
+    return true;
   }
 
   static bool _isLeaf(std::string_view name) {
@@ -103,20 +106,36 @@ class XMLReader {
            name == "false" || name == "date" || name == "data";
   }
 
-  static std::optional<Value> _leaf(std::string_view name, std::string text) {
-    if (name == "string") return Value(std::move(text));
-    if (name == "integer") return parseIntegerText(text);
-    if (name == "real") return parseRealText(text);
-    if (name == "date") return parseDateText(withoutBlanks(text));
-    if (name == "data") return parseBase64(text);
-    if (!withoutBlanks(text).empty()) return std::nullopt;
-    return Value(name == "true");
+  std::optional<Arena::Raw> _leaf(std::string_view name) {
+    if (name == "string") return _arena->newText(_text);
+    if (name == "integer") {
+      const std::optional<IntegerText> integer = parseIntegerText(_text);
+      if (!integer) return std::nullopt;
+      return Arena::scalar(Kind::integer, integer->bits, integer->isNegative);
+    }
+    if (name == "real") return _scalar(Kind::real, parseRealText(_text));
+    if (name == "date") {
+      const std::optional<Date> date = parseDateText(withoutBlanks(_text));
+      return _scalar(Kind::date, date ? std::optional(date->secondsSince2001) : std::nullopt);
+    }
+    if (name == "data") {
+      const std::optional<Bytes> data = parseBase64(_text);
+      return data ? std::optional(_arena->newData(*data)) : std::nullopt;
+    }
+    if (!withoutBlanks(_text).empty()) return std::nullopt;
+    return Arena::scalar(Kind::boolean, name == "true" ? 1 : 0);
   }
 
-  // Reads the text of an element and its end tag.
-  bool _readContents(const Tag& tag, std::string& text) {
+  static std::optional<Arena::Raw> _scalar(Kind kind, std::optional<double> number) {
+    if (!number) return std::nullopt;
+    return Arena::scalar(kind, std::bit_cast<std::uint64_t>(*number));
+  }
+
+  // Reads the text of an element into _text, and its end tag.
+  bool _readContents(const Tag& tag) {
+    _text.clear();
     if (tag.isEmpty) return true;
-    if (!_scanner.readText(text)) return false;
+    if (!_scanner.readText(_text)) return false;
     const std::optional<Tag> end = _scanner.readTag();
     if (!end) return false;
     if (!end->isEnd) return _scanner.fail(*end, "an element inside of a text");
@@ -124,31 +143,55 @@ class XMLReader {
   }
 
   bool _close(const Tag& tag) {
-    Container& container = _open.back();
+    const Container& container = _open.back();
     if (tag.name != container.name) return _scanner.fail(tag, "an end tag that does not fit");
     if (container.key) return _scanner.fail(tag, "a key without a value");
-    Value value = container.isDictionary() ? Value(Dictionary(std::move(container.entries)))
-                                           : Value(Array(std::move(container.values)));
+    const Arena::Raw made =
+        container.isDictionary ? _dictionary(container.firstMember) : _array(container.firstMember);
+    _members.resize(container.firstMember);
     _open.pop_back();
-    return _put(std::move(value));
-  }
-
-  bool _put(Value value) {
-    if (_open.empty()) {
-      _top = std::move(value);
-    } else if (_open.back().isDictionary()) {
-      _open.back().entries.emplace_back(std::exchange(_open.back().key, nullptr), std::move(value));
-    } else {
-      _open.back().values.push_back(std::move(value));
-    }
+    _put(made);
     return true;
   }
 
+  Arena::Raw _array(std::size_t first) {
+    const Arena::Raw made = _arena->newArray(_members.size() - first);
+    for (std::size_t i = first; i < _members.size(); ++i)
+      Arena::put(made, i - first, _members[i].value);
+    return made;
+  }
+
+  Arena::Raw _dictionary(std::size_t first) {
+    const Arena::Raw made = _arena->newDictionary(_members.size() - first);
+    bool isAscending = true;
+    for (std::size_t i = first; i < _members.size(); ++i) {
+      Arena::putKey(made, i - first, _members[i].key);
+      Arena::putValue(made, i - first, _members[i].value);
+      isAscending = isAscending && (i == first || Arena::textOf(_members[i - 1].key) <
+                                                      Arena::textOf(_members[i].key));
+    }
+    if (!isAscending)
+      Arena::sort(made, [](const auto& a, const auto& b) { return a.text < b.text; });
+    return made;
+  }
+
+  void _put(const Arena::Raw& value) {
+    if (_open.empty()) {
+      _top = value;
+    } else {
+      _members.push_back({_open.back().key.value_or(Arena::Raw()), value});
+      _open.back().key.reset();
+    }
+  }
+
   XMLScanner _scanner;
+  Arena::Holder _arena;
   std::vector<Container> _open;
-  std::optional<Value> _top;
+  std::vector<Member> _members;  // of all that are open
+  std::optional<Arena::Raw> _top;
+  std::string _text;  // of the element that is read
   TextTable _keyTable;
-  std::vector<std::shared_ptr<const std::string>> _keys;
+  std::vector<Arena::Raw> _keys;
 };
 
 }  // namespace

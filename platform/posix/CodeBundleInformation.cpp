@@ -10,7 +10,7 @@ namespace {
 
 std::optional<std::string> stringUnder(const propertylist::Dictionary& dictionary,
                                        std::string_view key) {
-  const std::string* text = propertylist::findString(dictionary, key);
+  const propertylist::Text* text = propertylist::findString(dictionary, key);
   if (text == nullptr) return std::nullopt;
   return *text;
 }
@@ -25,16 +25,16 @@ ReadCodeBundleInformation readCodeBundleInformation(const std::string& bundlePat
   if (!read.value) return failure(path + " cannot be read: " + read.error);
   const propertylist::Dictionary* info = read.value->asDictionary();
   if (info == nullptr) return failure(path + " is no dictionary");
-  const std::string* executable = propertylist::findString(*info, "Executable");
+  const propertylist::Text* executable = propertylist::findString(*info, "Executable");
   if (executable == nullptr) return failure(path + " has no string \"Executable\"");
   if (!isPlainFileName(*executable))
     return failure("\"Executable\" in " + path + " is not the name of a file in the bundle");
   const propertylist::Value* version = info->find("PlatformInterfaceVersion");
-  return {
-      CodeBundleInformation{bundlePath + "/" + *executable, stringUnder(*info, "PrincipalClass"),
-                            stringUnder(*info, "BundleIdentifier"), stringUnder(*info, "Kind"),
-                            version == nullptr ? std::nullopt : version->asInteger()},
-      {}};
+  return {CodeBundleInformation{bundlePath + "/" + std::string(*executable),
+                                stringUnder(*info, "PrincipalClass"),
+                                stringUnder(*info, "BundleIdentifier"), stringUnder(*info, "Kind"),
+                                version == nullptr ? std::nullopt : version->asInteger()},
+          {}};
 }
 
 }  // namespace platform

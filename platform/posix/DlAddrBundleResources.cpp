@@ -48,7 +48,7 @@ std::string DlAddrBundleResources::localizedString(const void* code, std::string
   const std::optional<std::string> directory = _directoryOf(code);
   if (!directory || !isPlainFileName(table)) return std::string(key);
   const std::lock_guard lock(_mutex);
-  const std::string* text = propertylist::findString(_table(*directory, table), key);
+  const propertylist::Text* text = propertylist::findString(_table(*directory, table), key);
   return text == nullptr ? std::string(key) : *text;
 }
 

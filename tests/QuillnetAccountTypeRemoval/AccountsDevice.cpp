@@ -134,7 +134,8 @@ Lines identifiersOf(const AccountArray& accounts) {
 Lines identifiersOf(const Array& accountInfos) {
   Lines identifiers;
   for (const Value& info : accountInfos) {
-    const std::string* identifier = propertylist::findString(*info.asDictionary(), "Identifier");
+    const propertylist::Text* identifier =
+        propertylist::findString(*info.asDictionary(), "Identifier");
     identifiers.push_back(identifier != nullptr ? *identifier : "(null)");
   }
   return identifiers;
@@ -155,7 +156,8 @@ std::shared_ptr<OpenStore> OpenStore::ofAccounts(const Array& accounts) {
 Lines OpenStore::children() const {
   Lines lines;
   for (const auto& [child, parent] : childAccountIDToParentAccountID())
-    lines.push_back(child + " of " + parent);
+    lines.push_back(std::string(child) + " of " + parent);
+  std::sort(lines.begin(), lines.end());
   if (lines.size() != childAccountsByID().size())
     throw std::runtime_error("the two indexes of children differ");
   return lines;

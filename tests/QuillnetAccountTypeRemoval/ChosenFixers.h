@@ -20,7 +20,7 @@ class ChosenFixer : public ASSRuntimeFixMailAccount {
   FixVerdict fixBasicAccountIfNeededLoggingMessage(const AccountPtr& account,
                                                    std::string_view message) override {
     _notes.push_back(_name + ": " + std::string(message) + " " +
-                     account->identifier().value_or("(null)"));
+                     std::string(account->identifier().value_or("(null)")));
     return _choice(account);
   }
   void accountsHaveBeenSaved(bool saved) override {

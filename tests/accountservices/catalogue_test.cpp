@@ -32,7 +32,7 @@ TEST_F(Catalogue, NamesClassesThatTheServicesRegister) {
       const Dictionary& entry = *value.asDictionary();
       const Dictionary& description = *propertylist::findDictionary(entry, "Description");
       const std::string framework = *propertylist::findString(description, "Framework");
-      SCOPED_TRACE(type.key() + ", " + propertylist::describe(entry));
+      SCOPED_TRACE(std::string(type.key()) + ", " + propertylist::describe(entry));
       bundles.insert(framework);
       const auto failed =
           image.services().classRegistry.loadLibrary(image.root() + "/" + framework);

@@ -12,7 +12,8 @@ class KeptDiary : public Diary {
   KeptDiary() { platform::registerClass(*this); }
   void note(const std::string& line) override { lines.push_back(line); }
   void noteAccount(const std::string& what, const AccountPtr& account) override {
-    note(what + "(" + (account ? account->identifier().value_or("(null)") : "none") + ")");
+    note(what + "(" + std::string(account ? account->identifier().value_or("(null)") : "none") +
+         ")");
   }
   void noteChanges(const std::string& notifier, const Array& changes) override {
     note(told(notifier, changes));

@@ -22,8 +22,9 @@ class NamedClass : public platform::RuntimeClass, public FullAccountClass {
   NamedClass() { platform::registerClass(*this); }
   std::string className() const override { return "NamedClass"; }
   FullAccountPtr initWithProperties(const propertylist::Dictionary& properties) override {
-    const std::string* identifier = propertylist::findString(properties, "Identifier");
-    diary().note("initWithProperties(" + (identifier != nullptr ? *identifier : "none") + ")");
+    const propertylist::Text* identifier = propertylist::findString(properties, "Identifier");
+    diary().note("initWithProperties(" + std::string(identifier != nullptr ? *identifier : "none") +
+                 ")");
     if (diary().creationFails()) return nullptr;
     return std::make_shared<FullAccount>("by the class");
   }

@@ -86,7 +86,7 @@ class LocalDataTest : public ::testing::Test {
     if (accounts == nullptr) return std::nullopt;
     for (const Value& account : *accounts) {
       const Dictionary* info = account.asDictionary();
-      const std::string* found = propertylist::findString(*info, "Type");
+      const propertylist::Text* found = propertylist::findString(*info, "Type");
       if (found == nullptr || *found != type) continue;
       const Value* value = info->find(key);
       return value != nullptr ? std::optional(*value) : std::nullopt;

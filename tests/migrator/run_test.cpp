@@ -24,11 +24,11 @@ class ScriptedMigrator : public MergeAndRemoveQuillnetAccounts {
 
  protected:
   bool _mergeAccountDataToLocalStore(const AccountPtr& account) override {
-    calls.push_back("merge " + *account->identifier());
+    calls.push_back("merge " + std::string(*account->identifier()));
     return merged;
   }
   bool _removeAccount(const AccountPtr& account) override {
-    calls.push_back("remove " + *account->identifier());
+    calls.push_back("remove " + std::string(*account->identifier()));
     if (reallyRemoves) MergeAndRemoveQuillnetAccounts::_removeAccount(account);
     return removed;
   }

@@ -37,7 +37,7 @@ std::vector<Dictionary> childrenOf(const Dictionary& properties) {
 Accounts accountsOf(const std::vector<Dictionary>& dictionaries) {
   Accounts accounts;
   for (const Dictionary& account : dictionaries) {
-    const std::string* const stored =
+    const propertylist::Text* const stored =
         propertylist::findString(account, accountsettings::kAccountIdentifier);
     const std::string identifier = stored != nullptr ? *stored : std::string();
     if (accounts.byIdentifier.insert_or_assign(identifier, account).second)
@@ -90,7 +90,7 @@ class Comparison {
 };
 
 std::string typeOf(const std::optional<Value>& properties) {
-  const std::string* const type =
+  const propertylist::Text* const type =
       propertylist::findString(*properties->asDictionary(), accountsettings::kAccountType);
   return type != nullptr ? *type : std::string();
 }

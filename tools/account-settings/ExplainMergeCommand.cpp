@@ -34,7 +34,7 @@ void requireIdentifiers(const std::string& file, const Dictionary& settings) {
   const propertylist::Array* const accounts = propertylist::findArray(settings, "Accounts");
   for (std::size_t i = 0; accounts != nullptr && i < accounts->size(); ++i) {
     const Dictionary& account = *(*accounts)[i].asDictionary();
-    const std::string* const type =
+    const propertylist::Text* const type =
         propertylist::findString(account, accountsettings::kAccountType);
     if (*type == accountsettings::kOnMyDeviceAccountType ||
         propertylist::findString(account, accountsettings::kAccountIdentifier) != nullptr)

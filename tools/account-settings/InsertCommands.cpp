@@ -55,10 +55,11 @@ void requireUsable(const std::string& file, const Array& accounts) {
 void requireIdentifier(const std::string& file, const Dictionary& account) {
   const Value* const identifier = account.find(accountsettings::kAccountIdentifier);
   if (identifier == nullptr) return;  // it gets a new one
-  const std::string* const text = identifier->asString();
+  const propertylist::Text* const text = identifier->asString();
   if (text == nullptr || text->empty())
     refuse(file, "an account's \"Identifier\" is empty or no string; leave it out for a new one");
-  const std::string* const type = propertylist::findString(account, accountsettings::kAccountType);
+  const propertylist::Text* const type =
+      propertylist::findString(account, accountsettings::kAccountType);
   const bool isLocal = type != nullptr && *type == accountsettings::kOnMyDeviceAccountType;
   if (isLocal && *text != kLocalIdentifier)
     refuse(file, fmt::format("the device's own account, of the type \"{}\", has the identifier "

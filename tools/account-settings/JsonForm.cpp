@@ -72,7 +72,8 @@ class Writer {
 
  private:
   static std::string _leaf(const Value& value) {
-    if (const std::string* const string = value.asString()) return quoted(*string);
+    if (const propertylist::Text* const string = value.asString())
+      return quoted(std::string(*string));
     if (const auto boolean = value.asBoolean()) return *boolean ? "true" : "false";
     if (const auto integer = value.asInteger()) return std::to_string(*integer);
     if (const auto integer = value.asUnsigned()) return std::to_string(*integer);
@@ -91,7 +92,7 @@ class Writer {
     ++_depth;
     for (const Dictionary::Entry& entry : dictionary) {
       _newLine(before);
-      text += quoted(isEscaped ? '@' + entry.key() : entry.key()) + ": ";
+      text += quoted((isEscaped ? "@" : "") + std::string(entry.key())) + ": ";
       write(entry.value());
       before = ',';
     }
@@ -144,7 +145,7 @@ std::optional<Value> realOf(std::string_view text) {
 // The value that the one entry of a dictionary stands for; empty when it stands for none.
 std::optional<Value> untagged(const std::string& key, const Value& value) {
   if (key == kDateKey && value.asReal()) return Value(Date{*value.asReal()});
-  const std::string* const text = value.asString();
+  const propertylist::Text* const text = value.asString();
   if (text == nullptr) return std::nullopt;
   if (key == kDateKey) {
     const auto date = parseExactDateText(*text);

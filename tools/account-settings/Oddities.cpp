@@ -25,7 +25,7 @@ constexpr std::string_view kAccountsKey = "Accounts";
 constexpr std::string_view kVersionKey = "Version";
 
 std::string textUnder(const Dictionary& properties, std::string_view key) {
-  const std::string* const text = propertylist::findString(properties, key);
+  const propertylist::Text* const text = propertylist::findString(properties, key);
   return text != nullptr ? *text : std::string();
 }
 

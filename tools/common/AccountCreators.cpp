@@ -14,7 +14,7 @@ using propertylist::Dictionary;
 using propertylist::Value;
 
 // Null when the entry names none.
-const std::string* bundleOf(const Value& entry) {
+const propertylist::Text* bundleOf(const Value& entry) {
   const Dictionary* const creator = entry.asDictionary();
   const Dictionary* const description =
       creator == nullptr ? nullptr : propertylist::findDictionary(*creator, "Description");
@@ -38,7 +38,7 @@ std::set<std::string> namedBundles() {
     const Array* const entries = type.value().asArray();
     if (entries == nullptr) continue;
     for (const Value& entry : *entries)
-      if (const std::string* const bundle = bundleOf(entry)) bundles.insert(*bundle);
+      if (const propertylist::Text* const bundle = bundleOf(entry)) bundles.insert(*bundle);
   }
   return bundles;
 }

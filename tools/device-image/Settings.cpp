@@ -34,7 +34,7 @@ std::vector<Dictionary> dictionariesIn(const Dictionary& dictionary, std::string
 }
 
 std::string stringOrEmpty(const Dictionary& dictionary, std::string_view key) {
-  const std::string* const found = propertylist::findString(dictionary, key);
+  const propertylist::Text* const found = propertylist::findString(dictionary, key);
   return found == nullptr ? std::string() : *found;
 }
 

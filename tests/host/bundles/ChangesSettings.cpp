@@ -29,7 +29,7 @@ using propertylist::Array;
 using propertylist::Dictionary;
 
 bool isRetired(const Dictionary& account) {
-  const std::string* type = propertylist::findString(account, "Type");
+  const propertylist::Text* type = propertylist::findString(account, "Type");
   const propertylist::Value* status = account.find("QuillnetStatus");
   return type != nullptr && *type == "Quillnet" && status != nullptr && status->asInteger() == 1;
 }

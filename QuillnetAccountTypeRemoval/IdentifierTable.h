@@ -1,0 +1,127 @@
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <string>
+#include <string_view>
+#include <utility>
+#include <vector>
+
+#include "propertylist/TextTable.h"
+
+namespace accountsettings {
+
+// What a store knows by identifier. Visited in the order in which the identifiers came; one that
+// was removed and comes again is the last. The identifiers lie one behind the other in one text, so
+// that an entry costs no allocation of its own. Pointers and references are valid until the next
+// set.
+template <typename T>
+class IdentifierTable {
+ public:
+  class Iterator;
+
+  std::size_t size() const { return _entries.size() - _removed; }
+  bool empty() const { return size() == 0; }
+  // Null when there is nothing under the identifier.
+  T* find(std::string_view identifier) {
+    const std::size_t index = _indexOf(propertylist::TextTable::hashOf(identifier), identifier);
+    return index != propertylist::TextTable::kNone ? &_entries[index].value : nullptr;
+  }
+  const T* find(std::string_view identifier) const {
+    return const_cast<IdentifierTable*>(this)->find(identifier);
+  }
+  bool contains(std::string_view identifier) const { return find(identifier) != nullptr; }
+  // The identifier is there.
+  const T& at(std::string_view identifier) const { return *find(identifier); }
+  // The value under the identifier, put there when there was none.
+  T& operator[](std::string_view identifier);
+  void set(std::string_view identifier, T value) { (*this)[identifier] = std::move(value); }
+  // Does nothing when there is nothing under the identifier. Never throws.
+  void remove(std::string_view identifier);
+  void clear() { *this = IdentifierTable(); }
+
+  // Pairs of identifier and value.
+  Iterator begin() const { return Iterator(*this, 0); }
+  Iterator end() const { return Iterator(*this, _entries.size()); }
+
+ private:
+  struct Entry {
+    std::size_t begin = 0;  // in _identifiers
+    std::size_t size = 0;
+    bool isThere = true;
+    T value = T();
+  };
+  std::string_view _identifierOf(const Entry& entry) const {
+    return std::string_view(_identifiers).substr(entry.begin, entry.size);
+  }
+  std::size_t _indexOf(std::uint64_t hash, std::string_view identifier) const {
+    return _indexes.find(hash, [&](std::size_t index) {
+      const Entry& entry = _entries[index];
+      return entry.isThere && _identifierOf(entry) == identifier;
+    });
+  }
+  void _forgetRemoved();
+
+  std::string _identifiers;
+  std::vector<Entry> _entries;
+  std::size_t _removed = 0;  // entries that are not there any more
+  propertylist::TextTable _indexes;
+};
+
+template <typename T>
+class IdentifierTable<T>::Iterator {
+ public:
+  Iterator(const IdentifierTable& table, std::size_t index) : _table(&table), _index(index) {
+    _passRemoved();
+  }
+  std::pair<std::string_view, const T&> operator*() const {
+    const Entry& entry = _table->_entries[_index];
+    return {_table->_identifierOf(entry), entry.value};
+  }
+  Iterator& operator++() {
+    ++_index;
+    _passRemoved();
+    return *this;
+  }
+  bool operator==(const Iterator& other) const { return _index == other._index; }
+
+ private:
+  void _passRemoved() {
+    while (_index < _table->_entries.size() && !_table->_entries[_index].isThere) ++_index;
+  }
+  const IdentifierTable* _table;
+  std::size_t _index;
+};
+
+template <typename T>
+T& IdentifierTable<T>::operator[](std::string_view identifier) {
+  const std::uint64_t hash = propertylist::TextTable::hashOf(identifier);
+  const std::size_t known = _indexOf(hash, identifier);
+  if (known != propertylist::TextTable::kNone) return _entries[known].value;
+  if (_removed > _entries.size() / 2) _forgetRemoved();
+  _indexes.makeRoomForOne();
+  _identifiers += identifier;
+  _entries.push_back({_identifiers.size() - identifier.size(), identifier.size()});
+  _indexes.add(hash, _entries.size() - 1);
+  return _entries.back().value;
+}
+
+template <typename T>
+void IdentifierTable<T>::remove(std::string_view identifier) {
+  const std::size_t index = _indexOf(propertylist::TextTable::hashOf(identifier), identifier);
+  if (index == propertylist::TextTable::kNone) return;
+  _entries[index].isThere = false;
+  _entries[index].value = T();
+  ++_removed;
+}
+
+template <typename T>
+void IdentifierTable<T>::_forgetRemoved() {
+  IdentifierTable kept;
+  for (const Entry& entry : _entries) {
+    if (entry.isThere) kept.set(_identifierOf(entry), entry.value);
+  }
+  *this = std::move(kept);
+}
+
+}  // namespace accountsettings

@@ -1,0 +1,186 @@
+#pragma once
+
+#include <algorithm>
+#include <cstddef>
+#include <cstdint>
+#include <cstring>
+#include <deque>
+#include <memory>
+#include <new>
+#include <span>
+#include <string_view>
+#include <vector>
+
+#include "propertylist/Nodes.h"
+
+namespace propertylist {
+
+// The storage of one file's values while it is read, and then of all that is left of them: few
+// large allocations instead of one for each node, which go together. What lies in it is never
+// destroyed one by one, and what refers to it from inside is not counted.
+class Arena final : public storage::Owner {
+ public:
+  // Holds the first reference.
+  class Holder {
+   public:
+    explicit Holder(std::size_t expectedSize) : _arena(new Arena(expectedSize)) {}
+    ~Holder() { _arena->release(); }
+    Holder(const Holder&) = delete;
+    Holder& operator=(const Holder&) = delete;
+    Arena* operator->() const { return _arena; }
+
+   private:
+    Arena* _arena;
+  };
+
+  // A value as it lies in the arena: its bits, or its node.
+  struct Raw {
+    Kind kind = Kind::dictionary;
+    bool isNegative = false;
+    std::uint64_t bits = 0;  // or the address of its node, 0 for an empty container
+
+    storage::Node* node() const { return storage::nodeOf(bits); }
+    void setNode(const storage::Node* node) { bits = storage::bitsOf(node); }
+  };
+
+  static Raw scalar(Kind kind, std::uint64_t bits, bool isNegative = false);
+  // A text of so many bytes, which the caller fills in before anybody looks.
+  struct NewText {
+    Raw value;
+    char* characters;
+  };
+  NewText newText(std::size_t size);
+  Raw newText(std::string_view text);
+  Raw newData(std::span<const std::uint8_t> data);
+  // Containers of members that are put in by their index, each once.
+  Raw newArray(std::size_t size);
+  Raw newDictionary(std::size_t size);
+  static void put(const Raw& array, std::size_t index, const Raw& member);
+  static void putKey(const Raw& dictionary, std::size_t index, const Raw& text);
+  static void putValue(const Raw& dictionary, std::size_t index, const Raw& value);
+  static const Text& keyAt(const Raw& dictionary, std::size_t index);
+  static std::size_t sizeOf(const Raw& dictionary);
+  static std::string_view textOf(const Raw& text);
+  // That the file refers to the container once more.
+  static void noteShared(const Raw& container);
+  // Sorts by `isBefore(keyNode, keyNode)`, an order of texts. Of equal keys the last stays.
+  template <typename IsBefore>
+  static void sort(const Raw& dictionary, const IsBefore& isBefore);
+  // The finished value for the world outside, counted.
+  Value value(const Raw& raw);
+
+ private:
+  explicit Arena(std::size_t expectedSize);
+  void* _allocate(std::size_t size);
+  void* _allocateFromNewChunk(std::size_t size);
+  void* _allocateChunk(std::size_t size);
+
+  static Value* _membersOf(const Raw& array);
+  static Dictionary::Entry* _entriesOf(const Raw& dictionary);
+  static const Value::TextNode& _keyOf(const Dictionary::Entry& entry);
+
+  static constexpr std::size_t kAlignment = alignof(std::uint64_t);
+  std::size_t _chunkSize;
+  std::byte* _next = nullptr;
+  std::size_t _left = 0;
+  std::vector<std::unique_ptr<std::byte[]>> _chunks;  // NOLINT(modernize-avoid-c-arrays)
+  std::deque<Value::DataNode> _datas;                 // apart, because these have to be destroyed
+};
+
+inline void* Arena::_allocate(std::size_t size) {
+  size = (size + kAlignment - 1) / kAlignment * kAlignment;
+  if (size > _left) return _allocateFromNewChunk(size);
+  void* const memory = _next;
+  _next += size;
+  _left -= size;
+  return memory;
+}
+
+inline Arena::Raw Arena::scalar(Kind kind, std::uint64_t bits, bool isNegative) {
+  Raw raw;
+  raw.kind = kind;
+  raw.isNegative = isNegative;
+  raw.bits = bits;
+  return raw;
+}
+
+inline Arena::NewText Arena::newText(std::size_t size) {
+  auto* const memory = static_cast<char*>(_allocate(sizeof(Value::TextNode) + size));
+  char* const characters = memory + sizeof(Value::TextNode);
+  NewText made;
+  made.value.kind = Kind::string;
+  made.value.setNode(new (memory) Value::TextNode(this, {characters, size}));
+  made.characters = characters;
+  return made;
+}
+
+inline Arena::Raw Arena::newText(std::string_view text) {
+  const NewText made = newText(text.size());
+  if (!text.empty()) std::memcpy(made.characters, text.data(), text.size());
+  return made.value;
+}
+
+inline Value* Arena::_membersOf(const Raw& array) {
+  return const_cast<Value*>(static_cast<Array::Node*>(array.node())->first);
+}
+
+inline Dictionary::Entry* Arena::_entriesOf(const Raw& dictionary) {
+  return const_cast<Dictionary::Entry*>(static_cast<Dictionary::Node*>(dictionary.node())->first);
+}
+
+inline const Value::TextNode& Arena::_keyOf(const Dictionary::Entry& entry) {
+  return *static_cast<const Value::TextNode*>(entry._key._node());
+}
+
+inline void Arena::put(const Raw& array, std::size_t index, const Raw& member) {
+  new (_membersOf(array) + index) Value(member.kind, member.bits, member.isNegative);
+}
+
+inline void Arena::putKey(const Raw& dictionary, std::size_t index, const Raw& text) {
+  new (&_entriesOf(dictionary)[index]._key) Reference(text.node());
+}
+
+inline void Arena::putValue(const Raw& dictionary, std::size_t index, const Raw& value) {
+  new (&_entriesOf(dictionary)[index]._value) Value(value.kind, value.bits, value.isNegative);
+}
+
+inline const Text& Arena::keyAt(const Raw& dictionary, std::size_t index) {
+  return _keyOf(_entriesOf(dictionary)[index]).text;
+}
+
+inline std::size_t Arena::sizeOf(const Raw& dictionary) {
+  return dictionary.bits != 0 ? static_cast<Dictionary::Node*>(dictionary.node())->size : 0;
+}
+
+inline std::string_view Arena::textOf(const Raw& text) {
+  return static_cast<Value::TextNode*>(text.node())->text;
+}
+
+inline void Arena::noteShared(const Raw& container) {
+  if (container.bits == 0) return;
+  if (container.kind == Kind::array) static_cast<Array::Node*>(container.node())->isShared = true;
+  if (container.kind == Kind::dictionary)
+    static_cast<Dictionary::Node*>(container.node())->isShared = true;
+}
+
+template <typename IsBefore>
+void Arena::sort(const Raw& dictionary, const IsBefore& isBefore) {
+  auto& node = static_cast<Dictionary::Node&>(*dictionary.node());
+  Dictionary::Entry* const first = _entriesOf(dictionary);
+  std::stable_sort(first, first + node.size,
+                   [&](const Dictionary::Entry& a, const Dictionary::Entry& b) {
+                     return isBefore(_keyOf(a), _keyOf(b));
+                   });
+  std::size_t kept = 0;
+  for (std::size_t i = 0; i < node.size; ++i) {
+    const bool comesAgain = i + 1 < node.size && !isBefore(_keyOf(first[i]), _keyOf(first[i + 1]));
+    if (comesAgain) continue;
+    if (kept != i)
+      std::memcpy(static_cast<void*>(first + kept), static_cast<const void*>(first + i),
+                  sizeof *first);
+    ++kept;
+  }
+  node.size = kept;
+}
+
+}  // namespace propertylist
