@@ -72,6 +72,8 @@ void ASSAccountsManager::_initWithAccountsInfo(const std::optional<Array>& accou
   mayListOneTwice_ = runtimeFixers_.size() > 1;
   if (accounts) {
     bool fixedAny = false;
+    orderedTopLevelAccounts_->reserve(accounts->size());
+    topLevelAccountsByID_.reserve(accounts->size());
     for (const Value& info : *accounts) _loadAccount(info, fixedAny);
     if (fixedAny) {
       for (const RuntimeFixerPtr& fixer : runtimeFixers_) fixer->accountsHaveBeenSaved(false);
@@ -136,6 +138,7 @@ void ASSAccountsManager::_registerChild(std::string_view identifier, const Accou
 
 void ASSAccountsManager::_removeChildrenForAccountWithIdentifier(
     std::optional<std::string_view> identifier) {
+  if (childIDsByParentID_.empty()) return;
   const StringList* const children = identifier ? childIDsByParentID_.find(*identifier) : nullptr;
   if (children == nullptr) return;
   for (const std::string& child : *children) {
@@ -149,6 +152,7 @@ void ASSAccountsManager::_removeChildrenForAccountWithIdentifier(
 
 void ASSAccountsManager::_setOriginalAccountDictionaries() {
   originalAccountsByID_.clear();
+  originalAccountsByID_.reserve(orderedTopLevelAccounts_->size());
   for (const AccountPtr& account : *orderedTopLevelAccounts_) {
     if (const std::optional<propertylist::Text> identifier = account->identifier())
       originalAccountsByID_.set(*identifier, account->propertiesToSave());

@@ -235,6 +235,13 @@ class ASSBasicAccount : public platform::Describable,
 
  private:
   std::optional<propertylist::Text> _textForKey(std::string_view key) const;
+  // The lists of dataclasses as views of the catalogue and of properties of this record and of its
+  // parents.
+  static std::optional<NameList> _namesSupportedForAccountType(std::string_view type);
+  static NameList _orderedNames(const NameList& names);
+  NameList _supportedNames() const;
+  NameList _provisionedNames() const;
+  std::optional<NameList> _enabledNames() const;
   static bool _flagOfDataclass(std::string_view dataclass, std::string_view flag);
 
   AccountPtr parentAccount_;

@@ -124,6 +124,12 @@ const StringList& ASSBasicAccount::allSupportedDataclasses() {
   return dataclasses;
 }
 
+std::optional<NameList> ASSBasicAccount::_namesSupportedForAccountType(std::string_view type) {
+  const Dictionary* entry = entryOfType(type);
+  return entry != nullptr ? namesOfArray(entry->find(kPropertiesSupportedDataclasses))
+                          : std::nullopt;
+}
+
 std::optional<StringList> ASSBasicAccount::supportedDataclassesForAccountType(
     std::string_view type) {
   return listOfType(type, kPropertiesSupportedDataclasses);

@@ -17,44 +17,49 @@ namespace {
 // for lists of any length, which a file may hold, a walk for each string would take too long.
 class Members {
  public:
-  explicit Members(const StringList& strings) : _strings(strings) {
+  explicit Members(const NameList& names) : _names(names) {
     constexpr std::size_t kHandful = 16;
-    if (strings.size() > kHandful) _many.insert(strings.begin(), strings.end());
+    if (names.size() > kHandful) _many.insert(names.begin(), names.end());
   }
   bool contain(std::string_view wanted) const {
-    return _many.empty() ? contains(_strings, wanted) : _many.contains(wanted);
+    return _many.empty() ? contains(_names, wanted) : _many.contains(wanted);
   }
 
  private:
-  const StringList& _strings;
+  const NameList& _names;
   std::set<std::string_view> _many;
 };
 
 // The members of `dataclasses` that are (not) among `others`, in order.
-StringList filtered(const StringList& dataclasses, const StringList& others,
-                    bool keepThoseInOthers) {
+NameList filtered(const NameList& dataclasses, const NameList& others, bool keepThoseInOthers) {
   const Members members(others);
-  StringList kept;
+  NameList kept;
   kept.reserve(dataclasses.size());
-  for (const std::string& dataclass : dataclasses) {
+  for (const std::string_view dataclass : dataclasses) {
     if (members.contain(dataclass) == keepThoseInOthers) kept.push_back(dataclass);
   }
   return kept;
 }
 
+NameList namesOf(const StringList& strings) { return {strings.begin(), strings.end()}; }
+
 }  // namespace
 
-StringList ASSBasicAccount::_orderedDataclasses(const StringList& dataclasses) {
+NameList ASSBasicAccount::_orderedNames(const NameList& names) {
   const StringList& known = allSupportedDataclasses();
-  StringList ordered;
-  ordered.reserve(dataclasses.size());
+  NameList ordered;
+  ordered.reserve(names.size());
   for (const std::string& dataclass : known) {
-    if (contains(dataclasses, dataclass)) ordered.push_back(dataclass);
+    if (contains(names, dataclass)) ordered.push_back(dataclass);
   }
-  for (const std::string& dataclass : dataclasses) {
+  for (const std::string_view dataclass : names) {
     if (!contains(known, dataclass)) ordered.push_back(dataclass);
   }
   return ordered;
+}
+
+StringList ASSBasicAccount::_orderedDataclasses(const StringList& dataclasses) {
+  return copiesOf(_orderedNames(namesOf(dataclasses)));
 }
 
 StringList ASSBasicAccount::_profileRestrictedDataclasses() {
@@ -81,37 +86,48 @@ StringList ASSBasicAccount::_profileRestrictedDataclasses() {
   return restricted;
 }
 
-StringList ASSBasicAccount::supportedDataclasses() const {
-  return _orderedDataclasses(
-      supportedDataclassesForAccountType(type().value_or("")).value_or(StringList()));
+NameList ASSBasicAccount::_supportedNames() const {
+  return _orderedNames(_namesSupportedForAccountType(type().value_or("")).value_or(NameList()));
 }
 
+NameList ASSBasicAccount::_provisionedNames() const {
+  const NameList supported = _supportedNames();
+  const std::optional<NameList> granted =
+      namesOfArray(accountPropertyForKey(kAccountProvisionedDataclasses));
+  const NameList within = granted ? filtered(*granted, supported, true) : supported;
+  const StringList restricted = _profileRestrictedDataclasses();
+  return _orderedNames(filtered(within, namesOf(restricted), false));
+}
+
+std::optional<NameList> ASSBasicAccount::_enabledNames() const {
+  if (parentAccount_) {
+    std::optional<NameList> ofParent = parentAccount_->_enabledNames();
+    if (ofParent && !ofParent->empty()) return ofParent;
+  }
+  const std::optional<NameList> stored =
+      namesOfArray(accountPropertyForKey(kAccountEnabledDataclasses));
+  if (!stored) return std::nullopt;
+  return _orderedNames(filtered(*stored, _provisionedNames(), true));
+}
+
+StringList ASSBasicAccount::supportedDataclasses() const { return copiesOf(_supportedNames()); }
+
 StringList ASSBasicAccount::provisionedDataclasses() const {
-  const StringList supported = supportedDataclasses();
-  const std::optional<StringList> granted =
-      stringsOfArray(accountPropertyForKey(kAccountProvisionedDataclasses));
-  const StringList within = granted ? filtered(*granted, supported, true) : supported;
-  return _orderedDataclasses(filtered(within, _profileRestrictedDataclasses(), false));
+  return copiesOf(_provisionedNames());
 }
 
 std::optional<StringList> ASSBasicAccount::enabledDataclasses() const {
-  if (parentAccount_) {
-    std::optional<StringList> ofParent = parentAccount_->enabledDataclasses();
-    if (ofParent && !ofParent->empty()) return ofParent;
-  }
-  const std::optional<StringList> stored =
-      stringsOfArray(accountPropertyForKey(kAccountEnabledDataclasses));
-  if (!stored) return std::nullopt;
-  return _orderedDataclasses(filtered(*stored, provisionedDataclasses(), true));
+  const std::optional<NameList> names = _enabledNames();
+  return names ? std::optional(copiesOf(*names)) : std::nullopt;
 }
 
 bool ASSBasicAccount::isEnabledForDataclass(std::string_view dataclass) const {
-  const std::optional<StringList> enabled = enabledDataclasses();
+  const std::optional<NameList> enabled = _enabledNames();
   return enabled && contains(*enabled, dataclass);
 }
 
 void ASSBasicAccount::setEnabledForDataclass(bool enabled, std::string_view dataclass) {
-  if (contains(supportedDataclasses(), dataclass))
+  if (contains(_supportedNames(), dataclass))
     _forcedSetEnabledForDataclass(enabled, dataclass);
 }
 

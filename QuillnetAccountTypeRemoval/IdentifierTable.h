@@ -2,6 +2,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <new>
 #include <string>
 #include <string_view>
 #include <utility>
@@ -39,25 +40,30 @@ class IdentifierTable {
   // Does nothing when there is nothing under the identifier. Never throws.
   void remove(std::string_view identifier);
   void clear() { *this = IdentifierTable(); }
+  // Makes room for so many more.
+  void reserve(std::size_t more);
 
   // Pairs of identifier and value.
   Iterator begin() const { return Iterator(*this, 0); }
   Iterator end() const { return Iterator(*this, _entries.size()); }
 
  private:
+  // Where the identifier lies in _identifiers, in two numbers of half the usual size, and what is
+  // under it.
   struct Entry {
-    std::size_t begin = 0;  // in _identifiers
-    std::size_t size = 0;
-    bool isThere = true;
+    std::uint32_t begin = 0;
+    std::uint32_t size = 0;
     T value = T();
+    bool isThere() const { return size != kRemoved; }
   };
+  static constexpr std::uint32_t kRemoved = ~std::uint32_t{0};
   std::string_view _identifierOf(const Entry& entry) const {
-    return std::string_view(_identifiers).substr(entry.begin, entry.size);
+    return {_identifiers.data() + entry.begin, entry.size};
   }
   std::size_t _indexOf(std::uint64_t hash, std::string_view identifier) const {
     return _indexes.find(hash, [&](std::size_t index) {
       const Entry& entry = _entries[index];
-      return entry.isThere && _identifierOf(entry) == identifier;
+      return entry.isThere() && _identifierOf(entry) == identifier;
     });
   }
   void _forgetRemoved();
@@ -87,7 +93,7 @@ class IdentifierTable<T>::Iterator {
 
  private:
   void _passRemoved() {
-    while (_index < _table->_entries.size() && !_table->_entries[_index].isThere) ++_index;
+    while (_index < _table->_entries.size() && !_table->_entries[_index].isThere()) ++_index;
   }
   const IdentifierTable* _table;
   std::size_t _index;
@@ -99,18 +105,28 @@ T& IdentifierTable<T>::operator[](std::string_view identifier) {
   const std::size_t known = _indexOf(hash, identifier);
   if (known != propertylist::TextTable::kNone) return _entries[known].value;
   if (_removed > _entries.size() / 2) _forgetRemoved();
-  _indexes.makeRoomForOne();
+  if (identifier.size() >= kRemoved - _identifiers.size()) throw std::bad_alloc();
+  _indexes.makeRoomFor(1);
   _identifiers += identifier;
-  _entries.push_back({_identifiers.size() - identifier.size(), identifier.size()});
+  _entries.push_back({static_cast<std::uint32_t>(_identifiers.size() - identifier.size()),
+                      static_cast<std::uint32_t>(identifier.size())});
   _indexes.add(hash, _entries.size() - 1);
   return _entries.back().value;
+}
+
+template <typename T>
+void IdentifierTable<T>::reserve(std::size_t more) {
+  constexpr std::size_t kUsualSize = 36;  // of a UUID
+  _entries.reserve(_entries.size() + more);
+  _identifiers.reserve(_identifiers.size() + more * kUsualSize);
+  _indexes.makeRoomFor(more);
 }
 
 template <typename T>
 void IdentifierTable<T>::remove(std::string_view identifier) {
   const std::size_t index = _indexOf(propertylist::TextTable::hashOf(identifier), identifier);
   if (index == propertylist::TextTable::kNone) return;
-  _entries[index].isThere = false;
+  _entries[index].size = kRemoved;
   _entries[index].value = T();
   ++_removed;
 }
@@ -119,7 +135,7 @@ template <typename T>
 void IdentifierTable<T>::_forgetRemoved() {
   IdentifierTable kept;
   for (const Entry& entry : _entries) {
-    if (entry.isThere) kept.set(_identifierOf(entry), entry.value);
+    if (entry.isThere()) kept.set(_identifierOf(entry), entry.value);
   }
   *this = std::move(kept);
 }

@@ -1,6 +1,8 @@
 #include "propertylist/TextTable.h"
 
+#include <algorithm>
 #include <array>
+#include <bit>
 #include <cstring>
 #include <random>
 
@@ -61,21 +63,20 @@ std::uint64_t TextTable::hashOf(std::string_view text) {
 }
 
 void TextTable::add(std::uint64_t hash, std::size_t index) {
-  makeRoomForOne();
+  makeRoomFor(1);
   std::size_t at = hash & _mask;
   while (_slots[at].indexAndOne != 0) at = (at + 1) & _mask;
-  _slots[at] = {static_cast<std::uint32_t>(hash >> 32U), static_cast<std::uint32_t>(index + 1),
-                static_cast<std::uint32_t>(hash)};
+  _slots[at] = {static_cast<std::uint32_t>(hash), static_cast<std::uint32_t>(index + 1)};
   ++_count;
 }
 
-void TextTable::_grow() {
+void TextTable::_grow(std::size_t least) {
   constexpr std::size_t kFirstSize = 64;
-  std::vector<Slot> slots(_slots.empty() ? kFirstSize : _slots.size() * 2);
+  std::vector<Slot> slots(std::max(kFirstSize, std::bit_ceil(least)));
   _mask = slots.size() - 1;
   for (const Slot& slot : _slots) {
     if (slot.indexAndOne == 0) continue;
-    std::size_t at = slot.place & _mask;
+    std::size_t at = slot.hash & _mask;
     while (slots[at].indexAndOne != 0) at = (at + 1) & _mask;
     slots[at] = slot;
   }

@@ -27,24 +27,27 @@ class PROPERTYLIST_EXPORT TextTable {
     for (std::size_t at = hash & _mask;; at = (at + 1) & _mask) {
       const Slot& slot = _slots[at];
       if (slot.indexAndOne == 0) return kNone;
-      if (slot.hash == static_cast<std::uint32_t>(hash >> 32U) && isSame(slot.indexAndOne - 1))
+      if (slot.hash == static_cast<std::uint32_t>(hash) && isSame(slot.indexAndOne - 1))
         return slot.indexAndOne - 1;
     }
   }
+  // Has the memory that a find with this hash looks at come nearer meanwhile.
+  void prefetch(std::uint64_t hash) const {
+    if (!_slots.empty()) __builtin_prefetch(&_slots[hash & _mask]);
+  }
   // Adds what find did not find. `index` is less than 2^32 - 1.
   void add(std::uint64_t hash, std::size_t index);
-  // After this the next add does not fail.
-  void makeRoomForOne() {
-    if (2 * (_count + 1) > _slots.size()) _grow();
+  // After this so many more can be added, and nothing fails.
+  void makeRoomFor(std::size_t more) {
+    if (2 * (_count + more) > _slots.size()) _grow(2 * (_count + more));
   }
 
  private:
   struct Slot {
-    std::uint32_t hash = 0;  // the upper half
+    std::uint32_t hash = 0;  // the lower half, which is a place in a table of any size too
     std::uint32_t indexAndOne = 0;
-    std::uint32_t place = 0;  // the lower half
   };
-  void _grow();
+  void _grow(std::size_t least);
   std::vector<Slot> _slots;  // a power of two, at most half full
   std::size_t _mask = 0;
   std::size_t _count = 0;

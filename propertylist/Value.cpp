@@ -187,9 +187,13 @@ const Dictionary::Entry* Dictionary::_lowerBound(std::string_view key) const {
 const Value* Dictionary::find(std::string_view key) const {
   constexpr std::size_t kFew = 32;
   if (size() <= kFew) {
-    const Entry* const found =
-        std::find_if(begin(), end(), [key](const Entry& entry) { return entry.key() == key; });
-    return found != end() ? &found->value() : nullptr;
+    const Entry* const last = end();
+    for (const Entry* entry = begin(); entry != last; ++entry) {
+      const Text& text = entry->key();
+      if (text.size() == key.size() && std::equal(text.begin(), text.end(), key.begin()))
+        return &entry->value();
+    }
+    return nullptr;
   }
   const Entry* const entry = _lowerBound(key);
   return entry != end() && entry->key() == key ? &entry->value() : nullptr;

@@ -35,6 +35,15 @@ class Merge : public ::testing::Test {
   AccountsDevice device;
 };
 
+// The same dictionary on two sides shares its storage, which the merge looks at first.
+TEST_F(Merge, TakesTheOtherSideWhereOneIsTheOriginalItself) {
+  const Dictionary original{{"a", 1}, {"b", 2}};
+  const Dictionary other{{"a", 3}, {"c", 4}};
+  EXPECT_EQ(mergeOf({"", original, original, other, {}}), other);
+  EXPECT_EQ(mergeOf({"", other, original, original, {}}), other);
+  EXPECT_EQ(mergeOf({"", original, original, original, {}}), original);
+}
+
 TEST_F(Merge, KeepsEachSidesOwnChangesAndPrefersMemoryWhereBothChanged) {
   expectMerges({
       {"changed on one side each, new on one side each",

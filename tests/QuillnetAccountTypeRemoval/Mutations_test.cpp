@@ -127,6 +127,33 @@ TEST_F(Mutations, DeleteTakesEveryPlaceOfTheObjectItFound) {
   EXPECT_EQ(identifiersOf(*twice->allBasicAccounts()), (Lines{"y"}));
 }
 
+TEST_F(Mutations, DeleteTakesEveryPlaceOfAnObjectThatWasInsertedTwice) {
+  const AccountPtr object = record(accountInfo("x"));
+  store->insertAccount(object);
+  object->setAccountPropertyForKey("y", "Identifier");
+  store->insertAccount(object);
+  EXPECT_EQ(order(), (Lines{"a", "b", "c", "y", "y"}));
+  store->deleteAccount(object);
+  EXPECT_EQ(order(), (Lines{"a", "b", "c"}));
+}
+
+TEST_F(Mutations, DeleteTakesEveryPlaceOfAnObjectThatReplacedTwoOthers) {
+  const AccountPtr object = record(accountInfo("x"));
+  store->replaceAccountWithAccount(at(0), object);
+  store->replaceAccountWithAccount(at(2), object);
+  EXPECT_EQ(order(), (Lines{"x", "b", "x"}));
+  store->deleteAccount(object);
+  EXPECT_EQ(order(), Lines{"b"});
+}
+
+TEST_F(Mutations, DeleteTakesEveryPlaceOfAnObjectThatReplacedATypeTwice) {
+  const AccountPtr object = record(accountInfo("x"));
+  store->replaceAccountsWithTypesWithAccounts({"CalDAV"}, {object, object});
+  EXPECT_EQ(order(), (Lines{"x", "x"}));
+  store->deleteAccount(object);
+  EXPECT_EQ(order(), Lines());
+}
+
 TEST_F(Mutations, DeleteOfAnUnknownAccountLeavesTheOrder) {
   store->deleteAccount(record(accountInfo("nobody")));
   EXPECT_EQ(order(), (Lines{"a", "b", "c"}));

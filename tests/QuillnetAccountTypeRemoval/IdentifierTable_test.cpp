@@ -1,0 +1,90 @@
+#include "QuillnetAccountTypeRemoval/IdentifierTable.h"
+
+#include <gtest/gtest.h>
+
+#include <string>
+#include <vector>
+
+namespace accountsettings {
+namespace {
+
+using Table = IdentifierTable<int>;
+
+std::vector<std::string> entriesOf(const Table& table) {
+  std::vector<std::string> entries;
+  for (const auto& [identifier, value] : table)
+    entries.push_back(std::string(identifier) + "=" + std::to_string(value));
+  return entries;
+}
+
+using Entries = std::vector<std::string>;
+
+TEST(IdentifierTable, HasNothingAtFirst) {
+  const Table table;
+  EXPECT_TRUE(table.empty());
+  EXPECT_EQ(table.find("a"), nullptr);
+  EXPECT_EQ(table.find(""), nullptr);
+  EXPECT_EQ(entriesOf(table), Entries());
+}
+
+TEST(IdentifierTable, AnswersWhatWasPutUnderAnIdentifier) {
+  Table table;
+  table.set("b", 2);
+  table.set("a", 1);
+  table.set("", 3);
+  table.set(std::string_view("a\0b", 3), 4);
+  EXPECT_EQ(table.size(), 4U);
+  EXPECT_EQ(table.at("b"), 2);
+  EXPECT_EQ(table.at("a"), 1);
+  EXPECT_EQ(table.at(""), 3);
+  EXPECT_EQ(table.at(std::string_view("a\0b", 3)), 4);
+  EXPECT_FALSE(table.contains("ab"));
+}
+
+TEST(IdentifierTable, IsVisitedInTheOrderInWhichTheIdentifiersCame) {
+  Table table;
+  table.set("b", 1);
+  table.set("a", 2);
+  table.set("b", 3);
+  EXPECT_EQ(entriesOf(table), (Entries{"b=3", "a=2"}));
+}
+
+TEST(IdentifierTable, ForgetsWhatIsRemovedAndHasItLastWhenItComesAgain) {
+  Table table;
+  table.set("a", 1);
+  table.set("b", 2);
+  table.remove("a");
+  table.remove("a");
+  table.remove("nobody");
+  EXPECT_EQ(table.size(), 1U);
+  EXPECT_EQ(table.find("a"), nullptr);
+  EXPECT_EQ(entriesOf(table), Entries{"b=2"});
+  table.set("a", 3);
+  EXPECT_EQ(entriesOf(table), (Entries{"b=2", "a=3"}));
+}
+
+TEST(IdentifierTable, KeepsTheOthersHoweverOftenOneGoesAndComes) {
+  Table table;
+  for (int i = 0; i < 100; ++i) table.set("kept " + std::to_string(i), i);
+  for (int i = 0; i < 10'000; ++i) {
+    table.set("passing", i);
+    table.remove("passing");
+  }
+  ASSERT_EQ(table.size(), 100U);
+  for (int i = 0; i < 100; ++i) EXPECT_EQ(table.at("kept " + std::to_string(i)), i);
+  EXPECT_EQ(entriesOf(table).front(), "kept 0=0");
+}
+
+TEST(IdentifierTable, KeepsWhatItHasWhenRoomIsMade) {
+  Table table;
+  table.set("a", 1);
+  table.reserve(1000);
+  table.set("b", 2);
+  EXPECT_EQ(entriesOf(table), (Entries{"a=1", "b=2"}));
+  table.clear();
+  EXPECT_TRUE(table.empty());
+  EXPECT_EQ(table.find("a"), nullptr);
+}
+
+}  // namespace
+}  // namespace accountsettings
