@@ -199,11 +199,22 @@ void BinaryReader::_sortDictionary(const Step& step) {
     return;
   }
   for (std::size_t i = 1; i < count; ++i) {
-    if (Arena::keyAt(step.container, i - 1) >= Arena::keyAt(step.container, i)) {
+    if (!_areAscending(Arena::keyAt(step.container, i - 1), Arena::keyAt(step.container, i))) {
       Arena::sort(step.container, [](const auto& a, const auto& b) { return a.text < b.text; });
       return;
     }
   }
+}
+
+// Most keys follow the same ones in dictionary after dictionary.
+bool BinaryReader::_areAscending(const Text& a, const Text& b) {
+  const auto addresses =
+      reinterpret_cast<std::uintptr_t>(&a) >> 4U ^ reinterpret_cast<std::uintptr_t>(&b) >> 6U;
+  auto& known = _ascending[addresses % kPairs];
+  if (known.first == &a && known.second == &b) return true;
+  if (a >= b) return false;
+  known = {&a, &b};
+  return true;
 }
 
 // Sorts what waits for it by the places of the texts among all long keys: sorting each dictionary
@@ -300,7 +311,7 @@ std::optional<std::uint64_t> BinaryReader::_sizeOf(const Header& header) const {
 
 bool BinaryReader::_checkLeaf(const Header& header) {
   if (header.marker == (kInteger | 4U)) return _checkInteger(header);
-  if (header.marker == kUTF16) return _checkUTF16(header);
+  if (header.marker == kUTF16) return _decodeUTF16(header);
   if (header.marker == kASCII) {
     const std::string_view text(reinterpret_cast<const char*>(_bytes.data()) + header.contents,
                                 static_cast<std::size_t>(header.count));
@@ -322,16 +333,30 @@ bool BinaryReader::_checkInteger(const Header& header) {
   return high == 0 || isNegative || _fail(header.at, "an integer of more than 64 bits");
 }
 
-bool BinaryReader::_checkUTF16(const Header& header) {
-  bool afterHigh = false;
-  for (std::uint64_t i = 0; i < header.count; ++i) {
-    const std::size_t at = header.contents + static_cast<std::size_t>(i) * 2;
-    const std::uint64_t unit = _number(at, 2);
+// Puts the text into _wide, in UTF-8.
+bool BinaryReader::_decodeUTF16(const Header& header) {
+  constexpr std::size_t kMostForAUnit = 3;
+  const auto count = static_cast<std::size_t>(header.count);
+  if (_wide.size() < count * kMostForAUnit) _wide.resize(count * kMostForAUnit);
+  char* next = _wide.data();
+  char32_t high = 0;  // the first half of a pair, whose second half has to follow
+  for (std::size_t i = 0; i < count; ++i) {
+    const std::size_t at = header.contents + i * 2;
+    const auto unit = static_cast<char32_t>(_number(at, 2));
     const bool isLow = unit >= 0xDC00 && unit <= 0xDFFF;
-    if (isLow != afterHigh) return _fail(at, "half of a surrogate pair");
-    afterHigh = unit >= 0xD800 && unit <= 0xDBFF;
+    if (isLow != (high != 0)) return _fail(at, "half of a surrogate pair");
+    if (isLow) {
+      next = putUTF8(next, 0x10000 + ((high - 0xD800) << 10U) + (unit - 0xDC00));
+      high = 0;
+    } else if (unit >= 0xD800 && unit <= 0xDBFF) {
+      high = unit;
+    } else {
+      next = putUTF8(next, unit);
+    }
   }
-  return !afterHigh || _fail(header.at, "half of a surrogate pair");
+  if (high != 0) return _fail(header.at, "half of a surrogate pair");
+  _wideSize = static_cast<std::size_t>(next - _wide.data());
+  return true;
 }
 
 // Small things

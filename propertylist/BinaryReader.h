@@ -1,5 +1,6 @@
 #pragma once
 
+#include <array>
 #include <cstddef>
 #include <cstdint>
 #include <optional>
@@ -60,6 +61,8 @@ class BinaryReader {
     bool hasLongKey = false;
   };
 
+  static constexpr std::size_t kPairs = 256;  // a power of two
+
   bool _readTrailer();
   bool _scan();
   bool _followKey(Step& step);
@@ -70,6 +73,7 @@ class BinaryReader {
   void _put(const Step& container, const Object& member);
   bool _close();
   void _sortDictionary(const Step& step);
+  bool _areAscending(const Text& a, const Text& b);
   void _sortLongKeys();
 
   bool _readHeader(std::size_t at, Header& header);
@@ -77,11 +81,10 @@ class BinaryReader {
   std::optional<std::uint64_t> _sizeOf(const Header& header) const;
   bool _checkLeaf(const Header& header);
   bool _checkInteger(const Header& header);
-  bool _checkUTF16(const Header& header);
+  bool _decodeUTF16(const Header& header);
 
   Arena::Raw _make(const Header& header);
   Arena::Raw _integer(const Header& header) const;
-  Arena::Raw _wideText(const Header& header);
 
   std::uint64_t _number(std::size_t at, std::size_t size) const {
     return bigEndianNumber(_bytes.data() + at, size);
@@ -100,6 +103,10 @@ class BinaryReader {
   std::vector<Object> _objects;  // by number
   std::vector<Step> _way;
   std::vector<Arena::Raw> _withLongKeys;  // dictionaries that are not sorted yet
+  // Pairs of keys that are in ascending order, at places that follow from their addresses.
+  std::array<std::pair<const Text*, const Text*>, kPairs> _ascending;
+  std::string _wide;  // the text that was decoded last, and room behind it
+  std::size_t _wideSize = 0;
   ReadError _error;
 };
 

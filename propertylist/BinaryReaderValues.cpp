@@ -4,7 +4,6 @@
 
 #include "propertylist/BinaryForm.h"
 #include "propertylist/BinaryReader.h"
-#include "propertylist/UTF8.h"
 
 namespace propertylist {
 
@@ -33,7 +32,7 @@ Arena::Raw BinaryReader::_make(const Header& header) {
       return _arena->newText(
           std::string_view(reinterpret_cast<const char*>(contents.data()), count));
     case kUTF16:
-      return _wideText(header);
+      return _arena->newText(std::string_view(_wide).substr(0, _wideSize));  // by _checkLeaf
     default:
       return _integer(header);
   }
@@ -47,29 +46,6 @@ Arena::Raw BinaryReader::_integer(const Header& header) const {
   const std::uint64_t low = _number(header.contents + (isWide ? 8 : 0), 8);
   const bool isNegative = isWide ? _number(header.contents, 8) != 0 : low >> 63U == 1;
   return Arena::scalar(Kind::integer, low, isNegative);
-}
-
-// The UTF-16 was checked. A first walk finds how many bytes of UTF-8 it takes.
-Arena::Raw BinaryReader::_wideText(const Header& header) {
-  const auto count = static_cast<std::size_t>(header.count);
-  const auto unitAt = [&](std::size_t i) {
-    return static_cast<char32_t>(_number(header.contents + i * 2, 2));
-  };
-  std::size_t size = 0;
-  for (std::size_t i = 0; i < count; ++i) {
-    const char32_t unit = unitAt(i);
-    const bool isHalf = unit >= 0xD800 && unit <= 0xDFFF;  // two of which take four bytes
-    size += unit < 0x80 ? 1 : unit < 0x800 || isHalf ? 2 : 3;
-  }
-  const Arena::NewText made = _arena->newText(size);
-  char* next = made.characters;
-  for (std::size_t i = 0; i < count; ++i) {
-    char32_t unit = unitAt(i);
-    if (unit >= 0xD800 && unit <= 0xDBFF)  // the other half follows
-      unit = 0x10000 + ((unit - 0xD800) << 10U) + (unitAt(++i) - 0xDC00);
-    next = putUTF8(next, unit);
-  }
-  return made.value;
 }
 
 }  // namespace propertylist

@@ -1,6 +1,7 @@
 #include "propertylist/BinaryWriter.h"
 
 #include <algorithm>
+#include <array>
 #include <bit>
 #include <cmath>
 #include <cstring>
@@ -34,6 +35,30 @@ std::string_view viewOf(const Bytes& data) {
   return {reinterpret_cast<const char*>(data.data()), data.size()};
 }
 
+bool isScalar(Kind kind) {
+  return kind == Kind::integer || kind == Kind::real || kind == Kind::boolean || kind == Kind::date;
+}
+
+// Of the kind and the number that the scalar holds.
+std::uint64_t hashOfScalar(const Value& value) {
+  std::uint64_t bits = 0;
+  bool isNegative = false;
+  if (value.kind() == Kind::real) {
+    bits = std::bit_cast<std::uint64_t>(*value.asReal());
+  } else if (value.kind() == Kind::date) {
+    bits = std::bit_cast<std::uint64_t>(value.asDate()->secondsSince2001);
+  } else if (value.kind() == Kind::boolean) {
+    bits = *value.asBoolean() ? 1 : 0;
+  } else if (const auto positive = value.asUnsigned()) {
+    bits = *positive;
+  } else {
+    bits = static_cast<std::uint64_t>(*value.asInteger());
+    isNegative = true;  // tells it from a large one
+  }
+  return TextTable::hashOf(bits,
+                           static_cast<std::uint64_t>(value.kind()) * 2 + (isNegative ? 1 : 0));
+}
+
 std::size_t sizeOf(const Value& container) {
   const Array* const array = container.asArray();
   return array != nullptr ? array->size() : container.asDictionary()->size();
@@ -54,8 +79,7 @@ std::optional<Bytes> BinaryWriter::write() {
   _offsets.reserve(_objects.size());
   for (const Object& object : _objects) {
     _offsets.push_back(_end);
-    _put(object);
-    if (_end > kMaximumFileSize) return std::nullopt;
+    if (!_put(object) || _end > kMaximumFileSize) return std::nullopt;
   }
   _putOffsetsAndTrailer();
   if (_end > kMaximumFileSize) return std::nullopt;
@@ -81,64 +105,93 @@ bool BinaryWriter::_numberMembers(std::size_t container) {
   const Value& value = *_objects[container].value;
   const std::uint32_t depth = _objects[container].depth;
   _objects[container].firstReference = static_cast<std::uint32_t>(_references.size());
-  if (const Array* const array = value.asArray()) {
-    return std::all_of(array->begin(), array->end(),
-                       [&](const Value& member) { return _refer(_numberOf(member, depth + 1)); });
-  }
+  if (const Array* const array = value.asArray())
+    return _referToValues(
+        *array, depth + 1, [](const Value& member) -> auto& { return member; });
   const Dictionary& dictionary = *value.asDictionary();
-  for (const Dictionary::Entry& entry : dictionary) {
-    if (!_refer(_numberOfText(entry.key()))) return false;
-  }
-  return std::all_of(dictionary.begin(), dictionary.end(), [&](const Dictionary::Entry& entry) {
-    return _refer(_numberOf(entry.value(), depth + 1));
-  });
+  for (const Dictionary::Entry& entry : dictionary)
+    _references.push_back(_numberOfText(entry.key()));
+  return _referToValues(
+      dictionary, depth + 1, [](const Dictionary::Entry& entry) -> auto& { return entry.value(); });
 }
 
-bool BinaryWriter::_refer(std::optional<Number> number) {
-  if (number) _references.push_back(*number);
-  return number.has_value();
+// Hashes some values before it looks the first one up: in a large list each is somewhere else in
+// memory, and comes from there while the next ones are hashed.
+template <typename Members, typename ValueOf>
+bool BinaryWriter::_referToValues(const Members& members, std::uint32_t depth,
+                                  const ValueOf& valueOf) {
+  constexpr std::ptrdiff_t kAhead = 16;
+  std::array<std::optional<std::uint64_t>, kAhead> hashes;
+  for (auto from = members.begin(); from != members.end();) {
+    const auto to = from + std::min(kAhead, members.end() - from);
+    std::transform(from, to, hashes.begin(),
+                   [&](const auto& member) { return _hashAhead(valueOf(member)); });
+    for (auto hash = hashes.begin(); from != to; ++from, ++hash) {
+      const std::optional<Number> number = _numberOf(valueOf(*from), depth, *hash);
+      if (!number) return false;
+      _references.push_back(*number);
+    }
+  }
+  return true;
+}
+
+// The hash of a text or scalar that has to be looked up by its content.
+std::optional<std::uint64_t> BinaryWriter::_hashAhead(const Value& value) {
+  if (const Text* const text = value.asString()) {
+    if (text->size() > kShort || _recentAt(*text).text == text) return std::nullopt;
+    const std::uint64_t hash = TextTable::hashOf(*text);
+    _texts.prefetch(hash);
+    return hash;
+  }
+  if (!isScalar(value.kind())) return std::nullopt;
+  const std::uint64_t hash = hashOfScalar(value);
+  _scalars.prefetch(hash);
+  return hash;
 }
 
 // The number of `value`, which is a new one for a container. `depth` counts `value` if it is one.
-std::optional<BinaryWriter::Number> BinaryWriter::_numberOf(const Value& value,
-                                                            std::uint32_t depth) {
+std::optional<BinaryWriter::Number> BinaryWriter::_numberOf(const Value& value, std::uint32_t depth,
+                                                            std::optional<std::uint64_t> hash) {
   switch (value.kind()) {
     case Kind::dictionary:
     case Kind::array:
       if (depth > kMaximumDepth) return std::nullopt;
       return _add({&value, nullptr, 0, depth});
     case Kind::string:
-      return _numberOfText(*value.asString());
+      return _numberOfText(*value.asString(), hash);
     case Kind::data:
       return _numberOfData(*value.asData(), value);
     default:
-      return _numberOfScalar(value);
+      return _numberOfScalar(value, hash);
   }
 }
 
-// A text that stands where one stood before is the same, and is not looked at: most keys, and much
-// of what accounts have in common.
-std::optional<BinaryWriter::Number> BinaryWriter::_numberOfText(const Text& text) {
+// Where a text is remembered that stands at the same place: it is the same, and is not looked at.
+// So are most keys, and much of what accounts have in common.
+BinaryWriter::Recent& BinaryWriter::_recentAt(const Text& text) {
   const auto address = reinterpret_cast<std::uintptr_t>(&text);
-  Recent& recent = _recent[(address >> 4U ^ address >> 14U) & (kRecent - 1)];
-  if (recent.text == &text) return recent.number;
-  const std::optional<Number> number = _numberOfNewText(text);
-  if (number) recent = {&text, *number};
-  return number;
+  return _recent[(address >> 4U ^ address >> 14U) & (kRecent - 1)];
 }
 
-std::optional<BinaryWriter::Number> BinaryWriter::_numberOfNewText(const Text& text) {
+BinaryWriter::Number BinaryWriter::_numberOfText(const Text& text,
+                                                 std::optional<std::uint64_t> hash) {
+  Recent& recent = _recentAt(text);
+  if (recent.text != &text) recent = {&text, _numberOfNewText(text, hash)};
+  return recent.number;
+}
+
+BinaryWriter::Number BinaryWriter::_numberOfNewText(const Text& text,
+                                                    std::optional<std::uint64_t> hash) {
   if (text.size() > kShort) {
     const auto known = _byAddress.find(&text);
     if (known != _byAddress.end()) return known->second;
   }
-  const std::uint64_t hash = TextTable::hashOf(text);
+  if (!hash) hash = TextTable::hashOf(text);
   std::size_t known =
-      _texts.find(hash, [&](std::size_t number) { return *_objects[number].text == text; });
+      _texts.find(*hash, [&](std::size_t number) { return *_objects[number].text == text; });
   if (known == TextTable::kNone) {
-    if (findInvalidUTF8(text)) return std::nullopt;
     known = _add({nullptr, &text});
-    _texts.add(hash, known);
+    _texts.add(*hash, known);
   }
   if (text.size() > kShort) _byAddress.emplace(&text, static_cast<Number>(known));
   return static_cast<Number>(known);
@@ -160,29 +213,16 @@ BinaryWriter::Number BinaryWriter::_numberOfData(const Bytes& data, const Value&
   return static_cast<Number>(known);
 }
 
-std::optional<BinaryWriter::Number> BinaryWriter::_numberOfScalar(const Value& value) {
-  std::uint64_t bits = 0;
-  bool isNegative = false;
-  if (const auto real = value.asReal()) {
-    bits = std::bit_cast<std::uint64_t>(*real);
-  } else if (const auto date = value.asDate()) {
-    if (!std::isfinite(date->secondsSince2001)) return std::nullopt;
-    bits = std::bit_cast<std::uint64_t>(date->secondsSince2001);
-  } else if (const auto boolean = value.asBoolean()) {
-    bits = *boolean ? 1 : 0;
-  } else if (const auto positive = value.asUnsigned()) {
-    bits = *positive;
-  } else {
-    bits = static_cast<std::uint64_t>(*value.asInteger());
-    isNegative = true;  // tells it from a large one
-  }
-  const std::uint64_t hash =
-      TextTable::hashOf(bits, static_cast<std::uint64_t>(value.kind()) * 2 + (isNegative ? 1 : 0));
+std::optional<BinaryWriter::Number> BinaryWriter::_numberOfScalar(
+    const Value& value, std::optional<std::uint64_t> hash) {
+  if (const auto date = value.asDate(); date && !std::isfinite(date->secondsSince2001))
+    return std::nullopt;
+  if (!hash) hash = hashOfScalar(value);
   std::size_t known =
-      _scalars.find(hash, [&](std::size_t number) { return *_objects[number].value == value; });
+      _scalars.find(*hash, [&](std::size_t number) { return *_objects[number].value == value; });
   if (known == TextTable::kNone) {
     known = _add({&value, nullptr});
-    _scalars.add(hash, known);
+    _scalars.add(*hash, known);
   }
   return static_cast<Number>(known);
 }
@@ -194,53 +234,73 @@ BinaryWriter::Number BinaryWriter::_add(const Object& object) {
 
 // Putting
 
-void BinaryWriter::_put(const Object& object) {
+// False for a text that is not UTF-8.
+bool BinaryWriter::_put(const Object& object) {
   if (object.text != nullptr) return _putText(*object.text);
   const Value& value = *object.value;
   switch (value.kind()) {
     case Kind::dictionary:
       _putHead(kDictionary, sizeOf(value));
-      return _putReferences(object, sizeOf(value) * 2);
+      _putReferences(object, sizeOf(value) * 2);
+      break;
     case Kind::array:
       _putHead(kArray, sizeOf(value));
-      return _putReferences(object, sizeOf(value));
+      _putReferences(object, sizeOf(value));
+      break;
     case Kind::string:  // has a text
-      return;
+      break;
     case Kind::integer:
-      return _putInteger(value);
+      _putInteger(value);
+      break;
     case Kind::real:
       _putNumber(kReal | 3U, 1);
-      return _putNumber(std::bit_cast<std::uint64_t>(*value.asReal()), 8);
+      _putNumber(std::bit_cast<std::uint64_t>(*value.asReal()), 8);
+      break;
     case Kind::boolean:
-      return _putNumber(*value.asBoolean() ? kTrue : kFalse, 1);
+      _putNumber(*value.asBoolean() ? kTrue : kFalse, 1);
+      break;
     case Kind::date:
       _putNumber(kDate, 1);
-      return _putNumber(std::bit_cast<std::uint64_t>(value.asDate()->secondsSince2001), 8);
+      _putNumber(std::bit_cast<std::uint64_t>(value.asDate()->secondsSince2001), 8);
+      break;
     case Kind::data:
       _putHead(kData, value.asData()->size());
-      return _putBytes(value.asData()->data(), value.asData()->size());
+      _putBytes(value.asData()->data(), value.asData()->size());
+      break;
   }
+  return true;
 }
 
 // ASCII where that is enough, else UTF-16.
-void BinaryWriter::_putText(std::string_view text) {
-  if (isASCII(text)) {
-    _putHead(kASCII, text.size());
-    return _putBytes(text.data(), text.size());
-  }
-  std::vector<std::uint16_t> units;
-  units.reserve(text.size());
+bool BinaryWriter::_putText(std::string_view text) {
+  if (!isASCII(text)) return _putWideText(text);
+  _putHead(kASCII, text.size());
+  _putBytes(text.data(), text.size());
+  return true;
+}
+
+bool BinaryWriter::_putWideText(std::string_view text) {
+  constexpr std::size_t kUnit = 2;
+  if (_wide.size() < text.size() * kUnit) _wide.resize(text.size() * kUnit);
+  std::uint8_t* to = _wide.data();
+  const auto put = [&to](char32_t unit) {
+    *to++ = static_cast<std::uint8_t>(unit >> 8U);
+    *to++ = static_cast<std::uint8_t>(unit);
+  };
   for (std::size_t position = 0; position < text.size();) {
-    const char32_t codePoint = *decodeUTF8(text, position);
-    if (codePoint < 0x10000) {
-      units.push_back(static_cast<std::uint16_t>(codePoint));
+    const std::optional<char32_t> codePoint = decodeUTF8(text, position);
+    if (!codePoint) return false;
+    if (*codePoint < 0x10000) {
+      put(*codePoint);
     } else {
-      units.push_back(static_cast<std::uint16_t>(0xD800 + ((codePoint - 0x10000) >> 10U)));
-      units.push_back(static_cast<std::uint16_t>(0xDC00 + ((codePoint - 0x10000) & 0x3FFU)));
+      put(0xD800 + ((*codePoint - 0x10000) >> 10U));
+      put(0xDC00 + ((*codePoint - 0x10000) & 0x3FFU));
     }
   }
-  _putHead(kUTF16, units.size());
-  for (const std::uint16_t unit : units) _putNumber(unit, 2);
+  const auto size = static_cast<std::size_t>(to - _wide.data());
+  _putHead(kUTF16, size / kUnit);
+  _putBytes(_wide.data(), size);
+  return true;
 }
 
 // Integers of 1, 2 and 4 bytes are unsigned, those of 8 are signed. What is above takes 16.

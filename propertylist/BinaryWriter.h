@@ -40,16 +40,21 @@ class BinaryWriter {
 
   bool _number();
   bool _numberMembers(std::size_t container);
-  bool _refer(std::optional<Number> number);
-  std::optional<Number> _numberOf(const Value& value, std::uint32_t depth);
-  std::optional<Number> _numberOfText(const Text& text);
-  std::optional<Number> _numberOfNewText(const Text& text);
+  template <typename Members, typename ValueOf>
+  bool _referToValues(const Members& members, std::uint32_t depth, const ValueOf& valueOf);
+  std::optional<std::uint64_t> _hashAhead(const Value& value);
+  Recent& _recentAt(const Text& text);
+  std::optional<Number> _numberOf(const Value& value, std::uint32_t depth,
+                                  std::optional<std::uint64_t> hash = std::nullopt);
+  Number _numberOfText(const Text& text, std::optional<std::uint64_t> hash = std::nullopt);
+  Number _numberOfNewText(const Text& text, std::optional<std::uint64_t> hash);
   Number _numberOfData(const Bytes& data, const Value& value);
-  std::optional<Number> _numberOfScalar(const Value& value);
+  std::optional<Number> _numberOfScalar(const Value& value, std::optional<std::uint64_t> hash);
   Number _add(const Object& object);
 
-  void _put(const Object& object);
-  void _putText(std::string_view text);
+  bool _put(const Object& object);
+  bool _putText(std::string_view text);
+  bool _putWideText(std::string_view text);
   void _putInteger(const Value& integer);
   void _putReferences(const Object& container, std::size_t count);
   void _putHead(std::uint8_t type, std::uint64_t count);
@@ -68,6 +73,7 @@ class BinaryWriter {
   TextTable _scalars;
   std::unordered_map<const void*, Number> _byAddress;
   std::vector<Recent> _recent;
+  Bytes _wide;  // the text that is being put, in UTF-16
   std::vector<std::uint64_t> _offsets;
   std::size_t _referenceSize = 1;
   Bytes _bytes;

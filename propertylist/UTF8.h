@@ -10,7 +10,7 @@ namespace propertylist {
 
 // The code point that begins at `position`, which is moved behind it. Empty when there is none,
 // with `position` at the first byte that is wrong. `position` is less than the size of `text`.
-std::optional<char32_t> decodeUTF8(std::string_view text, std::size_t& position);
+inline std::optional<char32_t> decodeUTF8(std::string_view text, std::size_t& position);
 
 // Where the ASCII that begins at `from` ends; `from` is within `text`.
 std::size_t asciiPrefix(std::string_view text, std::size_t from);
@@ -26,12 +26,57 @@ std::size_t characterBoundary(std::string_view text, std::size_t at);
 inline constexpr std::size_t kLongestUTF8 = 4;
 // Writes up to so many bytes and answers the place behind them. `codePoint` is one that UTF-8 can
 // hold.
-char* putUTF8(char* to, char32_t codePoint);
+inline char* putUTF8(char* to, char32_t codePoint);
 void appendUTF8(std::string& text, char32_t codePoint);
 
 // Whether `codePoint` is a number that UTF-8 can hold.
 constexpr bool isScalarValue(char32_t codePoint) {
   return codePoint < 0xD800 || (codePoint > 0xDFFF && codePoint <= 0x10FFFF);
+}
+
+inline std::optional<char32_t> decodeUTF8(std::string_view text, std::size_t& position) {
+  const auto first = static_cast<unsigned char>(text[position]);
+  if (first < 0x80) {
+    ++position;
+    return first;
+  }
+  if (first < 0xC2 || first > 0xF4) return std::nullopt;
+  // How many bytes follow, and the smallest code point that needs so many.
+  const std::size_t following = first < 0xE0 ? 1 : first < 0xF0 ? 2 : 3;
+  const char32_t smallest = following == 1 ? 0x80 : following == 2 ? 0x800 : 0x10000;
+  if (text.size() - position <= following) return std::nullopt;
+  char32_t codePoint = first & (0x3FU >> following);
+  for (std::size_t i = 1; i <= following; ++i) {
+    const auto byte = static_cast<unsigned char>(text[position + i]);
+    if ((byte & 0xC0U) != 0x80U) return std::nullopt;
+    codePoint = (codePoint << 6U) | (byte & 0x3FU);
+  }
+  if (codePoint < smallest || !isScalarValue(codePoint)) return std::nullopt;
+  position += following + 1;
+  return codePoint;
+}
+
+inline char* putUTF8(char* to, char32_t codePoint) {
+  const auto byteOf = [](char32_t bits) {
+    return static_cast<char>(static_cast<unsigned char>(bits));
+  };
+  if (codePoint < 0x80) {
+    *to++ = byteOf(codePoint);
+    return to;
+  }
+  if (codePoint < 0x800) {
+    *to++ = byteOf(0xC0U | (codePoint >> 6U));
+  } else {
+    if (codePoint < 0x10000) {
+      *to++ = byteOf(0xE0U | (codePoint >> 12U));
+    } else {
+      *to++ = byteOf(0xF0U | (codePoint >> 18U));
+      *to++ = byteOf(0x80U | ((codePoint >> 12U) & 0x3FU));
+    }
+    *to++ = byteOf(0x80U | ((codePoint >> 6U) & 0x3FU));
+  }
+  *to++ = byteOf(0x80U | (codePoint & 0x3FU));
+  return to;
 }
 
 }  // namespace propertylist

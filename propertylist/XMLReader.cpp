@@ -15,6 +15,44 @@ namespace {
 
 using Tag = XMLScanner::Tag;
 
+// What the elements of a property list are called.
+enum class Element : std::uint8_t {
+  unknown,
+  key,
+  dictionary,
+  array,
+  string,
+  integer,
+  real,
+  isTrue,
+  isFalse,
+  date,
+  data
+};
+
+// By the length first, since no length has more than a few names.
+Element elementOf(std::string_view name) {
+  switch (name.size()) {
+    case 3:
+      return name == "key" ? Element::key : Element::unknown;
+    case 4:
+      if (name == "dict") return Element::dictionary;
+      if (name == "true") return Element::isTrue;
+      if (name == "date") return Element::date;
+      if (name == "data") return Element::data;
+      return name == "real" ? Element::real : Element::unknown;
+    case 5:
+      if (name == "array") return Element::array;
+      return name == "false" ? Element::isFalse : Element::unknown;
+    case 6:
+      return name == "string" ? Element::string : Element::unknown;
+    case 7:
+      return name == "integer" ? Element::integer : Element::unknown;
+    default:
+      return Element::unknown;
+  }
+}
+
 // One reading of an XML property list. The containers that are open wait in a list.
 class XMLReader {
  public:
@@ -61,17 +99,19 @@ class XMLReader {
   }
 
   bool _readElement(const Tag& tag) {
-    if (tag.name == "key") return _readKey(tag);
+    const Element element = elementOf(tag.name);
+    if (element == Element::key) return _readKey(tag);
     if (_open.empty() && _top) return _scanner.fail(tag, "more than one value");
     if (!_open.empty() && _open.back().isDictionary && !_open.back().key) {
       return _scanner.fail(tag, "a value without a key");
     }
-    if (tag.name == "dict" || tag.name == "array") {
+    if (element == Element::dictionary || element == Element::array) {
       if (_open.size() == kMaximumDepth) return _scanner.fail(tag, "nested too deep");
-      _open.push_back({tag.name, tag.name == "dict", _members.size()});
+      _open.push_back({tag.name, element == Element::dictionary, _members.size()});
       return !tag.isEmpty || _close(tag);
     }
-    return _readLeaf(tag);
+    if (element == Element::unknown) return _scanner.fail(tag, "an unknown element");
+    return _readLeaf(tag, element);
   }
 
   bool _readKey(const Tag& tag) {
@@ -92,38 +132,32 @@ class XMLReader {
     return true;
   }
 
-  bool _readLeaf(const Tag& tag) {
-    if (!_isLeaf(tag.name)) return _scanner.fail(tag, "an unknown element");
+  bool _readLeaf(const Tag& tag, Element element) {
     if (!_readContents(tag)) return false;
-    const std::optional<Arena::Raw> value = _leaf(tag.name);
+    const std::optional<Arena::Raw> value = _leaf(element);
     if (!value) return _scanner.fail(tag, "a value that is not well formed");
     _put(*value);
     return true;
   }
 
-  static bool _isLeaf(std::string_view name) {
-    return name == "string" || name == "integer" || name == "real" || name == "true" ||
-           name == "false" || name == "date" || name == "data";
-  }
-
-  std::optional<Arena::Raw> _leaf(std::string_view name) {
-    if (name == "string") return _arena->newText(_text);
-    if (name == "integer") {
+  std::optional<Arena::Raw> _leaf(Element element) {
+    if (element == Element::string) return _arena->newText(_text);
+    if (element == Element::integer) {
       const std::optional<IntegerText> integer = parseIntegerText(_text);
       if (!integer) return std::nullopt;
       return Arena::scalar(Kind::integer, integer->bits, integer->isNegative);
     }
-    if (name == "real") return _scalar(Kind::real, parseRealText(_text));
-    if (name == "date") {
+    if (element == Element::real) return _scalar(Kind::real, parseRealText(_text));
+    if (element == Element::date) {
       const std::optional<Date> date = parseDateText(withoutBlanks(_text));
       return _scalar(Kind::date, date ? std::optional(date->secondsSince2001) : std::nullopt);
     }
-    if (name == "data") {
+    if (element == Element::data) {
       const std::optional<Bytes> data = parseBase64(_text);
       return data ? std::optional(_arena->newData(*data)) : std::nullopt;
     }
     if (!withoutBlanks(_text).empty()) return std::nullopt;
-    return Arena::scalar(Kind::boolean, name == "true" ? 1 : 0);
+    return Arena::scalar(Kind::boolean, element == Element::isTrue ? 1 : 0);
   }
 
   static std::optional<Arena::Raw> _scalar(Kind kind, std::optional<double> number) {
@@ -136,6 +170,7 @@ class XMLReader {
     _text.clear();
     if (tag.isEmpty) return true;
     if (!_scanner.readText(_text)) return false;
+    if (_scanner.acceptEndTag(tag.name)) return true;
     const std::optional<Tag> end = _scanner.readTag();
     if (!end) return false;
     if (!end->isEnd) return _scanner.fail(*end, "an element inside of a text");

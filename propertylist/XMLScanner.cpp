@@ -1,6 +1,10 @@
 #include "propertylist/XMLScanner.h"
 
 #include <algorithm>
+#include <array>
+#include <bit>
+#include <cstdint>
+#include <cstring>
 #include <set>
 
 #include "propertylist/UTF8.h"
@@ -26,14 +30,20 @@ bool isPlain(const char* bytes, std::size_t size) {
   return bad == 0;
 }
 
-bool startsName(char c) {
+constexpr bool startsName(char c) {
   const auto byte = static_cast<unsigned char>(c);
   return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || c == '_' || c == ':' || byte >= 0x80;
 }
 
-bool continuesName(char c) {
-  return startsName(c) || (c >= '0' && c <= '9') || c == '-' || c == '.';
-}
+// Whether each byte continues a name.
+constexpr std::array<bool, 256> kContinuesName = [] {
+  std::array<bool, 256> continues{};
+  for (std::size_t byte = 0; byte < continues.size(); ++byte) {
+    const auto c = static_cast<char>(byte);
+    continues[byte] = startsName(c) || (c >= '0' && c <= '9') || c == '-' || c == '.';
+  }
+  return continues;
+}();
 
 std::string lowerCase(std::string_view text) {
   std::string result(text);
@@ -45,6 +55,28 @@ std::string lowerCase(std::string_view text) {
 
 // Where a text has to be looked at more closely.
 bool isSpecial(char c) { return c == '<' || c == '&' || c == ']' || c == '\r'; }
+
+// Each byte of the word that equals `c` has its high bit set in the answer, and bytes above the
+// lowest such one may have it too.
+constexpr std::uint64_t bytesEqualTo(std::uint64_t word, char c) {
+  constexpr std::uint64_t kOnes = 0x0101010101010101;
+  const std::uint64_t different = word ^ (kOnes * static_cast<unsigned char>(c));
+  return (different - kOnes) & ~different & (kOnes << 7U);
+}
+
+// The first special character at `from` or behind it, or the end of the text.
+std::size_t findSpecial(std::string_view text, std::size_t from) {
+  constexpr bool kFirstIsLowest = std::endian::native == std::endian::little;
+  for (std::uint64_t word = 0; kFirstIsLowest && text.size() - from >= sizeof word;
+       from += sizeof word) {
+    std::memcpy(&word, text.data() + from, sizeof word);
+    const std::uint64_t special = bytesEqualTo(word, '<') | bytesEqualTo(word, '&') |
+                                  bytesEqualTo(word, ']') | bytesEqualTo(word, '\r');
+    if (special != 0) return from + static_cast<std::size_t>(std::countr_zero(special)) / 8;
+  }
+  while (from < text.size() && !isSpecial(text[from])) ++from;
+  return from;
+}
 
 // Line ends of any kind become line feeds.
 void appendLines(std::string& text, std::string_view raw) {
@@ -76,7 +108,7 @@ bool XMLScanner::readProlog() {
 }
 
 bool XMLScanner::_checkCharacters() {
-  constexpr std::size_t kBlock = 64;
+  constexpr std::size_t kBlock = 32;
   std::size_t next = 0;  // where a block may begin
   for (std::size_t position = 0; position < _text.size();) {
     if (position >= next && _text.size() - position >= kBlock) {
@@ -174,6 +206,7 @@ std::optional<XMLScanner::Tag> XMLScanner::readTag() {
     fail(tag, "an end tag that is not well formed");
     return std::nullopt;
   }
+  if (_accept(">")) return tag;  // most have no attributes
   if (!_readAttributes(">", nullptr)) return std::nullopt;
   tag.isEmpty = _text[_at - 2] == '/';
   return tag;
@@ -214,11 +247,20 @@ bool XMLScanner::_readAttribute(std::string_view& name, std::string& value) {
   return true;
 }
 
+bool XMLScanner::acceptEndTag(std::string_view name) {
+  const std::string_view rest = _text.substr(_at);
+  const std::size_t size = name.size() + 3;
+  const bool isThere = rest.size() >= size && rest.starts_with("</") && rest[size - 1] == '>' &&
+                       rest.substr(2, name.size()) == name;
+  if (isThere) _at += size;
+  return isThere;
+}
+
 bool XMLScanner::readText(std::string& text) {
   while (!isAtEnd()) {
     const std::size_t start = _at;
-    while (!isAtEnd() && !isSpecial(_text[_at])) ++_at;
-    text += _text.substr(start, _at - start);
+    _at = findSpecial(_text, start);
+    text.append(_text, start, _at - start);
     if (isAtEnd()) break;
     bool isGood = true;
     if (_isAt("]")) {
@@ -299,7 +341,7 @@ bool XMLScanner::_readCharacterReference(std::string_view digits, std::string& t
 std::string_view XMLScanner::_readName() {
   const std::size_t start = _at;
   if (!isAtEnd() && startsName(_text[_at])) {
-    while (!isAtEnd() && continuesName(_text[_at])) ++_at;
+    while (!isAtEnd() && kContinuesName[static_cast<unsigned char>(_text[_at])]) ++_at;
   }
   return _text.substr(start, _at - start);
 }

@@ -36,6 +36,9 @@ class XMLScanner {
   bool skipBlanks();
   // Reads a tag, with its attributes, at which the document stands.
   std::optional<Tag> readTag();
+  // Reads the end tag of that name when it stands here in its usual form, without blanks. Where it
+  // does not, readTag reads what does.
+  bool acceptEndTag(std::string_view name);
   // Reads the text up to the next tag, comments and processing instructions left out.
   bool readText(std::string& text);
   bool isAtEnd() const { return _at == _text.size(); }
