@@ -82,9 +82,8 @@ std::string readAll(int descriptor, std::size_t expectedSize, Bytes& bytes) {
   return {};
 }
 
-}  // namespace
-
-FileReadResult readPropertyListFile(const std::string& path) {
+// The bytes of the file, or why there are none.
+FileReadResult readBytes(const std::string& path, Bytes& bytes) {
   // A NUL would cut the path short, and another file would be read.
   if (path.find('\0') != std::string::npos) return failure(false, path, systemError(EINVAL));
   const Descriptor file(openForReading(path));
@@ -97,13 +96,38 @@ FileReadResult readPropertyListFile(const std::string& path) {
   if (::fstat(file.number(), &status) != 0) return failure(true, path, systemError(errno));
   if (!S_ISREG(status.st_mode)) return failure(true, path, "not a regular file");
   if (status.st_size > static_cast<off_t>(kMaximumFileSize)) return failure(true, path, tooLarge());
-  Bytes bytes;
   const std::string problem =
       readAll(file.number(), static_cast<std::size_t>(status.st_size), bytes);
   if (!problem.empty()) return failure(true, path, problem);
+  return {std::nullopt, true, {}};
+}
+
+FileReadResult valueOf(const std::string& path, const Bytes& bytes) {
   ReadResult result = readPropertyList(bytes);
   if (!result.value) return failure(true, path, result.error.description());
   return {std::move(result.value), true, {}};
+}
+
+}  // namespace
+
+FileReadResult readPropertyListFile(const std::string& path) {
+  Bytes bytes;
+  FileReadResult result = readBytes(path, bytes);
+  return result.error.empty() ? valueOf(path, bytes) : result;
+}
+
+FileReadResult RepeatedReading::readPropertyListFile(const std::string& path) {
+  Bytes bytes;
+  FileReadResult result = readBytes(path, bytes);
+  if (!result.error.empty()) return result;
+  const std::lock_guard lock(_lock);
+  if (_value && bytes == _bytes) return {_value, true, {}};
+  result = valueOf(path, bytes);
+  if (result.value && bytes.size() <= kMaximumKeptSize) {
+    _bytes = std::move(bytes);
+    _value = result.value;
+  }
+  return result;
 }
 
 }  // namespace propertylist

@@ -2,6 +2,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <mutex>
 #include <optional>
 #include <span>
 #include <string>
@@ -50,5 +51,21 @@ struct PROPERTYLIST_EXPORT FileReadResult {
   std::string error;    // empty exactly when there is a value
 };
 PROPERTYLIST_EXPORT FileReadResult readPropertyListFile(const std::string& path);
+
+// Reads files for whoever asks for one file again and again: one with the same bytes as the list
+// that was read last has the same value, and is not taken apart anew. The file itself is read each
+// time, so what anybody wrote meanwhile is seen. Keeps bytes and value of one list, up to
+// kMaximumKeptSize. For any thread.
+class PROPERTYLIST_EXPORT RepeatedReading {
+ public:
+  static constexpr std::size_t kMaximumKeptSize = std::size_t{1} << 20U;  // bytes
+  // As propertylist::readPropertyListFile.
+  FileReadResult readPropertyListFile(const std::string& path);
+
+ private:
+  std::mutex _lock;
+  Bytes _bytes;
+  std::optional<Value> _value;
+};
 
 }  // namespace propertylist

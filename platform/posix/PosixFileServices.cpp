@@ -14,7 +14,7 @@
 namespace platform {
 
 propertylist::FileReadResult PosixFileServices::readPropertyListFile(const std::string& path) {
-  return propertylist::readPropertyListFile(path);
+  return _reading.readPropertyListFile(path);
 }
 
 bool PosixFileServices::fileExists(const std::string& path) {

@@ -1,6 +1,7 @@
 #pragma once
 
 #include "platform/FileServices.h"
+#include "propertylist/Reading.h"
 
 namespace platform {
 
@@ -33,6 +34,9 @@ class PLATFORM_EXPORT PosixFileServices : public FileServices {
   // already: the very file, or a private copy with the same bytes. A failure may leave a complete
   // aside behind, never a part of one.
   Status setAsideUnreadableFile(const std::string& path) override;
+
+ private:
+  propertylist::RepeatedReading _reading;  // a store reads the settings file many times
 };
 
 }  // namespace platform

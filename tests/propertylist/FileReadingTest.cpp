@@ -125,6 +125,50 @@ TEST_F(FileReading, DoesNotCutThePathAtANUL) {
   EXPECT_EQ(errorOf(path + '\0' + "x", false), "Invalid argument");
 }
 
+class RepeatedFileReading : public FileReading {
+ protected:
+  Dictionary read(const std::string& path) {
+    const FileReadResult result = reading.readPropertyListFile(path);
+    EXPECT_TRUE(result.exists);
+    EXPECT_EQ(result.error, "");
+    return result.value ? *result.value->asDictionary() : Dictionary();
+  }
+  RepeatedReading reading;
+};
+
+TEST_F(RepeatedFileReading, GivesTheSameStorageForTheSameBytes) {
+  const std::string path = put("list", *writeBinaryPropertyList(Value(Dictionary{{"a", 1}})));
+  const Dictionary first = read(path);
+  EXPECT_EQ(first, (Dictionary{{"a", 1}}));
+  EXPECT_TRUE(read(path).sharesStorageWith(first));
+  Dictionary changed = read(path);
+  changed.set("a", 2);
+  EXPECT_EQ(read(path), (Dictionary{{"a", 1}}));
+}
+
+TEST_F(RepeatedFileReading, SeesWhatWasWrittenMeanwhileAlsoInPlace) {
+  const std::string path = put("list", *writeBinaryPropertyList(Value(Dictionary{{"a", 1}})));
+  const auto time = std::filesystem::last_write_time(path);
+  read(path);
+  put("list", *writeBinaryPropertyList(Value(Dictionary{{"a", 2}})));
+  std::filesystem::last_write_time(path, time);
+  EXPECT_EQ(read(path), (Dictionary{{"a", 2}}));
+  std::filesystem::remove(path);
+  EXPECT_FALSE(reading.readPropertyListFile(path).exists);
+  put("list", {'n', 'o', 'n', 'e'});
+  EXPECT_EQ(reading.readPropertyListFile(path).value, std::nullopt);
+  put("list", *writeBinaryPropertyList(Value(Dictionary{{"a", 2}})));
+  EXPECT_EQ(read(path), (Dictionary{{"a", 2}}));
+}
+
+TEST_F(RepeatedFileReading, KeepsNoListAboveItsLimit) {
+  const Dictionary large{{"a", std::string(RepeatedReading::kMaximumKeptSize, 'a')}};
+  const std::string path = put("list", *writeBinaryPropertyList(Value(large)));
+  const Dictionary first = read(path);
+  EXPECT_EQ(first, large);
+  EXPECT_FALSE(read(path).sharesStorageWith(first));
+}
+
 TEST_F(FileReading, LeavesNoDescriptorOpen) {
   const auto descriptors = [] {
     std::size_t count = 0;
