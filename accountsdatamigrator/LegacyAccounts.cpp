@@ -76,9 +76,10 @@ constexpr List kOutgoingList = {"OutgoingAccounts", kMailClasses, {}};
 constexpr List kDataAccessList = {"Accounts", kDataAccessClasses, {}};
 
 // A dataclass by its short or its whole name; empty for a name that is longer than any.
-std::string wholeDataclass(const std::string& name) {
+std::string wholeDataclass(std::string_view name) {
   if (name.size() > kLongestDataclass) return {};
-  return name.starts_with(kDataclassPrefix) ? name : std::string(kDataclassPrefix) + name;
+  const std::string whole(name);
+  return name.starts_with(kDataclassPrefix) ? whole : std::string(kDataclassPrefix) + whole;
 }
 
 // The lines about one file's entries. A file can have very many that are wrong in one way, and its

@@ -33,7 +33,7 @@ Value beginningOf(const Text& text) {
 Dictionary digestedPart(const Dictionary& entry) {
   std::vector<Dictionary::Entry> part;
   for (const Dictionary::Entry& each : entry) {
-    const std::string& key = each.key();
+    const propertylist::Text& key = each.key();
     const Value& value = each.value();
     if (isLong(key) || value.asDictionary() != nullptr || value.asArray() != nullptr) continue;
     const propertylist::Text* const text = value.asString();

@@ -4,6 +4,7 @@
 #include <map>
 #include <set>
 #include <string>
+#include <string_view>
 
 #include "propertylist/Value.h"
 
@@ -13,7 +14,9 @@ namespace accountsdatamigrator {
 class LegacyIdentifiers {
  public:
   // Takes `own` for an account; false when an earlier account has it.
-  bool take(const std::string& own) { return _taken.insert(own).second; }
+  bool take(std::string_view own) {
+    return !_taken.contains(own) && _taken.emplace(own).second;  // one that is taken is not copied
+  }
 
   // An identifier that follows from the entry's content: equal entries in the same order get equal
   // ones each time, and entries with equal content differ by their order. What is nested in the

@@ -31,6 +31,9 @@ class PLATFORM_EXPORT LogArgument {
   LogArgument(const std::string& text) : LogArgument(std::string_view(text)) {}
   LogArgument(const char* text);                        // null prints as "(null)"
   LogArgument(const std::optional<std::string>& text);  // empty prints as "(null)"
+  LogArgument(const std::optional<propertylist::Text>& text)
+      : LogArgument(text ? LogArgument(std::string_view(*text))
+                         : LogArgument(static_cast<const char*>(nullptr))) {}
   LogArgument(int number);
   LogArgument(long number);
   LogArgument(long long number);

@@ -70,6 +70,7 @@ struct Node {
 // A value keeps its node's address where a number keeps its bits, and as a number too: so whatever
 // a value is read as, it is the same kind of memory.
 inline Node* nodeOf(std::uint64_t bits) {
+  // NOLINTNEXTLINE(performance-no-int-to-ptr): see above
   return reinterpret_cast<Node*>(static_cast<std::uintptr_t>(bits));
 }
 inline std::uint64_t bitsOf(const Node* node) { return reinterpret_cast<std::uintptr_t>(node); }

@@ -29,7 +29,7 @@ std::string textUnder(const Dictionary& properties, std::string_view key) {
   return text != nullptr ? *text : std::string();
 }
 
-bool isKnownType(const std::string& type) {
+bool isKnownType(std::string_view type) {
   return ASSBasicAccount::initWithProperties({{accountsettings::kAccountType, type},
                                               {accountsettings::kAccountClass, "any"}}) != nullptr;
 }
