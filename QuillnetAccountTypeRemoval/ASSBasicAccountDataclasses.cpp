@@ -112,9 +112,7 @@ std::optional<NameList> ASSBasicAccount::_enabledNames() const {
 
 StringList ASSBasicAccount::supportedDataclasses() const { return copiesOf(_supportedNames()); }
 
-StringList ASSBasicAccount::provisionedDataclasses() const {
-  return copiesOf(_provisionedNames());
-}
+StringList ASSBasicAccount::provisionedDataclasses() const { return copiesOf(_provisionedNames()); }
 
 std::optional<StringList> ASSBasicAccount::enabledDataclasses() const {
   const std::optional<NameList> names = _enabledNames();
@@ -127,8 +125,7 @@ bool ASSBasicAccount::isEnabledForDataclass(std::string_view dataclass) const {
 }
 
 void ASSBasicAccount::setEnabledForDataclass(bool enabled, std::string_view dataclass) {
-  if (contains(_supportedNames(), dataclass))
-    _forcedSetEnabledForDataclass(enabled, dataclass);
+  if (contains(_supportedNames(), dataclass)) _forcedSetEnabledForDataclass(enabled, dataclass);
 }
 
 void ASSBasicAccount::_forcedSetEnabledForDataclass(bool enabled, std::string_view dataclass) {
