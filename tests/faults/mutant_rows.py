@@ -22,15 +22,11 @@ SAME = {
     ("if (onDisk.contains(now.key())) continue;", "never"): 1,
     # A file that could not be made has no descriptor.
     ("if (_isThere) _descriptor = opened.descriptor;", "never"): 1,
-    # What is built again gets the same value; a key has its value from the ranking of the keys.
-    ("if (isNew) _close(*reached);", "never"): 2,
-    ("if (isNew) _close(*reached);", "always"): 1,
     # Comparisons with which a switch finds its way; the tests try all 256 bytes.
     ("switch (header.marker) {", "never"): 5,
     ("switch (header.marker) {", "always"): 1,
     # A failure is false either way.
     ('return high == 0 || isNegative || _fail(header.at, "an integer of more than 64 bits");', "always"): 1,
-    ('return !afterHigh || _fail(header.at, "half of a surrogate pair");', "always"): 1,
     ('return encoding == "utf-8" || encoding == "us-ascii" || fail("an encoding other than UTF-8");', "always"): 1,
     ('return _accept(">") || fail("a document type that is not well formed");', "always"): 1,
     ('return _scanner.isAtEnd() || _scanner.fail("something behind the property list");', "always"): 1,
