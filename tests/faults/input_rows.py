@@ -38,8 +38,8 @@ def why_crashed(output, name):
 
 
 def fuzzed(_found, _directory, is_full):
-    """Every target of fuzz/ for some seconds, or for five minutes each."""
-    done = subprocess.run([str(TOP / "fuzz/run"), "25" if is_full else "0.5"], check=False,
+    """Every target of fuzz/ for half a minute, or for five minutes each."""
+    done = subprocess.run([str(TOP / "fuzz/run"), "25" if is_full else "2.5"], check=False,
                           stdout=subprocess.PIPE, stderr=subprocess.STDOUT, text=True, errors="replace")
     lines = re.findall(r"^([a-z-]+) +(\d+) runs +(\d+) crashes$", done.stdout, re.MULTILINE)
     for name, runs, crashes in lines:
