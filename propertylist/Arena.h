@@ -44,12 +44,6 @@ class Arena final : public storage::Owner {
   };
 
   static Raw scalar(Kind kind, std::uint64_t bits, bool isNegative = false);
-  // A text of so many bytes, which the caller fills in before anybody looks.
-  struct NewText {
-    Raw value;
-    char* characters;
-  };
-  NewText newText(std::size_t size);
   Raw newText(std::string_view text);
   Raw newData(std::span<const std::uint8_t> data);
   // Containers of members that are put in by their index, each once.
@@ -104,20 +98,14 @@ inline Arena::Raw Arena::scalar(Kind kind, std::uint64_t bits, bool isNegative) 
   return raw;
 }
 
-inline Arena::NewText Arena::newText(std::size_t size) {
-  auto* const memory = static_cast<char*>(_allocate(sizeof(Value::TextNode) + size));
-  char* const characters = memory + sizeof(Value::TextNode);
-  NewText made;
-  made.value.kind = Kind::string;
-  made.value.setNode(new (memory) Value::TextNode(this, {characters, size}));
-  made.characters = characters;
-  return made;
-}
-
 inline Arena::Raw Arena::newText(std::string_view text) {
-  const NewText made = newText(text.size());
-  if (!text.empty()) std::memcpy(made.characters, text.data(), text.size());
-  return made.value;
+  auto* const memory = static_cast<char*>(_allocate(sizeof(Value::TextNode) + text.size()));
+  char* const characters = memory + sizeof(Value::TextNode);
+  if (!text.empty()) std::memcpy(characters, text.data(), text.size());
+  Raw raw;
+  raw.kind = Kind::string;
+  raw.setNode(new (memory) Value::TextNode(this, {characters, text.size()}));
+  return raw;
 }
 
 inline Value* Arena::_membersOf(const Raw& array) {

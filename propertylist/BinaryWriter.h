@@ -32,7 +32,7 @@ class BinaryWriter {
     std::uint32_t firstReference = 0;  // of a container, in _references
     std::uint32_t depth = 0;           // of a container: containers around it and itself
   };
-  // Where a text stands in memory, and its number; see _numberOfText.
+  // Where a text stands in memory, and its number; see _recentAt.
   struct Recent {
     const Text* text = nullptr;
     Number number = 0;

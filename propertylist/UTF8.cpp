@@ -5,6 +5,7 @@
 #include <cstring>
 
 namespace propertylist {
+
 std::size_t asciiPrefix(std::string_view text, std::size_t from) {
   constexpr std::uint64_t kHighBits = 0x8080808080808080;
   std::size_t at = from;
@@ -17,14 +18,6 @@ std::size_t asciiPrefix(std::string_view text, std::size_t from) {
 }
 
 bool isASCII(std::string_view text) { return asciiPrefix(text, 0) == text.size(); }
-
-std::optional<std::size_t> findInvalidUTF8(std::string_view text) {
-  for (std::size_t position = 0; position < text.size();) {
-    position = asciiPrefix(text, position);
-    if (position < text.size() && !decodeUTF8(text, position)) return position;
-  }
-  return std::nullopt;
-}
 
 std::size_t characterBoundary(std::string_view text, std::size_t at) {
   constexpr std::size_t kMostFollowing = 3;

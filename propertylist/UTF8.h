@@ -16,9 +16,6 @@ inline std::optional<char32_t> decodeUTF8(std::string_view text, std::size_t& po
 std::size_t asciiPrefix(std::string_view text, std::size_t from);
 bool isASCII(std::string_view text);
 
-// Where `text` stops being UTF-8; empty when it never does.
-std::optional<std::size_t> findInvalidUTF8(std::string_view text);
-
 // The last place up to `at` where `text` can be cut without splitting a character. In bytes that
 // are not UTF-8 it is `at` itself or at most three bytes before. `at` is within `text`.
 std::size_t characterBoundary(std::string_view text, std::size_t at);
