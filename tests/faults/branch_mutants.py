@@ -26,11 +26,12 @@ Mutant = collections.namedtuple("Mutant", "index line always")
 class Program:
     """How a build links a test program or library, and the tests that look at it.
 
-    `output` is the file of the build folder, `tests` a list of commands in which {program} stands for the test
-    program; a library is found by its program through its folder."""
+    `pattern` matches the file of the build folder, `tests` is a list of commands in which {program} stands for the
+    test program; a library is found by its program through its folder."""
 
-    def __init__(self, build, output, tests):
-        self.build, self.output, self.tests = build, output, tests
+    def __init__(self, build, pattern, tests):
+        self.build, self.tests = build, tests
+        self.output = output = str(next(build.glob(pattern)).relative_to(build))
         commands = subprocess.run(["ninja", "-t", "commands", output], cwd=build, check=True,
                                   stdout=subprocess.PIPE, text=True).stdout.splitlines()
         parts = [part for part in commands[-1].split(" && ") if f"-o {output}" in part]
@@ -38,20 +39,26 @@ class Program:
             raise SystemExit(f"no one command links {output}")
         self.command = shlex.split(parts[0])
 
-    def link(self, ours, source, place):
-        """Links with `ours` in place of what was made of `source`."""
+    def link(self, objects, place, *further):
+        """Links with the objects, {source: object}, in place of what was made of these sources, and with further
+        options of the linker."""
         names = [word.rsplit(",", 1)[1] for word in self.command if word.startswith("-Wl,-soname,")]
         made = os.path.join(place, (names or [os.path.basename(self.output)])[0])
-        replaced = f"/{os.path.basename(source)}.o"
+        replaced = tuple(f"/{os.path.basename(source)}.o" for source in objects)
         command = [word for word in self.command if not word.endswith(replaced)]
         command[command.index(self.output)] = made
-        command.insert(1, ours)  # before others that have the same inline functions
+        command[1:1] = [*further, *objects.values()]  # before others that have the same inline functions
         return made if run(command, self.build) == 0 else None
 
     def notices(self, made):
         environment = {**os.environ, "LD_LIBRARY_PATH": os.path.dirname(made)}
         return any(run(["prlimit", f"--cpu={LIMIT}", *(word.replace("{program}", made) for word in test)],
                        self.build, environment) != 0 for test in self.tests)
+
+
+def library(name):
+    """The pattern of the file of a shared library."""
+    return f"lib/libaccount-retirement-{name}.so.*.*.*"
 
 
 def run(command, directory, environment=None):
@@ -64,13 +71,19 @@ def run(command, directory, environment=None):
         return "timeout"
 
 
-def assembly_of(build, source, place):
+def compiling(build, source, output):
+    """How the build compiles the source, to another file; the source is the last word."""
     entries = json.loads((build / "compile_commands.json").read_text(encoding="utf-8"))
     entry = next(entry for entry in entries if entry["file"].endswith("/" + source))
-    command = [word for word in shlex.split(entry["command"]) if word not in ("-c", "ccache", "/usr/bin/ccache")]
+    command = [word for word in shlex.split(entry["command"]) if os.path.basename(word) != "ccache"]
+    command[command.index("-o") + 1] = output
+    return command
+
+
+def assembly_of(build, source, place):
     text = os.path.join(place, "whole.s")
-    command[command.index("-o") + 1] = text
-    if run([*command, "-O0", "-g", "-D_GLIBCXX_ASSERTIONS", "-S"], entry["directory"]) != 0:
+    command = compiling(build, source, text)
+    if run([*command, "-O0", "-g", "-D_GLIBCXX_ASSERTIONS", "-S"], build) != 0:
         raise SystemExit(f"{source} does not compile")
     with open(text, encoding="utf-8") as lines:
         return command[0], lines.read().split("\n")
@@ -115,7 +128,7 @@ def noticed(compiler, lines, mutant, program, source, place):
     text, ours = os.path.join(place, "mutant.s"), os.path.join(place, "mutant.o")
     with open(text, "w", encoding="utf-8") as output:
         output.write("\n".join(mutated))
-    made = program.link(ours, source, place) if run([compiler, "-c", "-o", ours, text], place) == 0 else None
+    made = program.link({source: ours}, place) if run([compiler, "-c", "-o", ours, text], place) == 0 else None
     return program.notices(made) if made else None
 
 

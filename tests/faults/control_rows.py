@@ -1,8 +1,9 @@
-"""Programs that are wrong on purpose: row Q3 of docs/reliability.md. Each control changes a copy of the sources,
-builds what its row needs and expects the row to have bad cases of the kind that the change brings about; a row
-that stays green proves nothing. First the same copy has to pass unchanged."""
+"""Programs that are wrong on purpose: row Q3 of docs/reliability.md. Each control changes copies of a few sources,
+links what its row needs anew and expects the row to have bad cases of the kind that the change brings about; a row
+that stays green proves nothing. With the programs as they are it has to be green."""
 
 import collections
+import concurrent.futures
 import os
 import pathlib
 import re
@@ -10,34 +11,37 @@ import shutil
 import subprocess
 import time
 
+import branch_mutants
 import matrix
 
 TOP = pathlib.Path(__file__).resolve().parents[2]
-HOST = ["device-image", "migration-host", "QuillnetAccountRemoval", "bundle_resources"]
 
 # `changes` are (file, what stands there, what stands there instead), each for every place in the file; `sign` is
-# what the row says of the cases that the change makes bad.
-Control = collections.namedtuple("Control", "name row sign targets changes")
+# what the row says of the cases that the change makes bad; `programs` are those that the row uses, and `library` the
+# shared one that they have the changed sources from, if they do.
+Control = collections.namedtuple("Control", "name row sign library programs changes")
 CONTROLS = [
     Control("a writer that writes in place", "S3", "neither the old nor the new one|is gone",
-            ["fault_saver", "device-image"], [
+            "platform", ["fault_saver"], [
         ("platform/posix/PosixFileServices.cpp", "if (std::rename(from.c_str(), to.c_str()) != 0)",
          "if (!(std::ofstream(to, std::ofstream::trunc) << std::ifstream(from).rdbuf()) ||"
          " std::remove(from.c_str()) != 0)"),
         ("platform/posix/PosixFileServices.cpp", "#include <cstdio>", "#include <cstdio>\n#include <fstream>")]),
-    Control("a merge that prefers the disk", "R4", "over", ["fault_merges"], [
+    Control("a merge that prefers the disk", "R4", "over", None, ["fault_merges"], [
         ("QuillnetAccountTypeRemoval/ASSAccountsManagerSaving.cpp",
          "changedInMemory ? Dictionary::Entry(disk.key(), *now) : disk", "changedInMemory ? disk : disk")]),
     # A migration that nothing disturbs has nothing to do twice and goes well.
-    Control("a merge that does not know what it has merged", "M1", "ended with 5: .* doubled in the local stores", HOST, [
+    Control("a merge that does not know what it has merged", "M1", "ended with 5: .* doubled in the local stores",
+            None, ["device-image", "migration-host"], [
         ("deviceimage/RecordPlacer.cpp", 't.content = r.content"',
          't.content = r.content AND t.source_account IS NULL"'),
         ("deviceimage/Schema.h", "  UNIQUE (store, kind, base_uid, content_hash),\n", "")]),
-    Control("a reader without a limit of depth", "R1", "depth.*Segmentation fault", ["fault_lists"], [
+    Control("a reader without a limit of depth", "R1", "depth.*Segmentation fault",
+            "propertylist", ["fault_lists"], [
         ("propertylist/BinaryReader.cpp", "> kMaximumDepth", "> std::size_t{1} << 40U"),
         ("propertylist/BinaryReader.cpp", ">= kMaximumDepth", ">= std::size_t{1} << 40U")]),
     Control("a writer without fsync", "S4", "neither the old nor the new one|is lost|is gone",
-            ["fault_saver", "device-image"], [
+            None, ["fault_saver"], [
         ("QuillnetAccountTypeRemoval/SettingsFileWriting.cpp",
          "_files.makePrivate(_descriptor).isSuccess() &&\n"
          "                          _files.synchronizeFile(_descriptor).isSuccess();",
@@ -45,48 +49,65 @@ CONTROLS = [
 ]
 
 
-def copy_of_the_tree(directory):
-    names = subprocess.run(["git", "ls-files", "-co", "--exclude-standard"], cwd=TOP, check=True,
-                           stdout=subprocess.PIPE, text=True).stdout.splitlines()
-    for name in names:
-        if (TOP / name).is_file():
-            (directory / name).parent.mkdir(parents=True, exist_ok=True)
-            shutil.copy2(TOP / name, directory / name)
+def dependencies():
+    """The files from which the build makes each of its objects, the source first."""
+    listed = subprocess.run(["ninja", "-t", "deps"], cwd=matrix.BUILD, check=True, stdout=subprocess.PIPE,
+                            text=True).stdout
+    for entry in listed.split("\n\n"):
+        paths = [os.path.normpath(matrix.BUILD / line.strip()) for line in entry.splitlines()[1:]]
+        yield [os.path.relpath(path, TOP) for path in paths if path.startswith(f"{TOP}/")]
 
 
-class Copy:
-    """A copy of the sources with a build folder of its own."""
+def sources_with(names):
+    """The sources that are, or include, one of the files; not those of the tests."""
+    return sorted({files[0] for files in dependencies()
+                   if not names.isdisjoint(files) and not files[0].startswith("tests/")})
 
-    def __init__(self, directory):
-        self.top = directory
-        copy_of_the_tree(directory)
-        self.environment = {**os.environ, "CCACHE_BASEDIR": str(directory), "CCACHE_NOHASHDIR": "1"}
-        launcher = ["-DCMAKE_CXX_COMPILER_LAUNCHER=ccache"] if shutil.which("ccache") else []
-        self._run(["cmake", "--preset", "release", *launcher])
 
-    def _run(self, command):
-        done = subprocess.run(command, cwd=self.top, env=self.environment, check=False, text=True,
-                              stdout=subprocess.PIPE, stderr=subprocess.STDOUT)
-        if done.returncode != 0:
-            raise SystemExit(f"{' '.join(command)}: {done.stdout[-2000:]}")
+def change(changes, top):
+    for name, old, new in changes:
+        path = top / name
+        if not path.exists():
+            path.parent.mkdir(parents=True, exist_ok=True)
+            shutil.copy(TOP / name, path)
+        text = path.read_text(encoding="utf-8")
+        if old not in text:
+            raise SystemExit(f"{name} has changed: there is no '{old}' to be made wrong")
+        path.write_text(text.replace(old, new), encoding="utf-8")
 
-    def build(self, targets):
-        """The programs by name."""
-        self._run(["cmake", "--build", "--preset", "release", "-j", str(os.cpu_count()), "--target", *targets])
-        programs = self.top / "build/release/bin"
-        return {path.name: str(path) for path in programs.iterdir()}
 
-    def change(self, changes):
-        for name, old, new in changes:
-            path = self.top / name
-            text = path.read_text(encoding="utf-8")
-            if old not in text:
-                raise SystemExit(f"{name} has changed: there is no '{old}' to be made wrong")
-            path.write_text(text.replace(old, new), encoding="utf-8")
+def compile_changed(source, top, output):
+    command = branch_mutants.compiling(matrix.BUILD, source, str(output))
+    if (top / source).exists():
+        command[-1] = str(top / source)
+    command.insert(1, f"-I{top}")  # before the headers as they are
+    if branch_mutants.run(command, matrix.BUILD) != 0:
+        raise SystemExit(f"{source} does not compile with the change")
 
-    def restore(self, changes):
-        for name in {name for name, _, _ in changes}:
-            shutil.copy(TOP / name, self.top / name)
+
+def link(output, objects, place):
+    """Links a file of the build folder with the objects into the same folder of `place`."""
+    program = branch_mutants.Program(matrix.BUILD, output, [])
+    made = program.link(objects, place / pathlib.Path(output).parent, f"-Wl,-rpath,{place}/lib")
+    if made is None:
+        raise SystemExit(f"{output} cannot be linked with the change")
+    return made
+
+
+def make_programs(control, place):
+    """The programs with the change, by name, in a copy of what lies beside them in the build folder."""
+    changed = place / "sources"
+    change(control.changes, changed)
+    objects = {}
+    for source in sources_with({name for name, _, _ in control.changes}):
+        objects[source] = str(place / f"{source.replace('/', '-')}.o")
+        compile_changed(source, changed, objects[source])
+    shutil.copytree(matrix.BUILD / "lib", place / "lib", symlinks=True)
+    (place / "bin").mkdir()
+    if control.library:
+        link(branch_mutants.library(control.library), objects, place)
+        objects = {}
+    return {name: link(f"bin/{name}", objects, place) for name in control.programs}
 
 
 def run_row(control, make, found, place):
@@ -108,33 +129,33 @@ def possible_controls(why_skipped):
     return possible
 
 
-def try_controls(rows, controls, directory):
-    """A case for each control: its row with the unchanged programs, then with the changed ones."""
-    (directory / "copy").mkdir()
-    copy = Copy(directory / "copy")
+def try_controls(rows, controls, green, found, directory):
+    """A case for each control: its row with the programs as they are, then with the changed ones."""
     wrong = []
-    unchanged = copy.build(sorted({target for control in controls for target in control.targets}))
-    for control in controls:
+    places = [directory / f"control{number}" for number in range(len(controls))]
+    with concurrent.futures.ThreadPoolExecutor(2) as pool:
+        programs = list(pool.map(make_programs, controls, places))
+    for control, changed in zip(controls, programs):
         begin = time.monotonic()
         _, make = rows[control.row]
-        bad, _ = run_row(control, make, unchanged, directory / "unchanged")
-        if bad:
-            wrong.append((control.name, f"row {control.row} is red without any change: {bad[0]}"))
-            continue
-        copy.change(control.changes)
-        bad, signs = run_row(control, make, copy.build(control.targets), directory / "changed")
-        copy.restore(control.changes)
-        copy.build(control.targets)
+        if control.row not in green:
+            bad, _ = run_row(control, make, found, directory / "unchanged")
+            if bad:
+                wrong.append((control.name, f"row {control.row} is red without any change: {bad[0]}"))
+                continue
+        bad, signs = run_row(control, make, {**found, **changed}, directory / "changed")
         print(f"     Q3 {control.name}: row {control.row} has {len(bad)} bad cases, such as {bad[:1]};"
               f" {time.monotonic() - begin:.0f} s", flush=True)
         if not signs:
             wrong.append((control.name, f"row {control.row} does not notice"))
-    shutil.rmtree(directory / "copy")
+    for place in places:
+        shutil.rmtree(place)
     return len(controls), wrong
 
 
-def rows_about(rows, why_skipped):
-    """The row that tries the given ones, but for those of which `why_skipped` has something to say."""
-    def controls(_found, directory, _is_full):
-        return try_controls(rows, possible_controls(why_skipped), directory)
+def rows_about(rows, why_skipped, green):
+    """The row that tries the given ones, but for those of which `why_skipped` has something to say. Those in `green`
+    when it begins have just passed with the programs as they are."""
+    def controls(found, directory, _is_full):
+        return try_controls(rows, possible_controls(why_skipped), green, found, directory)
     return {"Q3": ("programs that are wrong on purpose turn their rows red", controls)}

@@ -61,10 +61,9 @@ def tests_of(program, suites):
 
 
 def reader_program(source):
-    library = next(path.name for path in (BUILD / "lib").glob("libaccount-retirement-propertylist.so.*.*.*"))
     suites = [BINARY_SUITES if "Binary" in source else XML_SUITES, READER_SUITES]
     test = str(BUILD / "bin/propertylist_test")
-    return branch_mutants.Program(BUILD, f"lib/{library}", [
+    return branch_mutants.Program(BUILD, branch_mutants.library("propertylist"), [
         *([test, "--gtest_fail_fast", f"--gtest_filter={names}"] for names in suites),
         [str(BUILD / "bin/fault_lists"), "odd-files"]])
 
