@@ -93,7 +93,7 @@ install_pkgconfig(account-retirement "Account retirement" -laccount_settings
                   "account-retirement-platform = ${PROJECT_VERSION}")
 set(package_description "Every service of the device over a directory")
 install_pkgconfig(account-retirement-deviceimage "Account retirement, device image" -ldeviceimage
-                  "account-retirement-platform = ${PROJECT_VERSION}, sqlite3")
+                  "account-retirement-platform = ${PROJECT_VERSION}, sqlite3, nettle")
 
 install(
   FILES LICENSE README.md CHANGELOG.md CONTRIBUTING.md

@@ -3,7 +3,7 @@
 
 # shellcheck disable=SC2034  # used by those who source this file
 BUILD_PACKAGES=(g++ cmake ninja-build pkg-config python3 binutils
-  libsqlite3-dev sqlite3 libfmt-dev libcli11-dev nlohmann-json3-dev libgtest-dev libgmock-dev python3-jsonschema)
+  libsqlite3-dev sqlite3 nettle-dev libfmt-dev libcli11-dev nlohmann-json3-dev libgtest-dev libgmock-dev python3-jsonschema)
 # shellcheck disable=SC2034
 CHECK_PACKAGES=(git clang-14 clang-tidy-14 clang-format-14 libclang-rt-14-dev shellcheck mandoc
   strace e2fsprogs xfsprogs btrfs-progs)

@@ -104,7 +104,10 @@ std::int64_t pragmaOf(sqlite3* connection, const char* pragma) {
 Database::Database(std::string name, Descriptor directory, sqlite3* connection)
     : _name(std::move(name)), _directory(std::move(directory)), _connection(connection) {}
 
-Database::~Database() { sqlite3_close_v2(_connection); }
+Database::~Database() {
+  for (const auto& [sql, statement] : _statements) sqlite3_finalize(statement);
+  sqlite3_close_v2(_connection);
+}
 
 std::unique_ptr<Database> Database::openExisting(const DeviceImage& image,
                                                  platform::SyncDataType type,
@@ -194,11 +197,29 @@ std::int64_t Database::changedRows() const { return sqlite3_changes64(_connectio
 std::int64_t Database::lastInsertedRow() const { return sqlite3_last_insert_rowid(_connection); }
 
 Statement::Statement(Database& database, std::string_view sql) : _database(database) {
-  _check(sqlite3_prepare_v2(database._connection, sql.data(), static_cast<int>(sql.size()),
-                            &_statement, nullptr));
+  // Some pragmas do their work when they are prepared.
+  const bool isKept = !sql.starts_with("PRAGMA");
+  if (isKept) {
+    auto place = database._statements.find(sql);
+    if (place == database._statements.end())
+      place = database._statements.emplace(sql, nullptr).first;
+    _kept = &place->second;
+    _statement = std::exchange(*_kept, nullptr);
+    if (_statement != nullptr) return;
+  }
+  _check(sqlite3_prepare_v3(database._connection, sql.data(), static_cast<int>(sql.size()),
+                            isKept ? SQLITE_PREPARE_PERSISTENT : 0, &_statement, nullptr));
 }
 
-Statement::~Statement() { sqlite3_finalize(_statement); }
+Statement::~Statement() {
+  if (_kept == nullptr || *_kept != nullptr) {
+    sqlite3_finalize(_statement);
+    return;
+  }
+  sqlite3_reset(_statement);  // ends what it reads, and tells again of a failure that was told
+  sqlite3_clear_bindings(_statement);
+  *_kept = _statement;
+}
 
 void Statement::_check(int code) const {
   if (code != SQLITE_OK) _database._raise(code, "said no");

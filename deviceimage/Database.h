@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstdint>
+#include <map>
 #include <memory>
 #include <optional>
 #include <stdexcept>
@@ -76,9 +77,13 @@ class Database {
   // nothing outside the image is read or written.
   Descriptor _directory;
   sqlite3* _connection;
+  // One statement of each text, null while it is in use: to prepare one takes longer than to run it
+  // on the few rows that most look at.
+  std::map<std::string, sqlite3_stmt*, std::less<>> _statements;
 };
 
-// One prepared statement. Parameters are bound, never pasted into the text.
+// One prepared statement, which the database keeps for the next user of the same text. Parameters
+// are bound, never pasted into the text.
 //
 //   Statement query(database, "SELECT uid FROM records WHERE store = ?1");
 //   query.bind(store);
@@ -136,6 +141,7 @@ class Statement {
   void _check(int code) const;
 
   Database& _database;
+  sqlite3_stmt** _kept = nullptr;  // where the database keeps it; null when it does not
   sqlite3_stmt* _statement = nullptr;
 };
 

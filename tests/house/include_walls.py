@@ -21,7 +21,7 @@ FLOORS = {
         ["propertylist", "platform", "QuillnetAccountTypeRemoval", "localdata"],
         ["posix"],
     ),
-    "deviceimage": (["propertylist", "platform"], ["posix", "sqlite3", "fmt"]),
+    "deviceimage": (["propertylist", "platform"], ["posix", "sqlite3", "nettle", "fmt"]),
     "accountservices": (
         [
             "propertylist", "platform", "deviceimage/DeviceImage.h", "deviceimage/Journal.h",
