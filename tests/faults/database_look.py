@@ -7,6 +7,7 @@ import hashlib
 import pathlib
 import shutil
 import sqlite3
+import tempfile
 
 # A record with all that is told of it but the numbers of its row and store. `account` is empty in the local
 # store.
@@ -24,15 +25,19 @@ _rows = {}  # each row once, whatever number of contents it is in
 
 
 def look_at_database(path, scratch):
-    """The contents of the database. Reads only: a journal that is to be rolled back is so in a copy in the
-    `scratch` directory."""
+    """The contents of the database. Reads only: a journal that is to be rolled back is so in a copy, in a directory
+    of its own in `scratch`."""
     path = pathlib.Path(path)
     journal = path.with_name(f"{path.name}-journal")
-    if journal.exists():
-        scratch.mkdir(exist_ok=True)
+    if not journal.exists():
+        return _look_at(path)
+    with tempfile.TemporaryDirectory(prefix="look-", dir=scratch) as copy:
         for file in (path, journal):
-            shutil.copy(file, scratch / file.name)
-        path = scratch / path.name
+            shutil.copy(file, copy)
+        return _look_at(pathlib.Path(copy) / path.name)
+
+
+def _look_at(path):
     database = sqlite3.connect(f"file:{path}?mode=rw", uri=True)
     try:
         times = [time for time, in database.execute(_TIMES)]  # after the first statement nothing is rolled back
@@ -42,7 +47,6 @@ def look_at_database(path, scratch):
         return _seen[key]
     finally:
         database.close()
-        shutil.rmtree(scratch, ignore_errors=True)
 
 
 def _digest(content, times):

@@ -36,7 +36,7 @@ class State:
         keys = []
         for name, path in DATABASES.items():
             if name != left_out and (place / "image" / path).exists():
-                found = look_at_database(place / "image" / path, pathlib.Path(scratch) / f"{place.name}-look")
+                found = look_at_database(place / "image" / path, scratch)
                 keys.append(found.key)
                 self.damage = self.damage or found.damage and f"{name}: {found.damage}"
         self.records = tuple(keys)  # equal for states with equal records
