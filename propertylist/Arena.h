@@ -45,6 +45,8 @@ class Arena final : public storage::Owner {
 
   static Raw scalar(Kind kind, std::uint64_t bits, bool isNegative = false);
   Raw newText(std::string_view text);
+  // The text of `size` bytes, behind which eight more can be read. `isASCII` tells whether all are.
+  Raw newASCII(const char* bytes, std::size_t size, bool& isASCII);
   Raw newData(std::span<const std::uint8_t> data);
   // Containers of members that are put in by their index, each once.
   Raw newArray(std::size_t size);
@@ -54,7 +56,7 @@ class Arena final : public storage::Owner {
   static void putValue(const Raw& dictionary, std::size_t index, const Raw& value);
   static const Text& keyAt(const Raw& dictionary, std::size_t index);
   static std::size_t sizeOf(const Raw& dictionary);
-  static std::string_view textOf(const Raw& text);
+  static const Text& textOf(const Raw& text);
   // That the file refers to the container once more.
   static void noteShared(const Raw& container);
   // Sorts by `isBefore(keyNode, keyNode)`, an order of texts. Of equal keys the last stays.
@@ -108,6 +110,26 @@ inline Arena::Raw Arena::newText(std::string_view text) {
   return raw;
 }
 
+// In whole words: there is room for the last one, because memory is handed out in words.
+inline Arena::Raw Arena::newASCII(const char* bytes, std::size_t size, bool& isASCII) {
+  constexpr std::uint64_t kHighBits = 0x8080808080808080;
+  auto* const memory = static_cast<char*>(_allocate(sizeof(Value::TextNode) + size));
+  char* const characters = memory + sizeof(Value::TextNode);
+  std::uint64_t word = 0;
+  std::uint64_t all = 0;
+  for (std::size_t at = 0; at < size; at += sizeof word) {
+    std::memcpy(&word, bytes + at, sizeof word);
+    std::memcpy(characters + at, &word, sizeof word);
+    const std::size_t behind = at + sizeof word > size ? at + sizeof word - size : 0;
+    all |= word << 8 * behind;  // without what is behind the text
+  }
+  isASCII = (all & kHighBits) == 0;
+  Raw raw;
+  raw.kind = Kind::string;
+  raw.setNode(new (memory) Value::TextNode(this, {characters, size}));
+  return raw;
+}
+
 inline Value* Arena::_membersOf(const Raw& array) {
   return const_cast<Value*>(static_cast<Array::Node*>(array.node())->first);
 }
@@ -140,7 +162,7 @@ inline std::size_t Arena::sizeOf(const Raw& dictionary) {
   return dictionary.bits != 0 ? static_cast<Dictionary::Node*>(dictionary.node())->size : 0;
 }
 
-inline std::string_view Arena::textOf(const Raw& text) {
+inline const Text& Arena::textOf(const Raw& text) {
   return static_cast<Value::TextNode*>(text.node())->text;
 }
 

@@ -1,13 +1,10 @@
 #include "propertylist/BinaryReader.h"
 
 #include <algorithm>
-#include <bit>
-#include <cmath>
 #include <string_view>
 #include <unordered_map>
 
 #include "propertylist/BinaryForm.h"
-#include "propertylist/UTF8.h"
 
 namespace propertylist {
 
@@ -52,6 +49,8 @@ bool BinaryReader::_readTrailer() {
   if (table <= kMagic.size() || table > trailer) {
     return _fail(trailer + kOffsetTableAt, "offset table out of place");
   }
+  _unusedOfOffset = static_cast<unsigned>(64 - 8 * _offsetSize);
+  _unusedOfReference = static_cast<unsigned>(64 - 8 * _referenceSize);
   _offsetTable = static_cast<std::size_t>(table);
   if (_objectCount == 0 || _objectCount > (trailer - _offsetTable) / _offsetSize) {
     return _fail(trailer + kObjectCountAt, "object count does not fit the offset table");
@@ -63,6 +62,8 @@ bool BinaryReader::_readTrailer() {
 // Following references
 
 bool BinaryReader::_scan() {
+  constexpr std::size_t kUsualDepth = 8;
+  _way.reserve(kUsualDepth);
   _objects.resize(static_cast<std::size_t>(_objectCount));
   if (!_reach(_objects[static_cast<std::size_t>(_topObject)], _topObject)) return false;
   while (!_way.empty()) {
@@ -70,7 +71,7 @@ bool BinaryReader::_scan() {
     const std::uint64_t count = step.header.count;
     const bool isDictionary = step.object->kind == Kind::dictionary;
     if (isDictionary && step.nextReference < count) {
-      if (!_followKey(step)) return false;
+      if (!_followKeys(step)) return false;
     } else if (step.nextReference < (isDictionary ? 2 * count : count)) {
       if (!_followValue(step)) return false;
     } else if (!_close()) {
@@ -82,14 +83,15 @@ bool BinaryReader::_scan() {
 
 // The object to which the reference points, reached or not; null when there is none.
 BinaryReader::Object* BinaryReader::_objectAt(std::size_t placeOfReference) {
-  const std::uint64_t number = _number(placeOfReference, _referenceSize);
+  const std::uint64_t number = _numberBeforeTrailer(placeOfReference, _unusedOfReference);
   if (number < _objectCount) return &_objects[static_cast<std::size_t>(number)];
   _fail(placeOfReference, "a reference to an object that does not exist");
   return nullptr;
 }
 
 // Follows the references to all keys of a dictionary.
-bool BinaryReader::_followKey(Step& step) {
+bool BinaryReader::_followKeys(Step& step) {
+  const Object* previous = nullptr;
   for (; step.nextReference < step.header.count; ++step.nextReference) {
     const auto index = static_cast<std::size_t>(step.nextReference);
     const std::size_t place = step.header.contents + index * _referenceSize;
@@ -103,6 +105,9 @@ bool BinaryReader::_followKey(Step& step) {
     const Arena::Raw text = key->raw();
     Arena::putKey(step.container, index, text);
     if (Arena::textOf(text).size() > kLongKey) step.hasLongKey = true;
+    if (previous != nullptr && step.isAscending && !step.hasLongKey)
+      step.isAscending = _areAscending(*previous, *key);
+    previous = key;
   }
   return true;
 }
@@ -123,7 +128,11 @@ bool BinaryReader::_followValue(Step& step) {
     } else if (member->isContainer()) {
       Arena::noteShared(member->raw());
     }
-    if (!_account(step, *member)) return false;
+    if (member->isContainer()) {
+      if (!_account(step, *member)) return false;
+    } else if (++step.object->values > _limit) {
+      return _fail(step.header.at, "too many values");
+    }
     _put(step, *member);
     ++step.nextReference;
   }
@@ -131,24 +140,39 @@ bool BinaryReader::_followValue(Step& step) {
 }
 
 // Makes the object under `number`, which was not reached before. A container is put at the end of
-// the way.
+// the way. One look at the marker decides, because no processor foresees what comes.
 bool BinaryReader::_reach(Object& object, std::uint64_t number) {
   const std::size_t entry = _offsetTable + static_cast<std::size_t>(number) * _offsetSize;
-  const std::uint64_t at = _number(entry, _offsetSize);
-  if (at < kMagic.size() || at >= _offsetTable) {
+  const std::uint64_t place = _numberBeforeTrailer(entry, _unusedOfOffset);
+  if (place < kMagic.size() || place >= _offsetTable) {
     return _fail(entry, "an object outside of its region");
   }
-  Header header{};
-  if (!_readHeader(static_cast<std::size_t>(at), header) || !_checkLeaf(header)) return false;
-  if (header.marker != kArray && header.marker != kDictionary) {
-    object.hold(_make(header));
-    object.state = State::done;
-    return true;
+  const auto at = static_cast<std::size_t>(place);
+  Header header{_bytes[at], 0, at, at + 1};
+  switch (header.marker & 0xF0U) {
+    case kASCII:
+      return _readCount(header) && _claim(header, 1) && _makeASCII(object, header);
+    case kUTF16:
+      return _readCount(header) && _claim(header, 2) && _makeUTF16(object, header);
+    case kData:
+      if (!_readCount(header) || !_claim(header, 1)) return false;
+      object.finish(
+          _arena->newData(_bytes.subspan(header.contents, static_cast<std::size_t>(header.count))));
+      return true;
+    case kArray:
+      return _readCount(header) && _claim(header, _referenceSize) &&
+             _enter(object, header, _arena->newArray(static_cast<std::size_t>(header.count)));
+    case kDictionary:
+      return _readCount(header) && _claim(header, 2 * _referenceSize) &&
+             _enter(object, header, _arena->newDictionary(static_cast<std::size_t>(header.count)));
+    default:
+      return _makeFixed(object, header);
   }
+}
+
+// Puts a container, whose members are still to be followed, at the end of the way.
+bool BinaryReader::_enter(Object& object, const Header& header, const Arena::Raw& container) {
   if (_way.size() >= kMaximumDepth) return _fail(header.at, "nested too deep");
-  const auto count = static_cast<std::size_t>(header.count);
-  const Arena::Raw container =
-      header.marker == kArray ? _arena->newArray(count) : _arena->newDictionary(count);
   object.hold(container);
   object.state = State::open;
   object.depth = 1;
@@ -193,27 +217,23 @@ bool BinaryReader::_close() {
 }
 
 void BinaryReader::_sortDictionary(const Step& step) {
-  const auto count = static_cast<std::size_t>(step.header.count);
   if (step.hasLongKey) {
     _withLongKeys.push_back(step.container);
-    return;
-  }
-  for (std::size_t i = 1; i < count; ++i) {
-    if (!_areAscending(Arena::keyAt(step.container, i - 1), Arena::keyAt(step.container, i))) {
-      Arena::sort(step.container, [](const auto& a, const auto& b) { return a.text < b.text; });
-      return;
-    }
+  } else if (!step.isAscending) {
+    Arena::sort(step.container, [](const auto& a, const auto& b) { return a.text < b.text; });
   }
 }
 
 // Most keys follow the same ones in dictionary after dictionary.
-bool BinaryReader::_areAscending(const Text& a, const Text& b) {
-  const auto addresses =
-      reinterpret_cast<std::uintptr_t>(&a) >> 4U ^ reinterpret_cast<std::uintptr_t>(&b) >> 6U;
-  auto& known = _ascending[addresses % kPairs];
-  if (known.first == &a && known.second == &b) return true;
-  if (a >= b) return false;
-  known = {&a, &b};
+bool BinaryReader::_areAscending(const Object& a, const Object& b) {
+  constexpr std::uint64_t kSpread = 0x9E3779B97F4A7C15;  // brings all bits to the highest ones
+  const auto first = static_cast<std::uint64_t>(&a - _objects.data()) + 1;
+  const auto second = static_cast<std::uint64_t>(&b - _objects.data()) + 1;
+  const std::uint64_t pair = first << 32U | second;  // a file has fewer than 2^32 objects
+  std::uint64_t& known = _ascending[pair * kSpread >> (64 - kPairBits)];
+  if (known == pair) return true;
+  if (Arena::textOf(a.raw()) >= Arena::textOf(b.raw())) return false;
+  known = pair;
   return true;
 }
 
@@ -245,28 +265,9 @@ void BinaryReader::_sortLongKeys() {
 
 // Headers
 
-bool BinaryReader::_readHeader(std::size_t at, Header& header) {
-  header = {_bytes[at], 0, at, at + 1};
-  const std::uint8_t type = header.marker & 0xF0U;
-  if (type == kData || type == kASCII || type == kUTF16 || type == kArray || type == kDictionary) {
-    if (!_readCount(header)) return false;
-    header.marker = type;
-  }
-  const std::optional<std::uint64_t> size = _sizeOf(header);
-  if (!size) return _fail(at, "an object of an unknown type");
-  if (*size > _offsetTable - header.contents) {
-    return _fail(at, "an object that does not end before the offset table");
-  }
-  // Objects may overlap, but not so that a small file stands for a large amount of bytes.
-  _bytesReached += header.contents - at + static_cast<std::size_t>(*size);
-  return _bytesReached <= _limit || _fail(at, "objects that overlap without measure");
-}
-
-// Reads the count that a marker holds or that follows it.
-bool BinaryReader::_readCount(Header& header) {
+// Reads the count that follows a marker.
+bool BinaryReader::_readLongCount(Header& header) {
   std::size_t& at = header.contents;
-  header.count = header.marker & 0x0FU;
-  if (header.count != kLongCount) return true;
   if (at >= _offsetTable) return _fail(at, "a count outside of its region");
   const std::uint8_t marker = _bytes[at];
   if (marker < kInteger || marker > (kInteger | 3U)) return _fail(at, "a count that is no integer");
@@ -277,92 +278,10 @@ bool BinaryReader::_readCount(Header& header) {
   return true;
 }
 
-// How many bytes the contents take; empty for a type that no property list has. A count that no
-// file could hold is answered with a size that no file has.
-std::optional<std::uint64_t> BinaryReader::_sizeOf(const Header& header) const {
-  const std::uint64_t count = std::min(header.count, std::uint64_t{_bytes.size()} + 1);
-  switch (header.marker) {
-    case kFalse:
-    case kTrue:
-      return 0;
-    case kDate:
-      return 8;
-    case kReal | 2U:
-    case kReal | 3U:
-    case kInteger | 0U:
-    case kInteger | 1U:
-    case kInteger | 2U:
-    case kInteger | 3U:
-    case kInteger | 4U:
-      return std::uint64_t{1} << (header.marker & 0x0FU);
-    case kData:
-    case kASCII:
-      return count;
-    case kUTF16:
-      return count * 2;
-    case kArray:
-      return count * _referenceSize;
-    case kDictionary:
-      return count * 2 * _referenceSize;
-    default:
-      return std::nullopt;
-  }
-}
-
-bool BinaryReader::_checkLeaf(const Header& header) {
-  if (header.marker == (kInteger | 4U)) return _checkInteger(header);
-  if (header.marker == kUTF16) return _decodeUTF16(header);
-  if (header.marker == kASCII) {
-    const std::string_view text(reinterpret_cast<const char*>(_bytes.data()) + header.contents,
-                                static_cast<std::size_t>(header.count));
-    const std::size_t good = asciiPrefix(text, 0);
-    return good == text.size() || _fail(header.contents + good, "a character that is not ASCII");
-  }
-  if (header.marker == kDate &&
-      !std::isfinite(std::bit_cast<double>(_number(header.contents, 8)))) {
-    return _fail(header.at, "a date that is no instant");
-  }
-  return true;
-}
-
-// A wide integer has to be one that 64 bits can hold, unsigned or signed.
-bool BinaryReader::_checkInteger(const Header& header) {
-  const std::uint64_t high = _number(header.contents, 8);
-  const std::uint64_t low = _number(header.contents + 8, 8);
-  const bool isNegative = high == ~std::uint64_t{0} && (low >> 63U) == 1;
-  return high == 0 || isNegative || _fail(header.at, "an integer of more than 64 bits");
-}
-
-// Puts the text into _wide, in UTF-8.
-bool BinaryReader::_decodeUTF16(const Header& header) {
-  constexpr std::size_t kMostForAUnit = 3;
-  const auto count = static_cast<std::size_t>(header.count);
-  if (_wide.size() < count * kMostForAUnit) _wide.resize(count * kMostForAUnit);
-  char* next = _wide.data();
-  char32_t high = 0;  // the first half of a pair, whose second half has to follow
-  for (std::size_t i = 0; i < count; ++i) {
-    const std::size_t at = header.contents + i * 2;
-    const auto unit = static_cast<char32_t>(_number(at, 2));
-    const bool isLow = unit >= 0xDC00 && unit <= 0xDFFF;
-    if (isLow != (high != 0)) return _fail(at, "half of a surrogate pair");
-    if (isLow) {
-      next = putUTF8(next, 0x10000 + ((high - 0xD800) << 10U) + (unit - 0xDC00));
-      high = 0;
-    } else if (unit >= 0xD800 && unit <= 0xDBFF) {
-      high = unit;
-    } else {
-      next = putUTF8(next, unit);
-    }
-  }
-  if (high != 0) return _fail(header.at, "half of a surrogate pair");
-  _wideSize = static_cast<std::size_t>(next - _wide.data());
-  return true;
-}
-
 // Small things
 
-bool BinaryReader::_fail(std::size_t at, std::string what) {
-  _error.what = std::move(what);
+bool BinaryReader::_fail(std::size_t at, const char* what) {
+  _error.what = what;
   _error.byteOffset = at;
   return false;
 }

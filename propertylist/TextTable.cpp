@@ -30,10 +30,22 @@ std::uint64_t mixed(std::uint64_t a, std::uint64_t b) {
   return static_cast<std::uint64_t>(product) ^ static_cast<std::uint64_t>(product >> 64U);
 }
 
-std::uint64_t wordAt(const char* bytes, std::size_t size) {
-  std::uint64_t word = 0;
-  std::memcpy(&word, bytes, size);
+template <typename Word>
+std::uint64_t wordAt(const char* bytes) {
+  Word word = 0;
+  std::memcpy(&word, bytes, sizeof word);
   return word;
+}
+
+// Up to eight bytes. Those in the middle come twice; with the number of bytes, which is hashed too,
+// nothing is lost.
+std::uint64_t wordOf(const char* bytes, std::size_t size) {
+  constexpr std::size_t kHalf = 4;
+  if (size >= kHalf)
+    return wordAt<std::uint32_t>(bytes) << 32U | wordAt<std::uint32_t>(bytes + size - kHalf);
+  if (size == 0) return 0;
+  return wordAt<std::uint8_t>(bytes) << 16U | wordAt<std::uint8_t>(bytes + size / 2) << 8U |
+         wordAt<std::uint8_t>(bytes + size - 1);
 }
 
 }  // namespace
@@ -50,14 +62,15 @@ std::uint64_t TextTable::hashOf(std::string_view text) {
   const char* next = text.data();
   std::size_t left = text.size();
   for (; left > 2 * kWord; left -= 2 * kWord, next += 2 * kWord)
-    state = mixed(wordAt(next, kWord) ^ words[0] ^ state, wordAt(next + kWord, kWord) ^ words[1]);
+    state = mixed(wordAt<std::uint64_t>(next) ^ words[0] ^ state,
+                  wordAt<std::uint64_t>(next + kWord) ^ words[1]);
   std::uint64_t first = 0;
   std::uint64_t second = 0;
   if (left > kWord) {
-    first = wordAt(next, kWord);
-    second = wordAt(next + kWord, left - kWord);
-  } else if (left > 0) {
-    first = wordAt(next, left);
+    first = wordAt<std::uint64_t>(next);
+    second = wordAt<std::uint64_t>(next + left - kWord);
+  } else {
+    first = wordOf(next, left);
   }
   return mixed(mixed(first ^ words[0] ^ state, second ^ words[1]), words[2] ^ state);
 }

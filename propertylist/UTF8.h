@@ -1,5 +1,6 @@
 #pragma once
 
+#include <array>
 #include <cstddef>
 #include <optional>
 #include <string>
@@ -20,11 +21,18 @@ bool isASCII(std::string_view text);
 // are not UTF-8 it is `at` itself or at most three bytes before. `at` is within `text`.
 std::size_t characterBoundary(std::string_view text, std::size_t at);
 
+// Half of a pair, as UTF-16 has it for what lies above U+FFFF.
+constexpr bool isSurrogate(char32_t unit) { return unit >= 0xD800 && unit <= 0xDFFF; }
+inline constexpr char32_t kFirstLowSurrogate = 0xDC00;
+
 inline constexpr std::size_t kLongestUTF8 = 4;
 // Writes up to so many bytes and answers the place behind them. `codePoint` is one that UTF-8 can
 // hold.
 inline char* putUTF8(char* to, char32_t codePoint);
 void appendUTF8(std::string& text, char32_t codePoint);
+// The same for a unit of 16 bits that is no surrogate, without a guess how long it is: always
+// writes three bytes.
+inline char* putUTF8Unit(char* to, char32_t unit);
 
 // Whether `codePoint` is a number that UTF-8 can hold.
 constexpr bool isScalarValue(char32_t codePoint) {
@@ -74,6 +82,15 @@ inline char* putUTF8(char* to, char32_t codePoint) {
   }
   *to++ = byteOf(0x80U | (codePoint & 0x3FU));
   return to;
+}
+
+inline char* putUTF8Unit(char* to, char32_t unit) {
+  constexpr std::array<unsigned char, 3> kLead = {0, 0xC0, 0xE0};
+  const unsigned more = static_cast<unsigned>(unit >= 0x80) + static_cast<unsigned>(unit >= 0x800);
+  to[0] = static_cast<char>(kLead[more] | static_cast<unsigned char>(unit >> 6 * more));
+  to[1] = static_cast<char>(0x80U | (unit >> 6 * (more / 2) & 0x3FU));
+  to[2] = static_cast<char>(0x80U | (unit & 0x3FU));
+  return to + 1 + more;
 }
 
 }  // namespace propertylist

@@ -183,14 +183,15 @@ const Dictionary::Entry* Dictionary::_lowerBound(std::string_view key) const {
                           [](const Entry& entry, std::string_view k) { return entry.key() < k; });
 }
 
-// Few entries are faster walked over than searched: most differ in the length of their key.
+// Few entries are faster walked over than searched: most differ in the length of their key, and
+// others in its last letter.
 const Value* Dictionary::find(std::string_view key) const {
   constexpr std::size_t kFew = 32;
-  if (size() <= kFew) {
+  if (size() <= kFew && !key.empty()) {
     const Entry* const last = end();
     for (const Entry* entry = begin(); entry != last; ++entry) {
       const Text& text = entry->key();
-      if (text.size() == key.size() && std::equal(text.begin(), text.end(), key.begin()))
+      if (text.size() == key.size() && text.back() == key.back() && text == key)
         return &entry->value();
     }
     return nullptr;
