@@ -249,6 +249,8 @@ class ASSAccountsManager {
 
   void _loadAccount(const propertylist::Value& info, bool& fixedAny);
   void _register(const AccountPtr& account);
+  void _loadChildren(const AccountPtr& parent,
+                     const std::optional<propertylist::Text>& parentIdentifier);
   void _registerChild(std::string_view identifier, const AccountPtr& child,
                       std::string_view parentIdentifier);
   bool _everyChildHasItsParent(const StringList& types, const AccountArray& accounts) const;

@@ -79,7 +79,13 @@ void ASSAccountsManager::_initWithAccountsInfo(const std::optional<Array>& accou
       for (const RuntimeFixerPtr& fixer : runtimeFixers_) fixer->accountsHaveBeenSaved(false);
     }
   }
-  _setOriginalAccountDictionaries();
+  // Where each account has been registered under an identifier of its own, the snapshot has these.
+  if (!mayListOneTwice_ && topLevelAccountsByID_.size() == orderedTopLevelAccounts_->size()) {
+    originalAccountsByID_ = topLevelAccountsByID_.withValues<Dictionary>(
+        [](const AccountPtr& account) { return account->propertiesToSave(); });
+  } else {
+    _setOriginalAccountDictionaries();
+  }
 }
 
 void ASSAccountsManager::_loadAccount(const Value& info, bool& fixedAny) {
@@ -101,14 +107,18 @@ void ASSAccountsManager::_loadAccount(const Value& info, bool& fixedAny) {
 }
 
 void ASSAccountsManager::_register(const AccountPtr& account) {
-  if (const std::optional<propertylist::Text> identifier = account->identifier())
-    topLevelAccountsByID_.set(*identifier, account);
+  const std::optional<propertylist::Text> identifier = account->identifier();
+  if (identifier) topLevelAccountsByID_.set(*identifier, account);
   orderedTopLevelAccounts_->push_back(account);
-  _loadChildrenFromAccount(account);
+  _loadChildren(account, identifier);
 }
 
 void ASSAccountsManager::_loadChildrenFromAccount(const AccountPtr& parent) {
-  const std::optional<propertylist::Text> parentIdentifier = parent->identifier();
+  _loadChildren(parent, parent->identifier());
+}
+
+void ASSAccountsManager::_loadChildren(const AccountPtr& parent,
+                                       const std::optional<propertylist::Text>& parentIdentifier) {
   _removeChildrenForAccountWithIdentifier(parentIdentifier);
   const Value* children = parent->accountPropertyForKey(kAccountChildAccounts);
   if (children == nullptr || children->asArray() == nullptr) return;

@@ -42,12 +42,17 @@ class IdentifierTable {
   void clear() { *this = IdentifierTable(); }
   // Makes room for so many more.
   void reserve(std::size_t more);
+  // A table of the same identifiers with `valueOf` of each value: nothing is looked up for it.
+  template <typename Other, typename ValueOf>
+  IdentifierTable<Other> withValues(const ValueOf& valueOf) const;
 
   // Pairs of identifier and value.
   Iterator begin() const { return Iterator(*this, 0); }
   Iterator end() const { return Iterator(*this, _entries.size()); }
 
  private:
+  template <typename>
+  friend class IdentifierTable;
   // Where the identifier lies in _identifiers, in two numbers of half the usual size, and what is
   // under it.
   struct Entry {
@@ -120,6 +125,20 @@ void IdentifierTable<T>::reserve(std::size_t more) {
   _entries.reserve(_entries.size() + more);
   _identifiers.reserve(_identifiers.size() + more * kUsualSize);
   _indexes.makeRoomFor(more);
+}
+
+template <typename T>
+template <typename Other, typename ValueOf>
+IdentifierTable<Other> IdentifierTable<T>::withValues(const ValueOf& valueOf) const {
+  IdentifierTable<Other> other;
+  other._identifiers = _identifiers;
+  other._indexes = _indexes;
+  other._removed = _removed;
+  other._entries.reserve(_entries.size());
+  for (const Entry& entry : _entries)
+    other._entries.push_back(
+        {entry.begin, entry.size, entry.isThere() ? valueOf(entry.value) : Other()});
+  return other;
 }
 
 template <typename T>
