@@ -27,16 +27,11 @@ if(PROJECT_SANITIZE)
                                                    -fno-omit-frame-pointer)
   target_link_options(project_options INTERFACE -fsanitize=${PROJECT_SANITIZE})
 endif()
-if(PROJECT_COVERAGE)
-  # gcov counts branches of the machine's code, among them those that destroy temporaries; clang counts
-  # branches of the source.
-  if(CMAKE_CXX_COMPILER_ID STREQUAL "Clang")
-    set(coverage_flags -fprofile-instr-generate -fcoverage-mapping)
-  else()
-    set(coverage_flags --coverage)
-  endif()
-  target_compile_options(project_options INTERFACE ${coverage_flags})
-  target_link_options(project_options INTERFACE ${coverage_flags})
+# gcov counts branches of the machine's code, among them those that destroy temporaries. Clang counts branches
+# of the source: cmake/BranchCounts.cmake.
+if(PROJECT_COVERAGE AND CMAKE_CXX_COMPILER_ID STREQUAL "GNU")
+  target_compile_options(project_options INTERFACE --coverage)
+  target_link_options(project_options INTERFACE --coverage)
 endif()
 
 # Everything built lies where its users look for it, so that the build tree runs like an installation.
@@ -69,5 +64,10 @@ function(project_test name)
   # Optimising a test costs minutes of building and saves seconds of running.
   target_compile_options(${name} PRIVATE -O0)
   target_compile_definitions(${name} PRIVATE TEST_DATA_DIR="${PROJECT_SOURCE_DIR}/tests/data")
-  gtest_discover_tests(${name} TEST_PREFIX ${name}. DISCOVERY_TIMEOUT 60 PROPERTIES TIMEOUT 120)
+  set(environment "")
+  if(PROJECT_COVERAGE AND CMAKE_CXX_COMPILER_ID STREQUAL "Clang")
+    set(environment ENVIRONMENT LLVM_PROFILE_FILE=${PROJECT_BINARY_DIR}/profiles/%4m.profraw)
+  endif()
+  gtest_discover_tests(${name} TEST_PREFIX ${name}. DISCOVERY_TIMEOUT 60
+                       PROPERTIES TIMEOUT 120 ${environment})
 endfunction()

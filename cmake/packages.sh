@@ -5,7 +5,7 @@
 BUILD_PACKAGES=(g++ cmake ninja-build pkg-config python3 binutils
   libsqlite3-dev sqlite3 nettle-dev libfmt-dev libcli11-dev nlohmann-json3-dev libgtest-dev libgmock-dev python3-jsonschema)
 # shellcheck disable=SC2034
-CHECK_PACKAGES=(git clang-14 clang-tidy-14 clang-format-14 libclang-rt-14-dev shellcheck mandoc
+CHECK_PACKAGES=(git clang-14 clang-tidy-14 clang-format-14 libclang-rt-14-dev llvm-14 shellcheck mandoc
   strace e2fsprogs xfsprogs btrfs-progs)
 
 # For bench/run alone: the measuring, and what we are measured against.

@@ -1,11 +1,11 @@
 """What a built bundle needs and what it shows.
-usage: plugin_binary.py SHARED_OBJECT [--sanitized] [--account-classes]
+usage: plugin_binary.py SHARED_OBJECT [--instrumented] [--account-classes]
 
 It may need the C and the C++ run time and the two libraries it shares with its host, nothing else; and
 since it is loaded into somebody else's process, none of its own symbols may be seen there. It registers
 classes there, so no dlclose may unload it.
---sanitized allows the sanitizers' own run time, --account-classes what describes the interfaces of
-account creators and notifiers.
+--instrumented allows the run time of sanitizers and of counted branches, --account-classes what describes
+the interfaces of account creators and notifiers.
 """
 
 import re
@@ -20,6 +20,7 @@ NEEDED = re.compile(
     r"|libaccount-retirement-(propertylist|platform)\.so\.\d+\.\d+)"
 )
 SANITIZERS = re.compile(r"lib(asan|ubsan|tsan)\.so\.\d+|lib(pthread|dl|rt|resolv)\.so\.\d")
+FROM_COMPILER = re.compile(r"_*(asan|ubsan|tsan|odr)_|__llvm_profile_|__(start|stop)___llvm_prf_")
 # Templates of the standard library, and what describes the shared libraries' classes, are emitted by
 # every object that uses them and are weak everywhere.
 SHARED_WEAK = re.compile(
@@ -54,12 +55,12 @@ def exported(binary: Path) -> list[tuple[str, str]]:
     return [(row[1], row[2]) for row in rows if len(row) == 3]
 
 
-def check(binary: Path, sanitized: bool, account_classes: bool = False) -> tuple[list[str], int]:
+def check(binary: Path, instrumented: bool, account_classes: bool = False) -> tuple[list[str], int]:
     """The problems, and the number of libraries and symbols that were looked at."""
     problems = []
     libraries = needed(binary)
     for name in libraries:
-        if not NEEDED.fullmatch(name) and not (sanitized and SANITIZERS.fullmatch(name)):
+        if not NEEDED.fullmatch(name) and not (instrumented and SANITIZERS.fullmatch(name)):
             problems.append(f"{binary}: needs {name}")
     if not stays_loaded(binary):
         problems.append(f"{binary}: can be unloaded")
@@ -67,7 +68,7 @@ def check(binary: Path, sanitized: bool, account_classes: bool = False) -> tuple
     for kind, name in symbols:
         shared = SHARED_WEAK.match(name) or account_classes and ACCOUNT_CLASSES.match(name)
         weak = kind in "VWu" and shared
-        from_compiler = sanitized and re.match(r"_*(asan|ubsan|tsan|odr)_", name)
+        from_compiler = instrumented and FROM_COMPILER.match(name)
         if not weak and not from_compiler:
             problems.append(f"{binary}: shows the symbol {name} ({kind})")
     return problems, len(libraries) + 1 + len(symbols)
@@ -75,5 +76,5 @@ def check(binary: Path, sanitized: bool, account_classes: bool = False) -> tuple
 
 if __name__ == "__main__":
     options = sys.argv[2:]
-    finish(*check(Path(sys.argv[1]), "--sanitized" in options, "--account-classes" in options),
+    finish(*check(Path(sys.argv[1]), "--instrumented" in options, "--account-classes" in options),
            "libraries and symbols")

@@ -25,14 +25,15 @@ struct Registered {
 
 
 class PluginBinary(unittest.TestCase):
-    def problems(self, source: str, *options: str, account_classes: bool = False) -> list[str]:
+    def problems(self, source: str, *options: str, instrumented: bool = False,
+                 account_classes: bool = False) -> list[str]:
         """What the check says of the shared object built from `source`."""
         with tempfile.TemporaryDirectory() as folder:
             file = Path(folder) / "object.cpp"
             file.write_text(source, encoding="utf-8")
             command = [COMPILER, "-shared", "-fPIC", "-fvisibility=hidden", "-Wl,-z,nodelete", str(file)]
             subprocess.run([*command, "-o", f"{folder}/object.so", *options], check=True)
-            found, _ = plugin_binary.check(Path(folder) / "object.so", False, account_classes)
+            found, _ = plugin_binary.check(Path(folder) / "object.so", instrumented, account_classes)
             return [problem.removeprefix(f"{folder}/") for problem in found]
 
     def test_an_object_that_needs_the_run_time_and_shows_nothing_passes(self):
@@ -56,6 +57,13 @@ class PluginBinary(unittest.TestCase):
         self.assertEqual(
             self.problems(MODEST + shown), ["object.so: shows the symbol shown() (T)"]
         )
+
+    def test_what_compilers_add_for_counting_is_found_unless_it_is_allowed(self):
+        shown = 'extern "C" __attribute__((visibility("default"))) int {}() {{ return 1; }}'
+        source = shown.format("__llvm_profile_x") + shown.format("profile")
+        one, other = (f"object.so: shows the symbol {name} (T)" for name in ("__llvm_profile_x", "profile"))
+        self.assertEqual(self.problems(source), [one, other])
+        self.assertEqual(self.problems(source, instrumented=True), [other])
 
     def test_a_class_that_is_shown_is_found(self):
         shown = """struct __attribute__((visibility("default"))) Shown { virtual ~Shown() {} };
