@@ -237,7 +237,9 @@ class ASSAccountsManager {
     return originalAccountsByID_;
   }
   const IdentifierTable<AccountPtr>& childAccountsByID() const { return childAccountsByID_; }
-  const IdentifierTable<std::string>& childAccountIDToParentAccountID() const {
+  // Each a string.
+  const IdentifierTable<std::optional<propertylist::Value>>& childAccountIDToParentAccountID()
+      const {
     return childAccountIDToParentAccountID_;
   }
 
@@ -251,16 +253,16 @@ class ASSAccountsManager {
   void _register(const AccountPtr& account);
   void _loadChildren(const AccountPtr& parent,
                      const std::optional<propertylist::Text>& parentIdentifier);
-  void _registerChild(std::string_view identifier, const AccountPtr& child,
-                      std::string_view parentIdentifier);
+  void _registerChild(const propertylist::Value& identifier, const AccountPtr& child,
+                      const propertylist::Value& parentIdentifier);
   bool _everyChildHasItsParent(const StringList& types, const AccountArray& accounts) const;
   void _placeChild(const AccountPtr& child, const AccountsByID& placed);
-  bool _fixAccountsBeforeSaving();
+  void _fixAccountsBeforeSaving(bool& fixedAny);
   // `inMemory` has the properties to save of every top-level account, in order.
   propertylist::Array _mergedAccounts(const std::vector<propertylist::Dictionary>& inMemory,
                                       const ASSAccountsManager& onDisk) const;
 
-  // Every account in the order of the file, as it was registered; an account placed by
+  // Every account in the order of the list, as it was registered; an account placed by
   // replaceAccountWithAccount is listed here and not registered by its identifier.
   AccountsByID topLevelAccountsByID_;
   std::shared_ptr<AccountArray> orderedTopLevelAccounts_;
@@ -268,10 +270,10 @@ class ASSAccountsManager {
   // for more of it.
   bool mayListOneTwice_ = false;
   AccountsByID childAccountsByID_;
-  IdentifierTable<std::string> childAccountIDToParentAccountID_;
-  // The same table the other way round, so that one parent's children are found without a walk over
-  // all. A child may be listed that has gone to another parent since.
-  IdentifierTable<StringList> childIDsByParentID_;
+  IdentifierTable<std::optional<propertylist::Value>> childAccountIDToParentAccountID_;
+  // The identifiers of one parent's children, so that they are found without a walk over all. One
+  // that has gone to another parent since is listed too, and twice when it has come back.
+  IdentifierTable<std::vector<propertylist::Value>> childIDsByParentID_;
   IdentifierTable<propertylist::Dictionary> originalAccountsByID_;
   std::int64_t dataVersion_ = 0;
   std::vector<RuntimeFixerPtr> runtimeFixers_;

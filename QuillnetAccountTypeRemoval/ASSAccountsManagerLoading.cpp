@@ -1,5 +1,7 @@
 // How a store is made from the settings file.
 
+#include <algorithm>
+
 #include "QuillnetAccountTypeRemoval/ASSAccountsManager.h"
 #include "QuillnetAccountTypeRemoval/PropertyNumbers.h"
 #include "platform/Services.h"
@@ -14,6 +16,7 @@ namespace {
 
 class MadeStore final : public ASSAccountsManager {};
 
+constexpr std::size_t kMostExpectedAccounts = 100'000;
 constexpr const char* kInitWithAccountsInfo = "-[ASSAccountsManager _initWithAccountsInfo:]";
 
 AccountPtr accountFromInfo(const Dictionary& info) {
@@ -72,8 +75,10 @@ void ASSAccountsManager::_initWithAccountsInfo(const std::optional<Array>& accou
   mayListOneTwice_ = runtimeFixers_.size() > 1;
   if (accounts) {
     bool fixedAny = false;
-    orderedTopLevelAccounts_->reserve(accounts->size());
-    topLevelAccountsByID_.reserve(accounts->size());
+    // An entry need not be an account.
+    const std::size_t expected = std::min(accounts->size(), kMostExpectedAccounts);
+    orderedTopLevelAccounts_->reserve(expected);
+    topLevelAccountsByID_.reserve(expected);
     for (const Value& info : *accounts) _loadAccount(info, fixedAny);
     if (fixedAny) {
       for (const RuntimeFixerPtr& fixer : runtimeFixers_) fixer->accountsHaveBeenSaved(false);
@@ -108,8 +113,15 @@ void ASSAccountsManager::_loadAccount(const Value& info, bool& fixedAny) {
 
 void ASSAccountsManager::_register(const AccountPtr& account) {
   const std::optional<propertylist::Text> identifier = account->identifier();
-  if (identifier) topLevelAccountsByID_.set(*identifier, account);
   orderedTopLevelAccounts_->push_back(account);
+  if (identifier) {
+    try {
+      topLevelAccountsByID_.set(*identifier, account);
+    } catch (...) {
+      orderedTopLevelAccounts_->pop_back();  // listed and registered, or neither
+      throw;
+    }
+  }
   _loadChildren(account, identifier);
 }
 
@@ -128,48 +140,60 @@ void ASSAccountsManager::_loadChildren(const AccountPtr& parent,
         properties != nullptr ? ASSBasicAccount::initWithProperties(*properties) : nullptr;
     // A record made from a dictionary without an identifier has a fresh one, which nobody stores:
     // the child could never be found or removed by it.
-    const propertylist::Text* identifier =
-        properties != nullptr ? propertylist::findString(*properties, kAccountIdentifier) : nullptr;
-    if (!child || identifier == nullptr || !parentIdentifier) {
+    const Value* identifier =
+        properties != nullptr ? properties->find(kAccountIdentifier) : nullptr;
+    const bool isNamed = identifier != nullptr && identifier->asString() != nullptr;
+    if (!child || !isNamed || !parentIdentifier) {
       platform::logToSystem("Ignoring unknown child account with properties %@", info);
       continue;
     }
     child->setParentAccount(parent);
-    _registerChild(*identifier, child, *parentIdentifier);
+    _registerChild(*identifier, child, *parent->accountPropertyForKey(kAccountIdentifier));
   }
 }
 
-void ASSAccountsManager::_registerChild(std::string_view identifier, const AccountPtr& child,
-                                        std::string_view parentIdentifier) {
-  childIDsByParentID_[parentIdentifier].emplace_back(identifier);
-  childAccountsByID_.set(identifier, child);
-  childAccountIDToParentAccountID_[identifier] = parentIdentifier;
+// The tables share the texts of both identifiers: a small file may name a long one very often.
+void ASSAccountsManager::_registerChild(const Value& identifier, const AccountPtr& child,
+                                        const Value& parentIdentifier) {
+  const propertylist::Text& childName = *identifier.asString();
+  const propertylist::Text& parentName = *parentIdentifier.asString();
+  std::optional<Value>& known = childAccountIDToParentAccountID_[childName];
+  if (!known || *known->asString() != parentName) {  // else it is listed already
+    childIDsByParentID_[parentName].push_back(identifier);
+    known = std::nullopt;
+  }
+  childAccountsByID_.set(childName, child);
+  known = parentIdentifier;
 }
 
 void ASSAccountsManager::_removeChildrenForAccountWithIdentifier(
     std::optional<std::string_view> identifier) {
   if (childIDsByParentID_.empty()) return;
-  const StringList* const children = identifier ? childIDsByParentID_.find(*identifier) : nullptr;
+  const std::vector<Value>* const children =
+      identifier ? childIDsByParentID_.find(*identifier) : nullptr;
   if (children == nullptr) return;
-  for (const std::string& child : *children) {
-    const std::string* const parent = childAccountIDToParentAccountID_.find(child);
-    if (parent == nullptr || *parent != *identifier) continue;  // another parent's by now
-    childAccountIDToParentAccountID_.remove(child);
-    childAccountsByID_.remove(child);
+  for (const Value& child : *children) {
+    const propertylist::Text& name = *child.asString();
+    const std::optional<Value>* const parent = childAccountIDToParentAccountID_.find(name);
+    if (parent == nullptr || !*parent || *(*parent)->asString() != *identifier)
+      continue;  // another parent's by now
+    childAccountIDToParentAccountID_.remove(name);
+    childAccountsByID_.remove(name);
   }
   childIDsByParentID_.remove(*identifier);
 }
 
 void ASSAccountsManager::_setOriginalAccountDictionaries() {
-  originalAccountsByID_.clear();
-  originalAccountsByID_.reserve(orderedTopLevelAccounts_->size());
+  IdentifierTable<Dictionary> originals;
+  originals.reserve(orderedTopLevelAccounts_->size());
   for (const AccountPtr& account : *orderedTopLevelAccounts_) {
     if (const std::optional<propertylist::Text> identifier = account->identifier())
-      originalAccountsByID_.set(*identifier, account->propertiesToSave());
+      originals.set(*identifier, account->propertiesToSave());
     else
       platform::logToSystem("%@ returned a nil identifier. Account properties may not get saved",
                             account);
   }
+  originalAccountsByID_ = std::move(originals);
 }
 
 }  // namespace accountsettings

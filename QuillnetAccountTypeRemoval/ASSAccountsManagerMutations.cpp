@@ -128,29 +128,31 @@ void ASSAccountsManager::replaceAccountsWithTypesWithAccounts(const StringList& 
   ASLog("Replacing accounts");
   if (!_everyChildHasItsParent(types, accounts)) return;
   const IdentifierTable<AccountPtr> replacements = byIdentifierProperty(accounts);
-  AccountsByID placed;
   std::unordered_set<AccountPtr> replacing;
   auto remaining = std::make_shared<AccountArray>();  // last account first, until the walk is over
-
-  // From the last to the first, so that of two kept accounts with one identifier the first ends up
-  // registered.
   const AccountArray& stored = *orderedTopLevelAccounts_;
   for (auto it = stored.rbegin(); it != stored.rend(); ++it) {
     const std::optional<propertylist::Text> identifier = identifierProperty(*it);
     const AccountPtr* const replacement = identifier ? replacements.find(*identifier) : nullptr;
     if (replacement != nullptr) {
       remaining->push_back(*replacement);
-      placed.set(*identifier, *replacement);
       replacing.insert(*replacement);
       _loadChildrenFromAccount(*replacement);
     } else if (!isOfOneType(**it, types)) {
       remaining->push_back(*it);
-      if (identifier) placed.set(*identifier, *it);
     } else {
       _removeChildrenForAccountWithIdentifier(identifier);
     }
   }
   std::reverse(remaining->begin(), remaining->end());
+
+  // Of two kept accounts with one identifier the first is registered.
+  AccountsByID placed;
+  placed.reserve(remaining->size());
+  for (const AccountPtr& account : *remaining) {
+    const std::optional<propertylist::Text> identifier = identifierProperty(account);
+    if (identifier && !placed.contains(*identifier)) placed.set(*identifier, account);
+  }
 
   for (const AccountPtr& account : accounts) {
     if (replacing.contains(account)) continue;
@@ -173,9 +175,11 @@ void ASSAccountsManager::replaceAccountsWithTypesWithAccounts(const StringList& 
 void ASSAccountsManager::_placeChild(const AccountPtr& child, const AccountsByID& placed) {
   const AccountPtr parent = placed.at(*child->parentAccountIdentifier());
   if (const std::optional<std::string> identifier = child->identifier()) {
-    if (const std::string* const known = childAccountIDToParentAccountID_.find(*identifier)) {
+    const std::optional<Value>* const known = childAccountIDToParentAccountID_.find(*identifier);
+    if (known != nullptr && *known) {
+      const propertylist::Text& knownParent = *(*known)->asString();
       const AccountPtr oldParent =
-          parent->identifier() == *known ? parent : accountWithIdentifier(*known);
+          parent->identifier() == knownParent ? parent : accountWithIdentifier(knownParent);
       if (oldParent) removeChildWithIdentifierFromAccount(*identifier, oldParent);
     }
   }

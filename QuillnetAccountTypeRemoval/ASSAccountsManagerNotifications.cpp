@@ -26,9 +26,9 @@ constexpr int kNotLoadedLine = 834;
 constexpr int kNoClassNameLine = 842;
 constexpr int kSendingLine = 992;
 
-StringList enabledOf(const std::optional<Dictionary>& properties) {
+NameList enabledOf(const std::optional<Dictionary>& properties) {
   if (!properties) return {};
-  return stringsOfArray(properties->find(kAccountEnabledDataclasses)).value_or(StringList());
+  return namesOfArray(properties->find(kAccountEnabledDataclasses)).value_or(NameList());
 }
 
 // A string of the current properties or, where they have none, of the original ones.
@@ -52,8 +52,8 @@ Dictionary comparable(Dictionary properties) {
 std::set<std::string> affectedDataclasses(AccountChangeType change,
                                           const std::optional<Dictionary>& original,
                                           const std::optional<Dictionary>& current) {
-  const StringList before = enabledOf(original);
-  const StringList now = enabledOf(current);
+  const NameList before = enabledOf(original);
+  const NameList now = enabledOf(current);
   const std::set<std::string> beforeSet(before.begin(), before.end());
   const std::set<std::string> nowSet(now.begin(), now.end());
   if (change == AccountChangeType::deleted) return beforeSet;

@@ -24,9 +24,10 @@ AccountPtr ASSAccountsManager::accountWithIdentifier(std::string_view identifier
   // By the identifier that the child has now, which may have been changed since it was loaded.
   const std::optional<propertylist::Text> current = (*child)->identifier();
   if (!current) return nullptr;
-  const std::string* const parent = childAccountIDToParentAccountID_.find(*current);
-  if (parent == nullptr) return nullptr;
-  const AccountPtr* const found = topLevelAccountsByID_.find(*parent);
+  const std::optional<propertylist::Value>* const parent =
+      childAccountIDToParentAccountID_.find(*current);
+  if (parent == nullptr || !*parent) return nullptr;
+  const AccountPtr* const found = topLevelAccountsByID_.find(*(*parent)->asString());
   return found != nullptr ? *found : nullptr;
 }
 

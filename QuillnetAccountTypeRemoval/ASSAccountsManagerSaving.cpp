@@ -53,8 +53,7 @@ Dictionary ASSAccountsManager::mergeInMemoryPropertiesOriginalPropertiesOnDiskPr
   return result;
 }
 
-bool ASSAccountsManager::_fixAccountsBeforeSaving() {
-  bool fixedAny = false;
+void ASSAccountsManager::_fixAccountsBeforeSaving(bool& fixedAny) {
   const AccountArray& accounts = *orderedTopLevelAccounts_;
   for (auto it = accounts.rbegin(); it != accounts.rend(); ++it) {
     for (const RuntimeFixerPtr& fixer : runtimeFixers_) {
@@ -68,7 +67,6 @@ bool ASSAccountsManager::_fixAccountsBeforeSaving() {
       if (identifier) topLevelAccountsByID_.remove(*identifier);
     }
   }
-  return fixedAny;
 }
 
 Array ASSAccountsManager::_mergedAccounts(const std::vector<Dictionary>& inMemory,
@@ -93,10 +91,11 @@ Array ASSAccountsManager::_mergedAccounts(const std::vector<Dictionary>& inMemor
 
 void ASSAccountsManager::saveAllAccounts() {
   ASLog("Saving all accounts");
-  const bool fixedAny = _fixAccountsBeforeSaving();
+  bool fixedAny = false;
   std::vector<Dictionary> inMemory;  // of each account in order
   bool saved = false;
   try {
+    _fixAccountsBeforeSaving(fixedAny);
     // What another process wrote since this store was loaded.
     const AccountsManagerPtr onDisk = initInsideOfMigration();
     inMemory.reserve(orderedTopLevelAccounts_->size());

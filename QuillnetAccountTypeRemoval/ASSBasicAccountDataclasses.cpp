@@ -130,8 +130,8 @@ void ASSBasicAccount::setEnabledForDataclass(bool enabled, std::string_view data
 
 void ASSBasicAccount::_forcedSetEnabledForDataclass(bool enabled, std::string_view dataclass) {
   // A set first, because a stored list may hold a dataclass twice; then in a stable order.
-  const StringList stored =
-      stringsOfArray(properties_.find(kAccountEnabledDataclasses)).value_or(StringList());
+  const NameList stored =
+      namesOfArray(properties_.find(kAccountEnabledDataclasses)).value_or(NameList());
   std::set<std::string, std::less<>> dataclasses(stored.begin(), stored.end());
   if (enabled)
     dataclasses.emplace(dataclass);

@@ -1,11 +1,12 @@
 #include "host/AccountComparison.h"
 
 #include <algorithm>
-#include <deque>
 #include <map>
 #include <optional>
+#include <string_view>
 #include <unordered_map>
 
+#include "deviceimage/ContentHash.h"
 #include "propertylist/Writing.h"
 
 namespace host {
@@ -21,21 +22,36 @@ Dictionary without(Dictionary account, const std::vector<std::string>& keys) {
 // Finds the accounts of one list in another, each at most once.
 class Finder {
  public:
+  // `accounts` outlives the finder.
   Finder(const std::vector<Dictionary>& accounts, const std::vector<std::string>& correctedKeys)
-      : _correctedKeys(correctedKeys) {
-    for (std::size_t index = 0; index < accounts.size(); ++index) {
-      _byIdentifier[identifierOf(accounts[index])].push_back(index);
-      _byContent[_content(accounts[index])].push_back(index);
-    }
+      : _accounts(accounts), _correctedKeys(correctedKeys) {
+    for (std::size_t index = 0; index < accounts.size(); ++index)
+      _byIdentifier[identifierIn(accounts[index])].indexes.push_back(index);
     _taken.resize(accounts.size());
   }
 
   std::optional<std::size_t> take(const Dictionary& account) {
-    const std::string identifier = identifierOf(account);
-    auto& indexes = identifier.empty() ? _byContent[_content(account)] : _byIdentifier[identifier];
-    while (!indexes.empty()) {
-      const std::size_t index = indexes.front();
-      indexes.pop_front();
+    const std::string_view identifier = identifierIn(account);
+    return identifier.empty() ? _takeFrom(_byContent()[_content(account)])
+                              : _takeFrom(_byIdentifier[identifier]);
+  }
+
+  bool isTaken(std::size_t index) const { return _taken[index]; }
+
+ private:
+  struct Candidates {
+    std::vector<std::size_t> indexes;
+    std::size_t next = 0;
+  };
+
+  static std::string_view identifierIn(const Dictionary& account) {
+    const propertylist::Text* text = propertylist::findString(account, "Identifier");
+    return text != nullptr ? std::string_view(*text) : std::string_view();
+  }
+
+  std::optional<std::size_t> _takeFrom(Candidates& candidates) {
+    while (candidates.next < candidates.indexes.size()) {
+      const std::size_t index = candidates.indexes[candidates.next++];
       if (_taken[index]) continue;
       _taken[index] = true;
       return index;
@@ -43,19 +59,27 @@ class Finder {
     return std::nullopt;
   }
 
-  bool isTaken(std::size_t index) const { return _taken[index]; }
-
- private:
-  // The same bytes for the same account, apart from what may be corrected. What the file form
-  // cannot hold has not come from a file.
-  std::string _content(const Dictionary& account) const {
-    const auto bytes = propertylist::writeBinaryPropertyList(without(account, _correctedKeys));
-    return bytes ? std::string(bytes->begin(), bytes->end()) : std::string();
+  // Most lists have no account that is looked for like this.
+  std::unordered_map<std::string, Candidates>& _byContent() {
+    if (_contents.empty()) {
+      for (std::size_t index = 0; index < _accounts.size(); ++index)
+        _contents[_content(_accounts[index])].indexes.push_back(index);
+    }
+    return _contents;
   }
 
+  // The same text for the same account, apart from what may be corrected: a hash, because many
+  // accounts may share what is long. What the file form cannot hold has not come from a file.
+  std::string _content(const Dictionary& account) const {
+    const auto bytes = propertylist::writeBinaryPropertyList(without(account, _correctedKeys));
+    if (!bytes) return {};
+    return deviceimage::contentHash({reinterpret_cast<const char*>(bytes->data()), bytes->size()});
+  }
+
+  const std::vector<Dictionary>& _accounts;
   const std::vector<std::string>& _correctedKeys;
-  std::unordered_map<std::string, std::deque<std::size_t>> _byIdentifier;
-  std::unordered_map<std::string, std::deque<std::size_t>> _byContent;
+  std::unordered_map<std::string_view, Candidates> _byIdentifier;
+  std::unordered_map<std::string, Candidates> _contents;
   std::vector<bool> _taken;
 };
 
@@ -65,8 +89,8 @@ std::string nameOf(const AccountReport& account) {
 }
 
 AccountReport reportOf(const Dictionary& account) {
-  return {identifierOf(account), typeOf(account), textUnder(account, "DisplayName"),
-          AccountOutcome::notSelected};
+  return {nameUnder(account, "Identifier"), nameUnder(account, "Type"),
+          nameUnder(account, "DisplayName"), AccountOutcome::notSelected};
 }
 
 // Accounts of `after` that `finder` has not found to be one of before.
@@ -93,7 +117,7 @@ void noteGoneAccount(const Dictionary& account, const AccountReport& report,
   if (mayGo)
     comparison.leftBehind.push_back("The " + nameOf(report) +
                                     " is gone from the settings file: its class \"" +
-                                    textUnder(account, "Class") + "\" is unknown.");
+                                    nameUnder(account, "Class") + "\" is unknown.");
   else
     comparison.contradictions.push_back(
         "The " + nameOf(report) + " was not to be retired and is gone from the settings file.");

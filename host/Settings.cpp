@@ -7,6 +7,7 @@
 #include <limits>
 
 #include "deviceimage/Descriptor.h"
+#include "propertylist/Writing.h"
 
 namespace host {
 namespace {
@@ -76,6 +77,12 @@ bool isSameFile(const struct stat& a, const struct stat& b) {
 std::string textUnder(const Dictionary& account, std::string_view key) {
   const propertylist::Text* text = propertylist::findString(account, key);
   return text != nullptr ? *text : std::string();
+}
+
+std::string nameUnder(const Dictionary& account, std::string_view key) {
+  constexpr std::size_t kLongestName = 1024;
+  const propertylist::Text* text = propertylist::findString(account, key);
+  return text != nullptr ? propertylist::shortened(*text, kLongestName) : std::string();
 }
 
 std::int64_t integerValue(const Value* value) {

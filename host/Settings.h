@@ -33,9 +33,9 @@ bool isSameFile(const struct stat& a, const struct stat& b);
 
 // The text under `key`; empty without one.
 std::string textUnder(const propertylist::Dictionary& account, std::string_view key);
-inline std::string identifierOf(const propertylist::Dictionary& account) {
-  return textUnder(account, "Identifier");
-}
+// The same for reports and people, shortened to 1,024 bytes: of a small file very many accounts may
+// share a text of megabytes.
+std::string nameUnder(const propertylist::Dictionary& account, std::string_view key);
 inline std::string typeOf(const propertylist::Dictionary& account) {
   return textUnder(account, "Type");
 }

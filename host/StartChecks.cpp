@@ -37,9 +37,9 @@ void checkAccountTypes(const DeviceImage& image, const Settings& settings,
   const std::set<std::string> known(bundle.accountTypes->begin(), bundle.accountTypes->end());
   std::size_t unknown = 0;
   for (const propertylist::Dictionary& account : settings.accounts) {
-    const std::string type = typeOf(account);
+    const std::string type = nameUnder(account, "Type");
     if (known.contains(type) || ++unknown > kMaximumAccountReasons) continue;
-    reasons.push_back(image.settingsFile() + ": account " + identifierOf(account) +
+    reasons.push_back(image.settingsFile() + ": account " + nameUnder(account, "Identifier") +
                       " is of type \"" + type + "\", which " + bundle.name +
                       " does not know and would lose; take the account out, or use a migrator that "
                       "knows its type.");

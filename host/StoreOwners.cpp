@@ -48,7 +48,7 @@ StoreOwners::StoreOwners(const Observation& before, const Selection& selection,
   std::map<LineName, std::size_t> lineNumbers;
   for (const LineName& name : lineNames) {
     lineNumbers.emplace(name, _lines.size());
-    _lines.push_back({identifierOf(accounts[name.first]), name.second});
+    _lines.push_back({nameUnder(accounts[name.first], "Identifier"), name.second});
   }
   for (const auto& [store, account] : claims)
     _owners.emplace(store, lineNumbers.at({account, store.first}));

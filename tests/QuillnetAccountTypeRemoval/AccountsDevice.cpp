@@ -156,7 +156,7 @@ std::shared_ptr<OpenStore> OpenStore::ofAccounts(const Array& accounts) {
 Lines OpenStore::children() const {
   Lines lines;
   for (const auto& [child, parent] : childAccountIDToParentAccountID())
-    lines.push_back(std::string(child) + " of " + parent);
+    lines.push_back(std::string(child) + " of " + std::string(*parent->asString()));
   std::sort(lines.begin(), lines.end());
   if (lines.size() != childAccountsByID().size())
     throw std::runtime_error("the two indexes of children differ");

@@ -1,4 +1,5 @@
 #include <gtest/gtest.h>
+#include <sys/resource.h>
 
 #include "tests/QuillnetAccountTypeRemoval/AccountsDevice.h"
 
@@ -64,6 +65,46 @@ TEST_F(ManyAccounts, ParentOfTenThousandChildrenLosesThemAll) {
       {accountInfo("p", "CalDAV", {{"ChildAccounts", Array(std::move(children))}})});
   store->removeChildWithIdentifierFromAccount("same", (*store->allBasicAccounts())[0]);
   EXPECT_EQ(store->children(), (Lines{"other of p"}));
+}
+
+// In bytes: the most that this process ever had.
+std::size_t mostMemory() {
+  rusage usage{};
+  getrusage(RUSAGE_SELF, &usage);
+  return static_cast<std::size_t>(usage.ru_maxrss) * 1024;
+}
+
+// A file stores a text once and may refer to it very often; here half a gigabyte would be copied.
+class LongSharedText : public ::testing::Test {
+ protected:
+  static constexpr std::size_t kPlaces = 500;
+  ~LongSharedText() override { EXPECT_LT(mostMemory() - before, std::size_t{200} << 20U); }
+  AccountsDevice device;
+  const Value text = std::string(std::size_t{1} << 20U, 'x');
+  const std::size_t before = mostMemory();
+};
+
+TEST_F(LongSharedText, OfOneChildIsNotCopiedForEachPlaceOfTheChild) {
+  const Value child = with(accountInfo("c"), "Identifier", text);
+  const auto store = OpenStore::ofAccounts(
+      {accountInfo("p", "CalDAV", {{"ChildAccounts", Array(std::vector<Value>(kPlaces, child))}})});
+  EXPECT_EQ(store->childAccountsByID().size(), 1U);
+}
+
+TEST_F(LongSharedText, OfAParentIsNotCopiedForEachChild) {
+  std::vector<Value> children;
+  for (std::size_t i = 0; i < kPlaces; ++i)
+    children.emplace_back(accountInfo("c" + std::to_string(i)));
+  const auto store = OpenStore::ofAccounts(
+      {with(accountInfo("p", "CalDAV", {{"ChildAccounts", Array(children)}}), "Identifier", text)});
+  EXPECT_EQ(store->childAccountsByID().size(), kPlaces);
+}
+
+TEST_F(LongSharedText, OfADataclassIsNotCopiedForEachPlaceInTheList) {
+  const AccountPtr account = ASSBasicAccount::initWithProperties(accountInfo(
+      "a", "CalDAV", {{"Enabled Dataclasses", Array(std::vector<Value>(kPlaces, text))}}));
+  account->setEnabledForDataclass(true, kAccountDataclassCalendars);
+  EXPECT_EQ(account->enabledDataclasses(), (StringList{std::string(kAccountDataclassCalendars)}));
 }
 
 }  // namespace

@@ -212,5 +212,15 @@ TEST_F(ReplaceAccountsWithTypes, IsTracedFirst) {
   EXPECT_EQ(device.logLines(), (Lines{"Replacing accounts"}));
 }
 
+TEST(ReplacedAccounts, StayInTheOrderInWhichTheyAreListed) {
+  AccountsDevice device;
+  const auto store = OpenStore::ofAccounts(
+      {accountInfo("a", "CalDAV", {{"Sync Identifier", "same"}}),
+       accountInfo("b", "CalDAV", {{"Sync Identifier", "same"}}), accountInfo("c", "CardDAV")});
+  ASSERT_EQ(store->syncableAccountWithSyncIdentifier("same")->identifier(), "a");
+  store->replaceAccountsWithTypesWithAccounts({"CardDAV"}, {});
+  EXPECT_EQ(store->syncableAccountWithSyncIdentifier("same")->identifier(), "a");
+}
+
 }  // namespace
 }  // namespace accountsettings

@@ -153,5 +153,24 @@ TEST_F(SavingFixers, SecondLoadOfASaveWritesItsOwnLines) {
   EXPECT_EQ(device.savedAccounts(), Array());
 }
 
+TEST_F(SavingFixers, MemoryThatRunsOutWhileOneFixesFailsTheSave) {
+  int calls = 0;
+  const auto store = std::make_shared<StoreWithFixers>(std::vector<RuntimeFixerPtr>{
+      std::make_shared<ChosenFixer>("a", notes, [&calls](const AccountPtr& account) -> FixVerdict {
+        if (++calls <= 2) return FixVerdict::nothingToDo;  // while the accounts are loaded
+        if (account->identifier() == "1") throw std::bad_alloc();
+        return FixVerdict::fixed;
+      })});
+  store->load({accountInfo("1"), accountInfo("2")});
+  notes.clear();
+  device.systemLog.clear();
+  store->saveAllAccounts();
+  EXPECT_EQ(device.systemLog.lines(),
+            (Lines{"Failed to save accounts to filesystem. Maybe the information "
+                   "did not conform to a plist."}));
+  EXPECT_EQ(notes, (Lines{"a: saving accounts 2", "a: saving accounts 1", "a: saved"}));
+  EXPECT_EQ(device.countOfFileCalls("createPrivateFile"), 0U);
+}
+
 }  // namespace
 }  // namespace accountsettings

@@ -133,5 +133,25 @@ TEST(CompareAccounts, LetsTheFirstAccountOfATypeThatMayBeAddedCome) {
   EXPECT_EQ(compare({kMail}, {kMail, local, another}).contradictions.size(), 2U);
 }
 
+// A small file may give very many accounts one long text.
+TEST(CompareAccounts, ShortensLongTextsInTheReport) {
+  const std::string text(3000, 'x');
+  const std::string shortText = std::string(1024, 'x') + "...";
+  const Dictionary account =
+      with(with(kQuillnet, "Identifier", text), "DisplayName", text + " of somebody");
+  const AccountComparison comparison = compare({account}, {});
+  EXPECT_EQ(comparison.accounts[0].outcome, AccountOutcome::retired);
+  EXPECT_EQ(comparison.accounts[0].identifier, shortText);
+  EXPECT_EQ(comparison.accounts[0].displayName, shortText);
+}
+
+TEST(CompareAccounts, TellsLongIdentifiersApartByTheirEnds) {
+  const Dictionary one = with(kExchange, "Identifier", std::string(3000, 'x') + "1");
+  const Dictionary two = with(kExchange, "Identifier", std::string(3000, 'x') + "2");
+  EXPECT_THAT(compare({one, two}, {one, two}).contradictions, IsEmpty());
+  EXPECT_THAT(outcomes(compare({one, two}, {two})),
+              ElementsAre(AccountOutcome::dropped, AccountOutcome::notSelected));
+}
+
 }  // namespace
 }  // namespace host
