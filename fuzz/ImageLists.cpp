@@ -2,12 +2,13 @@
 // property lists of the device, of programs and of configuration profiles, the settings as the host
 // sees them, a migrator's Info.plist, and the lists of users and groups. Whoever reads them
 // answers.
+#include <fcntl.h>
 #include <stdlib.h>
+#include <unistd.h>
 
-#include <array>
 #include <filesystem>
-#include <fstream>
 #include <stdexcept>
+#include <vector>
 
 #include "deviceimage/DeviceImageServices.h"
 #include "deviceimage/SyncAgent.h"
@@ -33,27 +34,45 @@ class Image {
     deviceimage::ServiceOptions options;
     options.writesLog = false;
     services = std::make_unique<deviceimage::DeviceImageServices>(image, options);
+    for (const std::string& name :
+         {std::string(DeviceImage::kDevicePropertiesFile),
+          std::string(DeviceImage::kProcessDefaultsFile),
+          std::string(DeviceImage::kRestrictionsFile),
+          *DeviceImage::preferencesFile(deviceimage::SyncAgent::kApplication),
+          std::string(DeviceImage::kSettingsFile), std::string(kBundle) + "/Info.plist",
+          std::string(DeviceImage::kUsersFile), std::string(DeviceImage::kGroupsFile)})
+      _open(image->absolutePath(name));
   }
   ~Image() {
+    for (const int file : _files) ::close(file);
     std::error_code ignored;
     std::filesystem::remove_all(_path, ignored);
   }
   Image(const Image&) = delete;
   Image& operator=(const Image&) = delete;
 
-  void write(std::string_view name, std::span<const std::uint8_t> bytes) const {
-    const std::filesystem::path path = image->absolutePath(name);
-    std::filesystem::create_directories(path.parent_path());
-    std::ofstream file(path, std::ofstream::binary | std::ofstream::trunc);
-    file.write(reinterpret_cast<const char*>(bytes.data()),
-               static_cast<std::streamsize>(bytes.size()));
+  // Gives the file of the number these bytes. It stays open, because looking for it takes longer
+  // than all that is done with it.
+  void write(std::size_t number, std::span<const std::uint8_t> bytes) const {
+    if (::ftruncate(_files[number], 0) != 0 || ::pwrite(_files[number], bytes.data(), bytes.size(),
+                                                        0) != static_cast<ssize_t>(bytes.size()))
+      throw std::runtime_error("cannot write a file of " + _path.string());
   }
+
+  std::size_t filesCount() const { return _files.size(); }
 
   std::shared_ptr<const DeviceImage> image;
   std::unique_ptr<deviceimage::DeviceImageServices> services;
 
  private:
+  void _open(const std::filesystem::path& path) {
+    std::filesystem::create_directories(path.parent_path());
+    _files.push_back(::open(path.c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600));
+    if (_files.back() < 0) throw std::runtime_error("cannot open " + path.string());
+  }
+
   std::filesystem::path _path;
+  std::vector<int> _files;
 };
 
 void readSettings(const DeviceImage& image, bool isDictionary) {
@@ -81,17 +100,9 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
   const DeviceImage& image = *made.image;
   const platform::Services& services = made.services->services();
   if (size == 0) return 0;
-  const std::array names = {std::string(DeviceImage::kDevicePropertiesFile),
-                            std::string(DeviceImage::kProcessDefaultsFile),
-                            std::string(DeviceImage::kRestrictionsFile),
-                            *DeviceImage::preferencesFile(deviceimage::SyncAgent::kApplication),
-                            std::string(DeviceImage::kSettingsFile),
-                            std::string(kBundle) + "/Info.plist",
-                            std::string(DeviceImage::kUsersFile),
-                            std::string(DeviceImage::kGroupsFile)};
-  const std::size_t chosen = data[0] % names.size();
+  const std::size_t chosen = data[0] % made.filesCount();
   const std::span<const std::uint8_t> bytes(data + 1, size - 1);
-  made.write(names[chosen], bytes);
+  made.write(chosen, bytes);
   const propertylist::ReadResult list = propertylist::readPropertyList(bytes);
   const bool isDictionary = list.value && list.value->asDictionary() != nullptr;
   const auto has = [&](std::string_view key) {

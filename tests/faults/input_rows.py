@@ -41,7 +41,7 @@ def fuzzed(_found, _directory, is_full):
     """Every target of fuzz/ for half a minute, or for five minutes each."""
     done = subprocess.run([str(TOP / "fuzz/run"), "25" if is_full else "2.5"], check=False,
                           stdout=subprocess.PIPE, stderr=subprocess.STDOUT, text=True, errors="replace")
-    lines = re.findall(r"^([a-z-]+) +(\d+) runs +(\d+) crashes$", done.stdout, re.MULTILINE)
+    lines = re.findall(r"^([a-z-]+) +(\d+) runs +(\d+) crashes\b", done.stdout, re.MULTILINE)
     for name, runs, crashes in lines:
         print(f"     R2 {name:<14} {runs:>12} runs {crashes:>4} crashes", flush=True)
     bad = [(name, why_crashed(done.stdout, name)) for name, _, crashes in lines if crashes != "0"]
