@@ -2,17 +2,18 @@
 //
 //   fault_injector list COMMAND...
 //       prints "GENERATION NUMBER [PATH]" for each call, with the path that openat is asked for
-//   fault_injector hit GENERATION NUMBER NTH[+] kill|cut|ERRNO COMMAND...
+//   fault_injector hit GENERATION NUMBER NTH[+] kill|cut|swap|ERRNO COMMAND...
 //       hits the NTH call of that number (with "+" all from there on) of the processes of a
 //       generation and prints "hit" when it comes to it
 //
 // Generation 0 is the command's own process, 1 what that one forks, and so on. "kill" sends SIGKILL
-// to the process before the call acts, "cut" to all processes, as when the power goes; else the
-// call does nothing and fails with the errno. The calls are those from the command's execve on.
+// to the process before the call acts, "cut" to all processes, as when the power goes; with "swap"
+// the names A and B of INJECTOR_SWAP=A:B change places before the call acts; else the call does
+// nothing and fails with the errno. The calls are those from the command's execve on.
 //
-// What the command prints is thrown away; with INJECTOR_OUTPUT=F its standard output goes to the
-// file F. The exit status is the command's own, or its signal. The
-// end is that of the last process: one that outlives the command is waited for.
+// What the command prints is thrown away, but with INJECTOR_SHOWS=1; with INJECTOR_OUTPUT=F its
+// standard output goes to the file F. The exit status is the command's own, or its signal. The end
+// is that of the last process: one that outlives the command is waited for.
 //
 // A filter in the processes stops them at the wanted calls alone, so a run is as fast as without.
 // It stays with them, and they are killed when the injector ends. All are loaded at the same
@@ -62,7 +63,8 @@ struct Task {
   long nth = 0;
   bool isLasting = false;
   bool isCut = false;
-  int error = 0;  // 0 kills
+  std::string swapped[2];  // empty unless they change places
+  int error = 0;           // 0 kills
 };
 
 bool installFilter(int call) {
@@ -79,7 +81,8 @@ bool installFilter(int call) {
 
 [[noreturn]] void becomeCommand(int call, char** command) {
   const int null = open("/dev/null", O_RDWR);
-  for (int descriptor = 0; descriptor <= 2; ++descriptor) dup2(null, descriptor);
+  const int last = std::getenv("INJECTOR_SHOWS") != nullptr ? 0 : 2;
+  for (int descriptor = 0; descriptor <= last; ++descriptor) dup2(null, descriptor);
   close(null);
   if (const char* path = std::getenv("INJECTOR_OUTPUT")) {
     const int output = open(path, O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, 0600);
@@ -161,10 +164,18 @@ class Tracer {
     if (_count == _task.nth) std::puts("hit");
     if (_task.isCut)
       for (const auto& [each, number] : _generations) kill(each, SIGKILL);
+    else if (!_task.swapped[0].empty())
+      _swap();
     else if (_task.error == 0)
       kill(process, SIGKILL);
     else
       _fail(process, registers);
+  }
+
+  void _swap() const {
+    if (renameat2(AT_FDCWD, _task.swapped[0].c_str(), AT_FDCWD, _task.swapped[1].c_str(),
+                  RENAME_EXCHANGE) != 0)
+      std::abort();
   }
 
   void _fail(pid_t process, user_regs_struct& registers) const {
@@ -201,6 +212,15 @@ class Tracer {
   std::set<pid_t> _starting;  // told of, and not yet stopped
 };
 
+bool readSwapped(Task& task) {
+  const char* const names = std::getenv("INJECTOR_SWAP");
+  const char* const colon = names != nullptr ? std::strchr(names, ':') : nullptr;
+  if (colon == nullptr || colon == names) return false;
+  task.swapped[0].assign(names, colon);
+  task.swapped[1] = colon + 1;
+  return true;
+}
+
 int run(const Task& task, char** command) {
   const pid_t process = fork();
   if (process < 0) return kUsage;
@@ -227,7 +247,7 @@ int main(int argumentCount, char** arguments) {
   if (argumentCount < 7 || std::string_view(arguments[1]) != "hit") {
     std::fputs(
         "usage: fault_injector list COMMAND...\n"
-        "       fault_injector hit GENERATION NUMBER NTH[+] kill|cut|ERRNO COMMAND...\n",
+        "       fault_injector hit GENERATION NUMBER NTH[+] kill|cut|swap|ERRNO COMMAND...\n",
         stderr);
     return kUsage;
   }
@@ -238,5 +258,6 @@ int main(int argumentCount, char** arguments) {
   task.isLasting = std::string_view(arguments[4]).ends_with('+');
   task.isCut = std::string_view(arguments[5]) == "cut";
   task.error = std::atoi(arguments[5]);  // 0 for the words
+  if (std::string_view(arguments[5]) == "swap" && !readSwapped(task)) return kUsage;
   return run(task, arguments + 6);
 }

@@ -71,9 +71,11 @@ FOR_MEMORY = set("brk mmap munmap mremap mprotect madvise".split())
 
 # A system call: its name, the how-manieth of the name, and the generation of the process.
 Call = collections.namedtuple("Call", "call nth generation")
-# What happens to it: an error's name, SIGKILL, or POWER CUT, which kills all processes.
+# What happens to it: an error's name, SIGKILL, POWER CUT, which kills all processes, or SWAP, before which the two
+# names of INJECTOR_SWAP change places.
 Case = collections.namedtuple("Case", "call fault nth lasting generation", defaults=(0,))
 POWER_CUT = "POWER CUT"
+SWAP = "SWAP"
 
 
 class NotHit(Exception):
@@ -88,6 +90,10 @@ class UnknownCall(Exception):
 def _numbers():
     with open(_NUMBERS, encoding="ascii") as header:
         return {match[1]: int(match[2]) for match in re.finditer(r"#define __NR_(\w+) (\d+)", header.read())}
+
+
+def number_of(call):
+    return _numbers()[call]
 
 
 def name_of(case):
@@ -134,8 +140,8 @@ def errors(calls, lasting=False):
 
 def injection(case):
     """What goes in front of a command, which then prints "hit" when the fault has come."""
-    how = {"SIGKILL": "kill", POWER_CUT: "cut"}.get(case.fault) or str(getattr(errno, case.fault))
-    return [INJECTOR, "hit", str(case.generation), str(_numbers()[case.call]),
+    how = {"SIGKILL": "kill", POWER_CUT: "cut", SWAP: "swap"}.get(case.fault) or str(getattr(errno, case.fault))
+    return [INJECTOR, "hit", str(case.generation), str(number_of(case.call)),
             f"{case.nth}{'+' if case.lasting else ''}", how]
 
 

@@ -58,21 +58,29 @@ class SwappedDirectory:
         self.link.rename(self.directory)
         spare.rename(self.link)
 
-    def run(self, program, codes, **meddled):
-        """What is wrong after the program, with the directory back in its place; and whether it was not there."""
+    @property
+    def names(self):
+        """As those who make them change places want them."""
+        return f"{self.directory}:{self.link}"
+
+    def run(self, program, prefix=(), **environment):
+        """The ended program, with the directory back in its place; what is wrong outside; and whether the directory
+        was away."""
         command = self.image.commands()[PROGRAMS.index(program)]
-        done = self.image.run(command, environment=self.image.environment(
-            **self.image.meddled(swap=f"{self.directory}:{self.link}", **meddled)))
+        done = self.image.run(command, prefix=prefix, environment=self.image.environment(**environment))
         if was_away := self.directory.is_symlink():
             self.exchange()
         self.link.unlink()
-        if done.returncode not in codes:
-            return f"ended with {done.returncode}, not one of {codes}: {done.stderr[-200:]}", was_away
         if MARK.encode() in done.stdout + done.stderr:
-            return "has read what is outside", was_away
-        if contents(self.outside) != self.before:
-            return "has changed what is outside", was_away
-        return wrong_effect(self.image, program, done.returncode), was_away
+            return done, "has read what is outside", was_away
+        return done, "has changed what is outside" if contents(self.outside) != self.before else "", was_away
+
+    def judge(self, program, codes, **environment):
+        """What is wrong after the program, and whether the directory was away."""
+        done, wrong, was_away = self.run(program, **environment)
+        if not wrong and done.returncode not in codes:
+            wrong = f"ended with {done.returncode}, not one of {codes}: {done.stderr[-200:]}"
+        return wrong or wrong_effect(self.image, program, done.returncode), was_away
 
 
 def wrong_effect(image, program, code):
@@ -101,7 +109,8 @@ def swapped_at_openings(name, program):
             swapped = SwappedDirectory(image, name)
             if begins_with_link:
                 swapped.exchange()
-            wrong, _ = swapped.run(program, AT_OPENINGS[name][PROGRAMS.index(program)])
+            wrong, _ = swapped.judge(program, AT_OPENINGS[name][PROGRAMS.index(program)],
+                                     **image.meddled(swap=swapped.names))
             if wrong:
                 return f"{'link' if begins_with_link else 'directory'} first: {wrong}"
         return ""
@@ -111,7 +120,8 @@ def swapped_at_openings(name, program):
 def swapped_at(call, name, program):
     def case(image):
         code = 1 if (call, name, program) in MEETS_THE_LINK else 0
-        wrong, was_away = SwappedDirectory(image, name).run(program, {code}, swap_at=call)
+        swapped = SwappedDirectory(image, name)
+        wrong, was_away = swapped.judge(program, {code}, **image.meddled(swap=swapped.names, swap_at=call))
         return wrong or ("" if was_away else "nothing has changed places")
     return case
 
