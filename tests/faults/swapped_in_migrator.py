@@ -9,24 +9,35 @@ import sqlite3
 
 import matrix
 from hostile_image import PROGRAMS
-from settings_image import PREFERENCES
+from settings_image import NAME, PREFERENCES
 from swapped_names import CONTACTS, SwappedDirectory
 
 CHILD = 1  # the migrator's generation
 # What comes of the account Q1 and its two records: the exit code of the host, which looks at what the migrator has
-# done; whether the account has gone; and the exit code of the next run, which nobody disturbs.
-Outcome = collections.namedtuple("Outcome", "code has_gone next_code")
+# done; whether the account has gone; the exit code of the next run, which nobody disturbs; and whether the records are
+# local then.
+Outcome = collections.namedtuple("Outcome", "code has_gone next_code are_local", defaults=(True,))
 DONE = Outcome(0, True, 0)
 DONE_UNSEEN = Outcome(5, True, 0)  # the link is still there when the host looks
 NOT_SAVED = Outcome(3, False, 0)
 NOT_SAVED_UNSEEN = Outcome(5, False, 0)
-RECORDS_LEFT = Outcome(5, True, 3)  # for good, in the account's store, because the database was out of reach
-# Where a directory turns into a link before the first, second ... opening of it, and stays one.
+# The records stay in the account's store for good, where the database is out of reach, or nothing tells whose the
+# store is.
+RECORDS_LEFT = Outcome(5, True, 3, False)
+STORE_UNKNOWN = Outcome(3, True, 3, False)
+NOT_RETIRED = Outcome(0, True, 3)  # the same when the records are local already: the store looks as if left
+# Where a directory, or a file, turns into a link before the first, second ... opening of it, and stays one.
 AT_ITS_OPENINGS = {
     PREFERENCES: 7 * [NOT_SAVED_UNSEEN] + [DONE_UNSEEN],  # the last is to bring the directory to the disk
     CONTACTS: 2 * [RECORDS_LEFT],
     "tmp": [NOT_SAVED],
     "etc": 2 * [NOT_SAVED],
+    f"{PREFERENCES}/{NAME}": [NOT_SAVED_UNSEEN] + 3 * [DONE],  # from then on it is only compared, and replaced
+    f"{CONTACTS}/Contacts.sqlite": [RECORDS_LEFT],
+    f"{PREFERENCES}/com.vantor.OTASyncAgent.plist": [STORE_UNKNOWN, NOT_RETIRED],
+    "etc/passwd": [NOT_SAVED],
+    "etc/group": [NOT_SAVED],
+    "System/Library/DeviceProperties.plist": 3 * [DONE],
 }
 AFTER_ITS_OPENINGS = {PREFERENCES: DONE_UNSEEN, CONTACTS: DONE_UNSEEN, "tmp": DONE, "etc": DONE_UNSEEN}
 # Where it turns into the link, or back, before each opening, beginning with the first one or the second one.
@@ -84,7 +95,7 @@ def wrong_records(image, outcome):
             "SELECT account IS NULL, count(DISTINCT uid) || ' of ' || count(*) FROM records"
             " JOIN stores ON stores.id = records.store GROUP BY 1"))
         integrity = database.execute("PRAGMA integrity_check").fetchone()[0]
-    expected = {0: "2 of 2"} if outcome == RECORDS_LEFT else {0: "2 of 2", 1: "2 of 2"}
+    expected = {0: "2 of 2", 1: "2 of 2"} if outcome.are_local else {0: "2 of 2"}
     return "" if counts == expected and integrity == "ok" else f"the records are {counts}, integrity {integrity}"
 
 
@@ -115,10 +126,10 @@ def swapped_before_any_opening(name):
 def opening_of(name, nth):
     """Its number among all openings. The table is to have one case for each."""
     def number(image):
-        last = name.rpartition("/")[2]
-        numbers = [number for number, path in enumerate(paths_opened(image), 1) if path == last]
+        names = [path.rpartition("/")[2] for path in paths_opened(image)]
+        numbers = [number for number, last in enumerate(names, 1) if last == name.rpartition("/")[2]]
         if len(numbers) != len(AT_ITS_OPENINGS[name]):
-            raise AssertionError(f"{name} is opened {len(numbers)} times")
+            raise AssertionError(f"{name} is opened {len(numbers)} times; write all into AT_ITS_OPENINGS")
         return numbers[nth]
     return number
 
@@ -139,4 +150,4 @@ CASES = {
        for nth, outcome in enumerate(outcomes, 1)},
 }
 IN_FULL = {f"a link before each of the migrator's openings: {name}": swapped_before_any_opening(name)
-           for name in AT_ITS_OPENINGS}
+           for name in AFTER_ITS_OPENINGS}

@@ -38,7 +38,8 @@ def swapped_name(when):
 
 
 class SwappedDirectory:
-    """A directory of the image, and a link beside it to one outside that is as full."""
+    """A directory of the image, and a link beside it to one outside that is as full; or a file, and a link to a
+    copy."""
 
     def __init__(self, image, name):
         image.reset()
@@ -46,7 +47,7 @@ class SwappedDirectory:
         self.directory, self.link = image.root / name, image.root / "link"
         self.outside = image.outside / "there"
         subprocess.run(["cp", "-a", str(self.directory), str(self.outside)], check=True)
-        for path in self.outside.rglob(image.settings.name):
+        for path in [self.outside] if name.endswith(image.settings.name) else self.outside.rglob(image.settings.name):
             image.write_settings(path, [account("A", DisplayName=MARK)])
         self.before = contents(self.outside)
         self.link.symlink_to(self.outside)
