@@ -18,7 +18,7 @@ FILE = re.compile(r'\s+\.file\s+(\d+)\s+(?:"[^"]*"\s+)?"([^"]*)"')
 LINE = re.compile(r"\s+\.loc\s+(\d+)\s+(\d+)")
 LANDING = re.compile(r"\s+\.uleb128 (\.L\d+)-\.LFB\d+$")
 DESTRUCTOR = re.compile(r"\s+call\s+\S*D[012]Ev(@PLT)?$")
-LIMIT = 60  # seconds of processor time of one test run; a mutant that takes longer is noticed
+LIMIT = 15  # seconds of processor time of one test run; a mutant that takes longer is noticed
 
 Mutant = collections.namedtuple("Mutant", "index line always")
 

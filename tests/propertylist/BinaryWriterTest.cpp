@@ -116,6 +116,22 @@ TEST(BinaryWriter, StoresLongDataOnceWhetherSharedOrEqual) {
   EXPECT_EQ(readBinaryPropertyList(*written).value, value);
 }
 
+TEST(BinaryWriter, StoresLongTextsOnceHoweverManyLieBetween) {
+  Array texts;
+  for (int i = 0; i < 3000; ++i) texts.append(std::to_string(10000 + i) + std::string(95, 'x'));
+  const Value value(Array{texts, texts});
+  const std::optional<Bytes> written = writeBinaryPropertyList(value);
+  EXPECT_LT(written->size(), 350000U);  // 100 bytes and some of each text
+  EXPECT_EQ(readBinaryPropertyList(*written).value, value);
+}
+
+TEST(BinaryWriter, WritesTextsOfOtherLettersOfEachLength) {
+  EXPECT_EQ(objectsOf(Array{"\xC3\xA4\xC3\xB6", "\xC3\xBC"}),
+            "a20102"
+            "6200e400f6"
+            "6100fc");
+}
+
 TEST(BinaryWriter, UsesTheSmallestSizesThatFit) {
   const struct {
     const char* name;
