@@ -72,19 +72,33 @@ std::optional<Bytes> writeBinaryPropertyList(const Value& value) {
 
 std::optional<Bytes> BinaryWriter::write() {
   // Each value takes a byte at least, so a value of more would only be laid out to be refused.
-  if (countValues(_value, kMaximumFileSize) > kMaximumFileSize || !_number()) return std::nullopt;
+  const std::uint64_t values = countValues(_value, kMaximumFileSize);
+  if (values > kMaximumFileSize) return std::nullopt;
+  _makeRoomFor(static_cast<std::size_t>(values));
+  if (!_number()) return std::nullopt;
   _referenceSize = sizeFor(_objects.size() - 1);
   if (_references.size() * _referenceSize > kMaximumFileSize) return std::nullopt;
   _putBytes(kMagic.data(), kMagic.size());
   _offsets.reserve(_objects.size());
-  for (const Object& object : _objects) {
+  for (std::size_t i = 0; i < _objects.size(); ++i) {
+    constexpr std::size_t kAhead = 16;
+    if (i + kAhead < _objects.size()) __builtin_prefetch(_objects[i + kAhead].text);
     _offsets.push_back(_end);
-    if (!_put(object) || _end > kMaximumFileSize) return std::nullopt;
+    if (!_put(_objects[i]) || _end > kMaximumFileSize) return std::nullopt;
   }
   _putOffsetsAndTrailer();
   if (_end > kMaximumFileSize) return std::nullopt;
   _bytes.resize(_end);
   return std::move(_bytes);
+}
+
+// For what so many values need at most, as long as they do not share much.
+void BinaryWriter::_makeRoomFor(std::size_t values) {
+  constexpr std::size_t kMost = std::size_t{1} << 22U;
+  const std::size_t expected = std::min(values, kMost);
+  _objects.reserve(expected);
+  _references.reserve(2 * expected);
+  _texts.makeRoomFor(expected / 2);
 }
 
 // Numbering

@@ -38,6 +38,7 @@ class BinaryWriter {
     Number number = 0;
   };
 
+  void _makeRoomFor(std::size_t values);
   bool _number();
   bool _numberMembers(std::size_t container);
   template <typename Members, typename ValueOf>
