@@ -132,13 +132,13 @@ void ASSBasicAccount::_forcedSetEnabledForDataclass(bool enabled, std::string_vi
   // A set first, because a stored list may hold a dataclass twice; then in a stable order.
   const NameList stored =
       namesOfArray(properties_.find(kAccountEnabledDataclasses)).value_or(NameList());
-  std::set<std::string, std::less<>> dataclasses(stored.begin(), stored.end());
+  std::set<std::string_view> dataclasses(stored.begin(), stored.end());
   if (enabled)
-    dataclasses.emplace(dataclass);
-  else if (const auto found = dataclasses.find(dataclass); found != dataclasses.end())
-    dataclasses.erase(found);
+    dataclasses.insert(dataclass);
+  else
+    dataclasses.erase(dataclass);
   setAccountPropertyForKey(
-      arrayOfStrings(_orderedDataclasses(StringList(dataclasses.begin(), dataclasses.end()))),
+      arrayOfStrings(copiesOf(_orderedNames(NameList(dataclasses.begin(), dataclasses.end())))),
       kAccountEnabledDataclasses);
 }
 

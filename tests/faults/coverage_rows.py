@@ -90,7 +90,7 @@ def outcomes(profile):
                   first, *[word for path in others for word in ("-object", path)]])
     counts = collections.defaultdict(collections.Counter)
     for entry in json.loads(report)["data"][0]["files"]:
-        path = pathlib.Path(entry["filename"]).resolve()
+        path = (BUILD / entry["filename"]).resolve()  # some compiler caches make names relative
         if not path.is_relative_to(TOP):
             continue
         name, text = str(path.relative_to(TOP)), path.read_text(encoding="utf-8").splitlines()
@@ -112,6 +112,9 @@ def coverage(_found, directory, _is_full):
     for group, names in GROUPS.items():
         missed = [(name, *place) for name in names for place, count in sorted(counts[name].items()) if count == 0]
         count = sum(len(counts[name]) for name in names)
+        if count == 0:
+            bad.append((group, "no branches of its files are counted"))
+            continue
         share = 100 * (count - len(missed)) / count
         print(f"     Q1 {group}: {count - len(missed)} of {count} branches, {share:.1f} %", flush=True)
         for name, line, column, outcome in missed:
