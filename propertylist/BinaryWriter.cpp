@@ -21,8 +21,8 @@ namespace {
 
 // Texts and data up to this size are found faster by content than by address and content.
 constexpr std::size_t kShort = 64;
-// Of how many texts the place in memory is remembered. A power of two.
-constexpr std::size_t kRecent = 1024;
+// Of how many texts the place in memory is remembered at most. A power of two.
+constexpr std::size_t kMostRecent = 1024;
 
 // The sizes that offsets and references come in.
 std::size_t sizeFor(std::uint64_t largest) {
@@ -99,12 +99,12 @@ void BinaryWriter::_makeRoomFor(std::size_t values) {
   _objects.reserve(expected);
   _references.reserve(2 * expected);
   _texts.makeRoomFor(expected / 2);
+  _recent.resize(std::min(kMostRecent, std::bit_ceil(expected)));
 }
 
 // Numbering
 
 bool BinaryWriter::_number() {
-  _recent.resize(kRecent);
   if (!_numberOf(_value, 1)) return false;
   for (std::size_t i = 0; i < _objects.size(); ++i) {
     const Value* const value = _objects[i].value;
@@ -184,7 +184,7 @@ std::optional<BinaryWriter::Number> BinaryWriter::_numberOf(const Value& value, 
 // So are most keys, and much of what accounts have in common.
 BinaryWriter::Recent& BinaryWriter::_recentAt(const Text& text) {
   const auto address = reinterpret_cast<std::uintptr_t>(&text);
-  return _recent[(address >> 4U ^ address >> 14U) & (kRecent - 1)];
+  return _recent[(address >> 4U ^ address >> 14U) & (_recent.size() - 1)];
 }
 
 BinaryWriter::Number BinaryWriter::_numberOfText(const Text& text,
