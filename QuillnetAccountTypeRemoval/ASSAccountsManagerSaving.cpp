@@ -81,9 +81,8 @@ Array ASSAccountsManager::_mergedAccounts(const std::vector<Dictionary>& inMemor
         properties, account->originalProperties(),
         stored ? std::optional(stored->propertiesToSave()) : std::nullopt);
     // The list is asked for whether or not tracing is on, and never printed.
-    const NameList enabled = account->_enabledNames().value_or(NameList());
-    if (getASLoggingEnabled())
-      ASLog("%@:%@", account->type(), result, arrayOfStrings(copiesOf(enabled)));
+    account->_askForEnabledNames();
+    if (getASLoggingEnabled()) ASLog("%@:%@", account->type(), result);
     accounts.emplace_back(result);
   }
   return Array(std::move(accounts));

@@ -242,6 +242,8 @@ class ASSBasicAccount : public platform::Describable,
   NameList _supportedNames() const;
   NameList _provisionedNames() const;
   std::optional<NameList> _enabledNames() const;
+  // Asks the platform what enabledDataclasses asks it, for callers that do not look at the answer.
+  void _askForEnabledNames() const;
   static bool _flagOfDataclass(std::string_view dataclass, std::string_view flag);
 
   AccountPtr parentAccount_;

@@ -110,6 +110,15 @@ std::optional<NameList> ASSBasicAccount::_enabledNames() const {
   return _orderedNames(filtered(*stored, _provisionedNames(), true));
 }
 
+void ASSBasicAccount::_askForEnabledNames() const {
+  if (parentAccount_) {
+    _enabledNames();
+    return;
+  }
+  const propertylist::Value* const stored = properties_.find(kAccountEnabledDataclasses);
+  if (stored != nullptr && stored->asArray() != nullptr) _profileRestrictedDataclasses();
+}
+
 StringList ASSBasicAccount::supportedDataclasses() const { return copiesOf(_supportedNames()); }
 
 StringList ASSBasicAccount::provisionedDataclasses() const { return copiesOf(_provisionedNames()); }

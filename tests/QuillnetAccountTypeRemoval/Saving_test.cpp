@@ -266,6 +266,20 @@ TEST_F(Saving, AsksForRestrictionsOncePerAccountWithAListAlsoWhileTracingIsOff) 
   EXPECT_EQ(device.restrictions.calls().size(), 20U);
 }
 
+// A parent's list is looked at first, and the account's own when that is empty.
+TEST_F(Saving, AsksForRestrictionsOfAListedChildAndOfItsParent) {
+  device.writeAccounts({});
+  const AccountsManagerPtr store = ASSAccountsManager::init();
+  const AccountPtr child = ASSBasicAccount::initWithProperties(
+      accountInfo("2", "CalDAV", {{"Enabled Dataclasses", Array{"x"}}}));
+  child->setParentAccount(ASSBasicAccount::initWithProperties(
+      accountInfo("1", "CalDAV", {{"Enabled Dataclasses", Array()}})));
+  store->insertAccount(child);
+  EXPECT_EQ(device.restrictions.calls().size(), 0U);
+  store->saveAllAccounts();
+  EXPECT_EQ(device.restrictions.calls().size(), 10U);
+}
+
 TEST_F(Saving, TakesNoLock) {
   const auto held = device.fileLock.lockByName("AccountMigrationInProgress");
   const std::size_t before = device.fileLock.calls().size();
