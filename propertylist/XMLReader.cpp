@@ -167,7 +167,7 @@ class XMLReader {
 
   // Reads the text of an element into _text, and its end tag.
   bool _readContents(const Tag& tag) {
-    _text.clear();
+    _text = {};
     if (tag.isEmpty) return true;
     if (!_scanner.readText(_text)) return false;
     if (_scanner.acceptEndTag(tag.name)) return true;
@@ -224,7 +224,7 @@ class XMLReader {
   std::vector<Container> _open;
   std::vector<Member> _members;  // of all that are open
   std::optional<Arena::Raw> _top;
-  std::string _text;  // of the element that is read
+  std::string_view _text;  // of the element that is read
   TextTable _keyTable;
   std::vector<Arena::Raw> _keys;
 };

@@ -20,12 +20,11 @@ bool isBlank(char c) { return c == ' ' || c == '\t' || c == '\r' || c == '\n'; }
 bool isPlain(const char* bytes, std::size_t size) {
   unsigned char bad = 0;
   for (std::size_t i = 0; i < size; ++i) {
-    const auto byte = static_cast<unsigned char>(bytes[i]);
-    // Without branches, so that many bytes are looked at together.
-    const unsigned isControl =
+    // Without branches, so that many bytes are looked at together. What is not ASCII is negative.
+    const auto byte = static_cast<signed char>(bytes[i]);
+    bad |= static_cast<unsigned char>(
         static_cast<unsigned>(byte < 0x20) & static_cast<unsigned>(byte != '\t') &
-        static_cast<unsigned>(byte != '\n') & static_cast<unsigned>(byte != '\r');
-    bad = static_cast<unsigned char>(bad | (byte & 0x80U) | isControl);
+        static_cast<unsigned>(byte != '\n') & static_cast<unsigned>(byte != '\r'));
   }
   return bad == 0;
 }
@@ -109,20 +108,24 @@ bool XMLScanner::readProlog() {
 
 bool XMLScanner::_checkCharacters() {
   constexpr std::size_t kBlock = 32;
-  std::size_t next = 0;  // where a block may begin
+  constexpr std::size_t kPart = 8;
   for (std::size_t position = 0; position < _text.size();) {
-    if (position >= next && _text.size() - position >= kBlock) {
-      next = position + kBlock;
-      if (isPlain(_text.data() + position, kBlock)) {
-        position = next;
-        continue;
-      }
+    const char* const next = _text.data() + position;
+    const std::size_t left = _text.size() - position;
+    if (left >= kBlock && isPlain(next, kBlock)) {
+      position += kBlock;
+    } else if (left >= kPart && isPlain(next, kPart)) {
+      position += kPart;
+    } else if (!_checkCharactersUpTo(position + std::min(left, kPart), position)) {
+      return false;
     }
-    const auto byte = static_cast<unsigned char>(_text[position]);
-    if (byte >= 0x20 && byte < 0x80) {
-      ++position;
-      continue;
-    }
+  }
+  return true;
+}
+
+// One by one, up to and with the character that goes to `end` or beyond.
+bool XMLScanner::_checkCharactersUpTo(std::size_t end, std::size_t& position) {
+  while (position < end) {
     const std::size_t at = position;
     const std::optional<char32_t> codePoint = decodeUTF8(_text, position);
     if (!codePoint) return _failAt(at, "not UTF-8");
@@ -256,7 +259,24 @@ bool XMLScanner::acceptEndTag(std::string_view name) {
   return isThere;
 }
 
-bool XMLScanner::readText(std::string& text) {
+bool XMLScanner::readText(std::string_view& text) {
+  const std::size_t start = _at;
+  _at = findSpecial(_text, start);
+  text = _text.substr(start, _at - start);
+  if (_isAtTag()) return true;  // as most are
+  _madeText = text;
+  const bool isGood = _readRestOfText(_madeText);
+  text = _madeText;
+  return isGood;
+}
+
+// Whether there is markup that is neither comment nor section nor instruction.
+bool XMLScanner::_isAtTag() const {
+  return _text.size() - _at >= 2 && _text[_at] == '<' && _text[_at + 1] != '!' &&
+         _text[_at + 1] != '?';
+}
+
+bool XMLScanner::_readRestOfText(std::string& text) {
   while (!isAtEnd()) {
     const std::size_t start = _at;
     _at = findSpecial(_text, start);

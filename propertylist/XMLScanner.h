@@ -39,8 +39,9 @@ class XMLScanner {
   // Reads the end tag of that name when it stands here in its usual form, without blanks. Where it
   // does not, readTag reads what does.
   bool acceptEndTag(std::string_view name);
-  // Reads the text up to the next tag, comments and processing instructions left out.
-  bool readText(std::string& text);
+  // Reads the text up to the next tag, comments and processing instructions left out. The text is
+  // there until the next one is read.
+  bool readText(std::string_view& text);
   bool isAtEnd() const { return _at == _text.size(); }
 
   // Gives the failure its place: where the scanner stands, or where a tag begins. Both false.
@@ -51,6 +52,9 @@ class XMLScanner {
  private:
   bool _failAt(std::size_t at, std::string what);
   bool _checkCharacters();
+  bool _checkCharactersUpTo(std::size_t end, std::size_t& position);
+  bool _isAtTag() const;
+  bool _readRestOfText(std::string& text);
   bool _readDeclaration();
   bool _readDocumentType();
   bool _skipComment();
@@ -68,6 +72,7 @@ class XMLScanner {
 
   std::string_view _text;
   std::size_t _at = 0;
+  std::string _madeText;  // what does not stand in the document as it is
   ReadError _error;
 };
 
