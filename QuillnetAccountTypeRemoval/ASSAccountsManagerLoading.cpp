@@ -26,6 +26,16 @@ AccountPtr accountFromInfo(const Dictionary& info) {
   return ASSBasicAccount::initWithProperties(info);
 }
 
+// What the account answers as its identifier, as a value: the one that the account holds when it is
+// that, which the device-local account's need not be.
+std::optional<Value> sharedName(const ASSBasicAccount& account,
+                                const std::optional<propertylist::Text>& identifier) {
+  if (!identifier) return std::nullopt;
+  const Value* const stored = account.accountPropertyForKey(kAccountIdentifier);
+  const propertylist::Text* const text = stored != nullptr ? stored->asString() : nullptr;
+  return text != nullptr && *text == *identifier ? *stored : Value(std::string_view(*identifier));
+}
+
 }  // namespace
 
 ASSAccountsManager::ASSAccountsManager()
@@ -134,6 +144,7 @@ void ASSAccountsManager::_loadChildren(const AccountPtr& parent,
   _removeChildrenForAccountWithIdentifier(parentIdentifier);
   const Value* children = parent->accountPropertyForKey(kAccountChildAccounts);
   if (children == nullptr || children->asArray() == nullptr) return;
+  const std::optional<Value> parentName = sharedName(*parent, parentIdentifier);
   for (const Value& info : *children->asArray()) {
     const Dictionary* properties = info.asDictionary();
     const AccountPtr child =
@@ -143,12 +154,12 @@ void ASSAccountsManager::_loadChildren(const AccountPtr& parent,
     const Value* identifier =
         properties != nullptr ? properties->find(kAccountIdentifier) : nullptr;
     const bool isNamed = identifier != nullptr && identifier->asString() != nullptr;
-    if (!child || !isNamed || !parentIdentifier) {
+    if (!child || !isNamed || !parentName) {
       platform::logToSystem("Ignoring unknown child account with properties %@", info);
       continue;
     }
     child->setParentAccount(parent);
-    _registerChild(*identifier, child, *parent->accountPropertyForKey(kAccountIdentifier));
+    _registerChild(*identifier, child, *parentName);
   }
 }
 

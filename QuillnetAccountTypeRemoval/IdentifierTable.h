@@ -66,16 +66,16 @@ class IdentifierTable {
     return {_identifiers.data() + entry.begin, entry.size};
   }
   std::size_t _indexOf(std::uint64_t hash, std::string_view identifier) const {
-    return _indexes.find(hash, [&](std::size_t index) {
-      const Entry& entry = _entries[index];
-      return entry.isThere() && _identifierOf(entry) == identifier;
-    });
+    return _indexes.find(
+        hash, [&](std::size_t index) { return _identifierOf(_entries[index]) == identifier; });
   }
+  std::size_t _bytes() const { return _identifiers.size() + _entries.size() * sizeof(Entry); }
   void _forgetRemoved();
 
   std::string _identifiers;
   std::vector<Entry> _entries;
-  std::size_t _removed = 0;  // entries that are not there any more
+  std::size_t _removed = 0;       // entries that are not there any more
+  std::size_t _removedBytes = 0;  // theirs and their identifiers'
   propertylist::TextTable _indexes;
 };
 
@@ -109,7 +109,7 @@ T& IdentifierTable<T>::operator[](std::string_view identifier) {
   const std::uint64_t hash = propertylist::TextTable::hashOf(identifier);
   const std::size_t known = _indexOf(hash, identifier);
   if (known != propertylist::TextTable::kNone) return _entries[known].value;
-  if (_removed > _entries.size() / 2) _forgetRemoved();
+  if (_removedBytes > _bytes() / 2) _forgetRemoved();
   if (identifier.size() >= kRemoved - _identifiers.size()) throw std::bad_alloc();
   _indexes.makeRoomFor(1);
   _identifiers += identifier;
@@ -134,6 +134,8 @@ IdentifierTable<Other> IdentifierTable<T>::withValues(const ValueOf& valueOf) co
   other._identifiers = _identifiers;
   other._indexes = _indexes;
   other._removed = _removed;
+  other._removedBytes = _removed * sizeof(typename IdentifierTable<Other>::Entry);
+  other._removedBytes += _removedBytes - _removed * sizeof(Entry);
   other._entries.reserve(_entries.size());
   for (const Entry& entry : _entries)
     other._entries.push_back(
@@ -143,8 +145,11 @@ IdentifierTable<Other> IdentifierTable<T>::withValues(const ValueOf& valueOf) co
 
 template <typename T>
 void IdentifierTable<T>::remove(std::string_view identifier) {
-  const std::size_t index = _indexOf(propertylist::TextTable::hashOf(identifier), identifier);
+  const std::uint64_t hash = propertylist::TextTable::hashOf(identifier);
+  const std::size_t index = _indexOf(hash, identifier);
   if (index == propertylist::TextTable::kNone) return;
+  _indexes.remove(hash, index);
+  _removedBytes += _entries[index].size + sizeof(Entry);
   _entries[index].size = kRemoved;
   _entries[index].value = T();
   ++_removed;

@@ -83,6 +83,21 @@ void TextTable::add(std::uint64_t hash, std::size_t index) {
   ++_count;
 }
 
+// What lies behind, up to the next free place, moves up unless it would come before where its hash
+// puts it: a find looks at no more than before.
+void TextTable::remove(std::uint64_t hash, std::size_t index) {
+  std::size_t free = hash & _mask;
+  while (_slots[free].indexAndOne != index + 1) free = (free + 1) & _mask;
+  for (std::size_t at = (free + 1) & _mask; _slots[at].indexAndOne != 0; at = (at + 1) & _mask) {
+    const std::size_t first = _slots[at].hash & _mask;
+    if (((at - first) & _mask) < ((at - free) & _mask)) continue;
+    _slots[free] = _slots[at];
+    free = at;
+  }
+  _slots[free] = {};
+  --_count;
+}
+
 void TextTable::_grow(std::size_t least) {
   constexpr std::size_t kFirstSize = 64;
   std::vector<Slot> slots(std::max(kFirstSize, std::bit_ceil(least)));

@@ -37,6 +37,8 @@ class PROPERTYLIST_EXPORT TextTable {
   }
   // Adds what find did not find. `index` is less than 2^32 - 1.
   void add(std::uint64_t hash, std::size_t index);
+  // Takes out what was added with this hash and index.
+  void remove(std::uint64_t hash, std::size_t index);
   // After this so many more can be added, and nothing fails.
   void makeRoomFor(std::size_t more) {
     if (2 * (_count + more) > _slots.size()) _grow(2 * (_count + more));

@@ -2,6 +2,7 @@
 
 #include <gtest/gtest.h>
 
+#include <set>
 #include <string>
 #include <vector>
 
@@ -47,6 +48,32 @@ TEST(IdentifierTable, IsVisitedInTheOrderInWhichTheIdentifiersCame) {
   table.set("a", 2);
   table.set("b", 3);
   EXPECT_EQ(entriesOf(table), (Entries{"b=3", "a=2"}));
+}
+
+// Whatever lies where their hashes put them, and however often it went and came.
+TEST(IdentifierTable, FindsWhatIsThereAfterAnyRemovals) {
+  constexpr int kIdentifiers = 300;
+  Table table;
+  std::set<int> there;
+  unsigned random = 1;
+  for (int step = 0; step < 100'000; ++step) {
+    random = random * 1664525U + 1013904223U;
+    const int number = static_cast<int>(random >> 16U) % kIdentifiers;
+    const std::string identifier(static_cast<std::size_t>(number), 'a');
+    if ((random >> 8U & 1U) != 0) {
+      table.set(identifier, number);
+      there.insert(number);
+    } else {
+      table.remove(identifier);
+      there.erase(number);
+    }
+    ASSERT_EQ(table.contains(identifier), there.contains(number));
+    ASSERT_EQ(table.size(), there.size());
+  }
+  for (int number = 0; number < kIdentifiers; ++number) {
+    const int* const found = table.find(std::string(static_cast<std::size_t>(number), 'a'));
+    ASSERT_EQ(found != nullptr ? *found : -1, there.contains(number) ? number : -1);
+  }
 }
 
 TEST(IdentifierTable, ForgetsWhatIsRemovedAndHasItLastWhenItComesAgain) {

@@ -41,6 +41,22 @@ TEST_F(LoadingChildren, ChildIsAlwaysAPlainRecord) {
   EXPECT_EQ(store->childAccountsByID().at("c")->className(), "ASSBasicAccount");
 }
 
+// Its identifier is always the same, whatever is stored.
+TEST_F(LoadingChildren, OfTheDeviceLocalAccountAreUnderTheIdentifierThatItAnswers) {
+  for (const Value& stored : {Value(5), Value("DeviceLocalAccount"), Value("p")}) {
+    const auto store = OpenStore::ofAccounts(
+        {with(accountInfo("", "OnMyDevice", {{"ChildAccounts", Array{accountInfo("c")}}}),
+              "Identifier", stored),
+         parentInfo("p", {accountInfo("d")})});
+    EXPECT_EQ(store->children(), (Lines{"c of DeviceLocalAccount", "d of p"}));
+    EXPECT_EQ(store->accountWithIdentifier("c"), (*store->allBasicAccounts())[0]);
+    store->deleteAccountWithIdentifier("p");
+    EXPECT_EQ(store->children(), (Lines{"c of DeviceLocalAccount"}));
+    store->deleteAccountWithIdentifier("DeviceLocalAccount");
+    EXPECT_EQ(store->children(), Lines());
+  }
+}
+
 TEST_F(LoadingChildren, IgnoresAndNamesWhatMakesNoRecord) {
   const auto store = OpenStore::ofAccounts(
       {parentInfo("p", {Dictionary{{"Identifier", "c1"}, {"Type", "Fax"}, {"Class", "C"}}, 5,

@@ -1,6 +1,8 @@
 #include <gtest/gtest.h>
 #include <sys/resource.h>
 
+#include <algorithm>
+
 #include "tests/QuillnetAccountTypeRemoval/AccountsDevice.h"
 
 namespace accountsettings {
@@ -56,6 +58,15 @@ TEST_F(ManyAccounts, ReplaceEveryAccountOfAType) {
   EXPECT_EQ(store->childAccountsByID().size(), kAccounts);
 }
 
+// Each time its child goes and comes again, among those of the others.
+TEST_F(ManyAccounts, ThatAreOneAndTheSame) {
+  std::vector<Value> infos(accounts.begin(), accounts.end());
+  infos.insert(infos.end(), 2 * kAccounts, Value(manyAccountsInfo(kAccounts)));
+  const auto store = OpenStore::ofAccounts(Array(std::move(infos)));
+  EXPECT_EQ(store->count(), 3 * kAccounts);
+  EXPECT_EQ(store->childAccountsByID().size(), 2 * (kAccounts + 1));
+}
+
 TEST_F(ManyAccounts, ParentOfTenThousandChildrenLosesThemAll) {
   std::vector<Value> children;
   for (std::size_t i = 0; i < kAccounts; ++i)
@@ -89,6 +100,19 @@ TEST_F(LongSharedText, OfOneChildIsNotCopiedForEachPlaceOfTheChild) {
   const auto store = OpenStore::ofAccounts(
       {accountInfo("p", "CalDAV", {{"ChildAccounts", Array(std::vector<Value>(kPlaces, child))}})});
   EXPECT_EQ(store->childAccountsByID().size(), 1U);
+}
+
+TEST_F(LongSharedText, OfOneChildIsNotKeptForEachTimeItsParentIsLoadedAgain) {
+  const Value child = with(accountInfo("c"), "Identifier", text);
+  const Value parent = accountInfo("p", "CalDAV", {{"ChildAccounts", Array{child}}});
+  std::vector<Value> others;
+  for (std::size_t i = 0; i < 2 * kPlaces; ++i)
+    others.emplace_back(accountInfo("o" + std::to_string(i)));
+  std::vector<Value> accounts(kPlaces, parent);
+  accounts.emplace_back(accountInfo("q", "CalDAV", {{"ChildAccounts", Array(std::move(others))}}));
+  std::rotate(accounts.begin(), accounts.end() - 1, accounts.end());
+  const auto store = OpenStore::ofAccounts(Array(std::move(accounts)));
+  EXPECT_EQ(store->childAccountsByID().size(), 2 * kPlaces + 1);
 }
 
 TEST_F(LongSharedText, OfAParentIsNotCopiedForEachChild) {
