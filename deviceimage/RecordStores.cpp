@@ -4,6 +4,7 @@
 #include <unordered_map>
 
 #include "deviceimage/Database.h"
+#include "deviceimage/KeyedHash.h"
 #include "deviceimage/StoreRows.h"
 
 namespace deviceimage {
@@ -118,7 +119,7 @@ RecordStores::Collections RecordStores::listCollections(Dataclass dataclass, Row
         "(SELECT count(*) FROM records r WHERE r.collection = c.id) "
         "FROM tree JOIN collections c ON c.id = tree.id ORDER BY level, c.id");
     query.bind(store, recordKind(dataclass));
-    std::unordered_map<Row, std::size_t> places;
+    std::unordered_map<Row, std::size_t, KeyedHash> places;
     while (query.step()) {
       Collection collection;
       collection.row = query.integer(0);

@@ -10,6 +10,7 @@
 
 #include "deviceimage/Database.h"
 #include "deviceimage/Dataclass.h"
+#include "deviceimage/KeyedHash.h"
 #include "deviceimage/RecordStores.h"
 
 // The rows of stores and collections in one database. Whatever changes something here runs inside
@@ -72,7 +73,7 @@ class CollectionMap {
   Statement _readSource;
   Statement _find;
   Statement _insert;
-  std::unordered_map<Row, Row> _known;
+  std::unordered_map<Row, Row, KeyedHash> _known;
 };
 
 }  // namespace deviceimage

@@ -6,8 +6,8 @@
 #include <string_view>
 #include <unordered_map>
 
-#include "deviceimage/ContentHash.h"
-#include "propertylist/Writing.h"
+#include "deviceimage/KeyedHash.h"
+#include "host/AccountContents.h"
 
 namespace host {
 namespace {
@@ -22,9 +22,9 @@ Dictionary without(Dictionary account, const std::vector<std::string>& keys) {
 // Finds the accounts of one list in another, each at most once.
 class Finder {
  public:
-  // `accounts` outlives the finder.
+  // Both outlive the finder, and so does what is taken.
   Finder(const std::vector<Dictionary>& accounts, const std::vector<std::string>& correctedKeys)
-      : _accounts(accounts), _correctedKeys(correctedKeys) {
+      : _accounts(accounts), _contents(correctedKeys) {
     for (std::size_t index = 0; index < accounts.size(); ++index)
       _byIdentifier[identifierIn(accounts[index])].indexes.push_back(index);
     _taken.resize(accounts.size());
@@ -32,7 +32,7 @@ class Finder {
 
   std::optional<std::size_t> take(const Dictionary& account) {
     const std::string_view identifier = identifierIn(account);
-    return identifier.empty() ? _takeFrom(_byContent()[_content(account)])
+    return identifier.empty() ? _takeFrom(_byContent()[_contents.of(account)])
                               : _takeFrom(_byIdentifier[identifier]);
   }
 
@@ -61,25 +61,17 @@ class Finder {
 
   // Most lists have no account that is looked for like this.
   std::unordered_map<std::string, Candidates>& _byContent() {
-    if (_contents.empty()) {
+    if (_ofContents.empty()) {
       for (std::size_t index = 0; index < _accounts.size(); ++index)
-        _contents[_content(_accounts[index])].indexes.push_back(index);
+        _ofContents[_contents.of(_accounts[index])].indexes.push_back(index);
     }
-    return _contents;
-  }
-
-  // The same text for the same account, apart from what may be corrected: a hash, because many
-  // accounts may share what is long. What the file form cannot hold has not come from a file.
-  std::string _content(const Dictionary& account) const {
-    const auto bytes = propertylist::writeBinaryPropertyList(without(account, _correctedKeys));
-    if (!bytes) return {};
-    return deviceimage::contentHash({reinterpret_cast<const char*>(bytes->data()), bytes->size()});
+    return _ofContents;
   }
 
   const std::vector<Dictionary>& _accounts;
-  const std::vector<std::string>& _correctedKeys;
-  std::unordered_map<std::string_view, Candidates> _byIdentifier;
-  std::unordered_map<std::string, Candidates> _contents;
+  AccountContents _contents;  // apart from what may be corrected
+  std::unordered_map<std::string_view, Candidates, deviceimage::KeyedHash> _byIdentifier;
+  std::unordered_map<std::string, Candidates> _ofContents;
   std::vector<bool> _taken;
 };
 
@@ -96,15 +88,16 @@ AccountReport reportOf(const Dictionary& account) {
 // Accounts of `after` that `finder` has not found to be one of before.
 void checkAddedAccounts(const std::vector<Dictionary>& after, const Finder& finder,
                         const AccountRights& rights, AccountComparison& comparison) {
-  std::map<std::string, std::size_t> counts;  // by type
-  for (const Dictionary& account : after) ++counts[typeOf(account)];
+  std::map<std::string_view, std::size_t> counts;
+  for (const std::string& type : rights.mayBeAdded)
+    counts[type] = static_cast<std::size_t>(
+        std::count_if(after.begin(), after.end(),
+                      [&](const Dictionary& account) { return typeOf(account) == type; }));
   for (std::size_t index = 0; index < after.size(); ++index) {
     if (finder.isTaken(index)) continue;
     const AccountReport report = reportOf(after[index]);
-    const bool mayCome =
-        counts[report.type] == 1 && std::find(rights.mayBeAdded.begin(), rights.mayBeAdded.end(),
-                                              report.type) != rights.mayBeAdded.end();
-    if (!mayCome)
+    const auto count = counts.find(report.type);
+    if (count == counts.end() || count->second != 1)
       comparison.contradictions.push_back("The " + nameOf(report) + " was not there before.");
   }
 }
@@ -123,6 +116,26 @@ void noteGoneAccount(const Dictionary& account, const AccountReport& report,
         "The " + nameOf(report) + " was not to be retired and is gone from the settings file.");
 }
 
+// Which accounts are not the same as what was found of them. All are compared at once, and one by
+// one only when there is a difference: what many of them share is then compared once.
+std::vector<bool> changedAccounts(const std::vector<Dictionary>& before,
+                                  const std::vector<Dictionary>& after,
+                                  const std::vector<std::optional<std::size_t>>& found,
+                                  const std::vector<std::string>& correctedKeys) {
+  std::vector<bool> changed(before.size());
+  std::vector<propertylist::Value> expected;
+  std::vector<propertylist::Value> present;
+  for (std::size_t index = 0; index < before.size(); ++index) {
+    expected.emplace_back(found[index] ? without(before[index], correctedKeys) : Dictionary());
+    present.emplace_back(found[index] ? without(after[*found[index]], correctedKeys)
+                                      : Dictionary());
+  }
+  if (propertylist::Array(expected) == propertylist::Array(present)) return changed;
+  for (std::size_t index = 0; index < before.size(); ++index)
+    changed[index] = expected[index] != present[index];
+  return changed;
+}
+
 }  // namespace
 
 AccountComparison compareAccounts(const std::vector<Dictionary>& before,
@@ -130,23 +143,27 @@ AccountComparison compareAccounts(const std::vector<Dictionary>& before,
                                   const AccountRights& rights) {
   AccountComparison comparison;
   Finder finder(after, rights.correctedKeys);
+  std::vector<std::optional<std::size_t>> found;  // of each account before
+  for (const Dictionary& account : before) found.push_back(finder.take(account));
+  const std::vector<bool> changed = changedAccounts(before, after, found, rights.correctedKeys);
   std::optional<std::size_t> last;
-  for (const Dictionary& account : before) {
+  for (std::size_t index = 0; index < before.size(); ++index) {
+    const Dictionary& account = before[index];
+    const std::optional<std::size_t> place = found[index];
     AccountReport report = reportOf(account);
-    const std::optional<std::size_t> found = finder.take(account);
     if (selection.covers(account)) {
-      report.outcome = found ? AccountOutcome::kept : AccountOutcome::retired;
-      if (found) comparison.leftBehind.push_back("The " + nameOf(report) + " is still there.");
-    } else if (!found) {
+      report.outcome = place ? AccountOutcome::kept : AccountOutcome::retired;
+      if (place) comparison.leftBehind.push_back("The " + nameOf(report) + " is still there.");
+    } else if (!place) {
       report.outcome = AccountOutcome::dropped;
       noteGoneAccount(account, report, rights, comparison);
     } else {
-      if (without(account, rights.correctedKeys) != without(after[*found], rights.correctedKeys))
+      if (changed[index])
         comparison.contradictions.push_back("The " + nameOf(report) +
                                             " was not to be retired and has changed.");
-      if (last && *found < *last)
+      if (last && *place < *last)
         comparison.contradictions.push_back("The " + nameOf(report) + " has lost its place.");
-      last = found;
+      last = place;
     }
     comparison.accounts.push_back(std::move(report));
   }

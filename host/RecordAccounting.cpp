@@ -5,6 +5,7 @@
 #include <unordered_set>
 #include <utility>
 
+#include "deviceimage/KeyedHash.h"
 #include "host/StoreOwners.h"
 
 namespace host {
@@ -12,8 +13,10 @@ namespace {
 
 using deviceimage::Dataclass;
 using deviceimage::dataclassName;
+using deviceimage::KeyedHash;
 
-using Counts = std::unordered_map<std::string, std::int64_t>;  // by key, see keyOf
+using Counts = std::unordered_map<std::string, std::int64_t, KeyedHash>;  // by key, see keyOf
+using Texts = std::unordered_set<std::string, KeyedHash>;
 
 // Finds an active store of an observation, which must live on.
 class ActiveStores {
@@ -169,10 +172,10 @@ class DataclassAccounting {
   RecordAccounting& _result;
   std::int64_t _before = 0;
   std::int64_t _after = 0;
-  std::unordered_set<std::string> _localBefore;  // keys
-  std::unordered_set<std::string> _localAfter;   // keys
+  Texts _localBefore;  // keys
+  Texts _localAfter;   // keys
   // What the local store had before, and then what came into it account by account.
-  std::unordered_set<std::string> _localUIDs;
+  Texts _localUIDs;
   Counts _fresh;         // what the local store has more than before
   Counts _freshRetired;  // what the retired stores have more than before
 };

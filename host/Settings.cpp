@@ -46,11 +46,12 @@ std::int64_t leadingInteger(std::string_view text) {
 
 Settings readSettings(const deviceimage::DeviceImage& image) {
   Settings settings;
-  const auto read = image.readPropertyList(deviceimage::DeviceImage::kSettingsFile);
-  settings.exists = read.exists;
+  // Before it is read: a file that replaces it in between counts as another one then.
   const deviceimage::Descriptor file(
       image.openFile(deviceimage::DeviceImage::kSettingsFile, O_RDONLY).descriptor);
   if (file.isOpen() && fstat(file.number(), &settings.file) != 0) settings.file = {};
+  const auto read = image.readPropertyList(deviceimage::DeviceImage::kSettingsFile);
+  settings.exists = read.exists;
   const Dictionary* root = read.value ? read.value->asDictionary() : nullptr;
   if (root == nullptr) {
     if (read.exists) settings.error = read.value ? "it holds no dictionary" : read.error;
@@ -74,9 +75,9 @@ bool isSameFile(const struct stat& a, const struct stat& b) {
          a.st_ctim.tv_sec == b.st_ctim.tv_sec && a.st_ctim.tv_nsec == b.st_ctim.tv_nsec;
 }
 
-std::string textUnder(const Dictionary& account, std::string_view key) {
+std::string_view textUnder(const Dictionary& account, std::string_view key) {
   const propertylist::Text* text = propertylist::findString(account, key);
-  return text != nullptr ? *text : std::string();
+  return text != nullptr ? std::string_view(*text) : std::string_view();
 }
 
 std::string nameUnder(const Dictionary& account, std::string_view key) {
@@ -96,7 +97,7 @@ std::int64_t integerValue(const Value* value) {
 }
 
 bool Selection::covers(const Dictionary& account) const {
-  const std::string type = typeOf(account);
+  const std::string_view type = typeOf(account);
   const std::int64_t status = integerValue(account.find(statusKey));
   return std::any_of(rules.begin(), rules.end(), [&](const Rule& rule) {
     return status == rule.status &&
@@ -105,12 +106,12 @@ bool Selection::covers(const Dictionary& account) const {
 }
 
 bool UnkeepableAccounts::covers(const Dictionary& account) const {
-  const auto holds = [](const std::vector<std::string>& list, const std::string& text) {
+  const auto holds = [](const std::vector<std::string>& list, std::string_view text) {
     return std::find(list.begin(), list.end(), text) != list.end();
   };
   if (!holds(types, typeOf(account)) || holds(knownClasses, textUnder(account, "Class")))
     return false;
-  const std::string path = textUnder(account, "AccountPath");
+  const std::string_view path = textUnder(account, "AccountPath");
   return std::none_of(knownPathParts.begin(), knownPathParts.end(), [&](const std::string& part) {
     return path.find(part) != std::string::npos;
   });

@@ -31,12 +31,12 @@ inline constexpr std::int64_t kPresentVersion = 12;
 // Whether both tell of one file that nobody has written or replaced in between.
 bool isSameFile(const struct stat& a, const struct stat& b);
 
-// The text under `key`; empty without one.
-std::string textUnder(const propertylist::Dictionary& account, std::string_view key);
+// The text under `key`, which belongs to the account; empty without one.
+std::string_view textUnder(const propertylist::Dictionary& account, std::string_view key);
 // The same for reports and people, shortened to 1,024 bytes: of a small file very many accounts may
 // share a text of megabytes.
 std::string nameUnder(const propertylist::Dictionary& account, std::string_view key);
-inline std::string typeOf(const propertylist::Dictionary& account) {
+inline std::string_view typeOf(const propertylist::Dictionary& account) {
   return textUnder(account, "Type");
 }
 

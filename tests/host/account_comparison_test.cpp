@@ -3,6 +3,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+using propertylist::Array;
 using propertylist::Dictionary;
 using testing::ElementsAre;
 using testing::HasSubstr;
@@ -151,6 +152,34 @@ TEST(CompareAccounts, TellsLongIdentifiersApartByTheirEnds) {
   EXPECT_THAT(compare({one, two}, {one, two}).contradictions, IsEmpty());
   EXPECT_THAT(outcomes(compare({one, two}, {two})),
               ElementsAre(AccountOutcome::dropped, AccountOutcome::notSelected));
+}
+
+TEST(CompareAccounts, TellsAccountsWithoutIdentifiersApartByTheEndsOfTheirTexts) {
+  const std::string text(3000, 'x');
+  const Dictionary one = {{"Type", "Exchange"}, {"Note", Array{propertylist::Value(text + "1")}}};
+  const Dictionary two = {{"Type", "Exchange"}, {"Note", Array{propertylist::Value(text + "2")}}};
+  EXPECT_THAT(compare({one, two}, {one, two}).contradictions, IsEmpty());
+  EXPECT_THAT(outcomes(compare({one, two}, {two})),
+              ElementsAre(AccountOutcome::dropped, AccountOutcome::notSelected));
+  const Dictionary data = {{"Type", "Exchange"}, {"Note", propertylist::Bytes(3000, 1)}};
+  const Dictionary other = {{"Type", "Exchange"}, {"Note", propertylist::Bytes(3000, 2)}};
+  EXPECT_THAT(outcomes(compare({data, other}, {other})),
+              ElementsAre(AccountOutcome::dropped, AccountOutcome::notSelected));
+}
+
+// Ten gigabytes, were each looked at for itself.
+TEST(CompareAccounts, LooksOnceAtWhatManyAccountsShare) {
+  const propertylist::Value text = std::string(1'000'000, 'x');
+  std::vector<Dictionary> before;
+  std::vector<Dictionary> after;
+  const propertylist::Value again = std::string(*text.asString());
+  for (int number = 0; number < 10'000; ++number) {
+    before.push_back({{"Type", "Exchange"}, {"Number", number}, {"Note", text}});
+    after.push_back({{"Type", "Exchange"}, {"Number", number}, {"Note", again}});
+  }
+  const AccountComparison comparison = compare(before, after);
+  EXPECT_THAT(comparison.contradictions, IsEmpty());
+  EXPECT_EQ(comparison.accounts.size(), 10'000U);
 }
 
 }  // namespace

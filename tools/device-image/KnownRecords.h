@@ -9,6 +9,7 @@
 #include <utility>
 #include <vector>
 
+#include "deviceimage/KeyedHash.h"
 #include "deviceimage/RecordStores.h"
 
 namespace tools {
@@ -35,9 +36,10 @@ class KnownRecords {
 
   deviceimage::RecordStores& _stores;
   deviceimage::Dataclass _dataclass;
-  std::map<deviceimage::Row, Place> _places;                     // by collection
-  std::set<std::pair<Place, std::string>> _contents;             // by hash
-  std::unordered_multimap<std::string, deviceimage::Row> _rows;  // by the UID of all versions
+  std::map<deviceimage::Row, Place> _places;          // by collection
+  std::set<std::pair<Place, std::string>> _contents;  // by hash
+  // By the UID of all versions.
+  std::unordered_multimap<std::string, deviceimage::Row, deviceimage::KeyedHash> _rows;
 };
 
 }  // namespace tools
