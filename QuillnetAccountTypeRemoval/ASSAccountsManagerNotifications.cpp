@@ -49,20 +49,20 @@ Dictionary comparable(Dictionary properties) {
   return properties;
 }
 
-std::set<std::string> affectedDataclasses(AccountChangeType change,
-                                          const std::optional<Dictionary>& original,
-                                          const std::optional<Dictionary>& current) {
+// Views of what both dictionaries hold.
+NameSet affectedDataclasses(AccountChangeType change, const std::optional<Dictionary>& original,
+                            const std::optional<Dictionary>& current) {
   const NameList before = enabledOf(original);
   const NameList now = enabledOf(current);
-  const std::set<std::string> beforeSet(before.begin(), before.end());
-  const std::set<std::string> nowSet(now.begin(), now.end());
+  const NameSet beforeSet(before.begin(), before.end());
+  const NameSet nowSet(now.begin(), now.end());
   if (change == AccountChangeType::deleted) return beforeSet;
   if (change == AccountChangeType::added) return nowSet;
-  std::set<std::string> affected;
-  for (const std::string& dataclass : beforeSet) {
+  NameSet affected;
+  for (const std::string_view dataclass : beforeSet) {
     if (!nowSet.contains(dataclass)) affected.insert(dataclass);
   }
-  for (const std::string& dataclass : nowSet) {
+  for (const std::string_view dataclass : nowSet) {
     if (!beforeSet.contains(dataclass)) affected.insert(dataclass);
   }
   // Any other change concerns every dataclass that is still on; with none on, nobody.
@@ -176,7 +176,7 @@ void ASSAccountsManager::
   const propertylist::Text* type = stringOfEither(current, original, kAccountType);
   const propertylist::Text* identifier = stringOfEither(current, original, kAccountIdentifier);
   std::set<std::string> names;
-  for (const std::string& dataclass : affectedDataclasses(change, original, current)) {
+  for (const std::string_view dataclass : affectedDataclasses(change, original, current)) {
     for (std::string& name : _notifierClassNamesForAccountTypeDataclass(
              type != nullptr ? std::optional(*type) : std::nullopt, dataclass))
       names.insert(std::move(name));

@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <array>
-#include <set>
 
 #include "QuillnetAccountTypeRemoval/ASSBasicAccount.h"
 #include "platform/Services.h"
@@ -27,7 +26,7 @@ class Members {
 
  private:
   const NameList& _names;
-  std::set<std::string_view> _many;
+  NameSet _many;
 };
 
 // The members of `dataclasses` that are (not) among `others`, in order.
@@ -141,7 +140,7 @@ void ASSBasicAccount::_forcedSetEnabledForDataclass(bool enabled, std::string_vi
   // A set first, because a stored list may hold a dataclass twice; then in a stable order.
   const NameList stored =
       namesOfArray(properties_.find(kAccountEnabledDataclasses)).value_or(NameList());
-  std::set<std::string_view> dataclasses(stored.begin(), stored.end());
+  NameSet dataclasses(stored.begin(), stored.end());
   if (enabled)
     dataclasses.insert(dataclass);
   else

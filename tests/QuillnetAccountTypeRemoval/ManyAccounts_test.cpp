@@ -131,5 +131,14 @@ TEST_F(LongSharedText, OfADataclassIsNotCopiedForEachPlaceInTheList) {
   EXPECT_EQ(account->enabledDataclasses(), (StringList{std::string(kAccountDataclassCalendars)}));
 }
 
+// Each place costs what it costs to see that it is the same text.
+TEST_F(LongSharedText, OfADataclassIsNotReadForEachPlaceInTheList) {
+  constexpr std::size_t kManyPlaces = 50'000;
+  const AccountPtr account = ASSBasicAccount::initWithProperties(accountInfo(
+      "a", "CalDAV", {{"Enabled Dataclasses", Array(std::vector<Value>(kManyPlaces, text))}}));
+  account->setEnabledForDataclass(true, kAccountDataclassCalendars);
+  EXPECT_EQ(account->enabledDataclasses(), (StringList{std::string(kAccountDataclassCalendars)}));
+}
+
 }  // namespace
 }  // namespace accountsettings

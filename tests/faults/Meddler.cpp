@@ -6,6 +6,7 @@
 //   MEDDLER_SWAP=A:B    A and B change places before each opening, so that no look at a path holds
 //   MEDDLER_SWAP_AT=C   the same before each "rename", "unlink" or "fchown" (give one) and before
 //                       no opening
+//   MEDDLER_SWAPS=PATH  the file gets a byte for each time that they have changed places
 #include <dlfcn.h>
 #include <fcntl.h>
 #include <sys/stat.h>
@@ -48,6 +49,14 @@ EXPORTED char* tempnam(const char* directory, const char* prefix) {
 
 namespace {
 
+void noteSwap() {
+  static const char* const name = std::getenv("MEDDLER_SWAPS");
+  if (name == nullptr) return;
+  const int file = original<int(const char*, int, ...)>("open")(
+      name, O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0600);
+  if (file < 0 || write(file, "s", 1) != 1 || close(file) != 0) std::abort();
+}
+
 // At one of the calls, given by its name.
 void swapPlacesAt(std::string_view call) {
   static const char* const swapped = std::getenv("MEDDLER_SWAP");
@@ -59,6 +68,7 @@ void swapPlacesAt(std::string_view call) {
                                                  both.substr(colon + 1).c_str(),
                                                  RENAME_EXCHANGE) != 0)
     std::abort();
+  noteSwap();
 }
 
 void replaceByLink(int descriptor, const char* target) {

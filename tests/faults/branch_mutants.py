@@ -149,6 +149,8 @@ def survivors(source, program, directory, workers=2):
 
     with concurrent.futures.ThreadPoolExecutor(workers) as pool:
         results = list(pool.map(one, range(len(mutants))))
+    if None in results:
+        raise SystemExit(f"{source}: {results.count(None)} mutants cannot be built")
     left = [f"line {mutant.line} {'always' if mutant.always else 'never'}"
             for mutant, result in zip(mutants, results) if result is False]
-    return sum(result is not None for result in results), left
+    return len(results), left

@@ -21,10 +21,16 @@ PROGRAMS = ["propertylist_test", "account_settings_test", "platform_test", "loca
             "deviceimage_test"]
 GOAL = 98
 GROUPS = {
-    "readers": ["propertylist/BinaryReader.cpp", "propertylist/BinaryReaderValues.cpp", "propertylist/DateText.cpp",
-                "propertylist/LeafText.cpp", "propertylist/Reading.cpp",
-                "propertylist/UTF8.cpp", "propertylist/XMLReader.cpp", "propertylist/XMLScanner.cpp"],
+    "readers": ["propertylist/Arena.cpp", "propertylist/Arena.h", "propertylist/BinaryReader.cpp",
+                "propertylist/BinaryReader.h", "propertylist/BinaryReaderValues.cpp", "propertylist/DateText.cpp",
+                "propertylist/LeafText.cpp", "propertylist/Reading.cpp", "propertylist/UTF8.cpp",
+                "propertylist/UTF8.h", "propertylist/XMLReader.cpp", "propertylist/XMLScanner.cpp"],
     "writer": ["propertylist/BinaryWriter.cpp", "propertylist/ValueCount.cpp", "propertylist/XMLWriter.cpp"],
+    "values and tables": ["propertylist/Equality.cpp", "propertylist/Storage.h", "propertylist/TextTable.cpp",
+                          "propertylist/TextTable.h", "propertylist/Value.cpp", "propertylist/Value.h",
+                          "QuillnetAccountTypeRemoval/IdentifierTable.h"],
+    "loading and changing": ["QuillnetAccountTypeRemoval/ASSAccountsManagerLoading.cpp",
+                             "QuillnetAccountTypeRemoval/ASSAccountsManagerMutations.cpp"],
     "merge and save": ["QuillnetAccountTypeRemoval/ASSAccountsManagerSaving.cpp",
                        "QuillnetAccountTypeRemoval/SettingsFileWriting.cpp"],
     "migration": ["localdata/ASSDeviceLocalAccountSettingsUI.cpp", "localdata/AccountSettingsUISyncDataController.cpp",
@@ -112,8 +118,8 @@ def coverage(_found, directory, _is_full):
     for group, names in GROUPS.items():
         missed = [(name, *place) for name in names for place, count in sorted(counts[name].items()) if count == 0]
         count = sum(len(counts[name]) for name in names)
-        if count == 0:
-            bad.append((group, "no branches of its files are counted"))
+        if lost := [name for name in names if not counts[name]]:
+            bad.append((group, f"no branches of {', '.join(lost)} are counted"))
             continue
         share = 100 * (count - len(missed)) / count
         print(f"     Q1 {group}: {count - len(missed)} of {count} branches, {share:.1f} %", flush=True)

@@ -110,8 +110,11 @@ def swapped_at_openings(name, program):
             swapped = SwappedDirectory(image, name)
             if begins_with_link:
                 swapped.exchange()
+            swaps = image.outside / "swaps"
             wrong, _ = swapped.judge(program, AT_OPENINGS[name][PROGRAMS.index(program)],
-                                     **image.meddled(swap=swapped.names))
+                                     **image.meddled(swap=swapped.names, swaps=swaps))
+            if not wrong and not swaps.exists():
+                wrong = "nothing has changed places"
             if wrong:
                 return f"{'link' if begins_with_link else 'directory'} first: {wrong}"
         return ""
