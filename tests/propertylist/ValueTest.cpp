@@ -156,6 +156,24 @@ TEST(Value, IsAnEmptyDictionaryAfterItWasMovedFrom) {
   EXPECT_EQ(text, Value(Dictionary()));  // NOLINT(bugprone-use-after-move): this is the rule
 }
 
+TEST(Value, EqualsWhereDataOrAnEmptyDictionaryIsTheSame) {
+  const Value data = Bytes(100, 1);
+  EXPECT_EQ(Value(Array{data, 1}), Value(Array{data, 1}));
+  Dictionary emptied{{"a", 1}};
+  emptied.remove("a");
+  EXPECT_EQ(Value(emptied), Value(Dictionary()));
+  EXPECT_EQ(Dictionary(std::vector<Dictionary::Entry>()), Dictionary());
+  EXPECT_FALSE((Dictionary{{"a", 1}} == Dictionary{{"a", 2}}));
+}
+
+TEST(Dictionary, OfManyKeysHasNothingBehindTheLast) {
+  Dictionary many;
+  for (int number = 100; number < 200; ++number) many.set(std::to_string(number), number);
+  EXPECT_EQ(many.find("999"), nullptr);
+  EXPECT_EQ(many.find("1995"), nullptr);
+  EXPECT_EQ(*many.find("199"), Value(199));
+}
+
 TEST(Value, SharesTheTextThatItWasMadeFrom) {
   const auto text = std::make_shared<const std::string>("shared");
   const Value value(text);
