@@ -1,4 +1,5 @@
 #include <algorithm>
+#include <cstring>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -30,24 +31,31 @@ enum class Element : std::uint8_t {
   data
 };
 
+// Whether a name of the literal's length is that. The length is known to the compiler, so that
+// nothing is called.
+template <std::size_t kSizeAndEnd>
+bool is(std::string_view name, const char (&literal)[kSizeAndEnd]) {  // NOLINT(*-c-arrays)
+  return std::memcmp(name.data(), literal, kSizeAndEnd - 1) == 0;
+}
+
 // By the length first, since no length has more than a few names.
 Element elementOf(std::string_view name) {
   switch (name.size()) {
     case 3:
-      return name == "key" ? Element::key : Element::unknown;
+      return is(name, "key") ? Element::key : Element::unknown;
     case 4:
-      if (name == "dict") return Element::dictionary;
-      if (name == "true") return Element::isTrue;
-      if (name == "date") return Element::date;
-      if (name == "data") return Element::data;
-      return name == "real" ? Element::real : Element::unknown;
+      if (is(name, "dict")) return Element::dictionary;
+      if (is(name, "true")) return Element::isTrue;
+      if (is(name, "date")) return Element::date;
+      if (is(name, "data")) return Element::data;
+      return is(name, "real") ? Element::real : Element::unknown;
     case 5:
-      if (name == "array") return Element::array;
-      return name == "false" ? Element::isFalse : Element::unknown;
+      if (is(name, "array")) return Element::array;
+      return is(name, "false") ? Element::isFalse : Element::unknown;
     case 6:
-      return name == "string" ? Element::string : Element::unknown;
+      return is(name, "string") ? Element::string : Element::unknown;
     case 7:
-      return name == "integer" ? Element::integer : Element::unknown;
+      return is(name, "integer") ? Element::integer : Element::unknown;
     default:
       return Element::unknown;
   }

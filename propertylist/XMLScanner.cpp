@@ -158,6 +158,7 @@ bool XMLScanner::_readDocumentType() {
 bool XMLScanner::skipBlanks() {
   while (true) {
     _readBlanks();
+    if (_isAtTag()) return true;
     if (_isAt("<!--")) {
       if (!_skipComment()) return false;
     } else if (_isAt("<?")) {
