@@ -23,17 +23,19 @@ SAME = {
     # The whole merge gives the same where one side has not changed, and what traces asks whether it is to.
     ("if (inMemory.sharesStorageWith(original)) return onDisk;", "always"): 1,
     ("if (onDisk.sharesStorageWith(original)) return inMemory;", "always"): 1,
-    ("if (getASLoggingEnabled())", "never"): 1,
+    ('if (getASLoggingEnabled()) ASLog("%@:%@", account->type(), result);', "never"): 1,
     # A file that could not be made has no descriptor.
     ("if (_isThere) _descriptor = opened.descriptor;", "never"): 1,
     # What is no letter and begins no name does not continue one either.
     ("return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || c == '_' || c == ':' || byte >= 0x80;", "always"): 2,
     # Words, blocks and single bytes give the same; so does a tag that is read whole. Only time is lost.
     ("for (std::uint64_t word = 0; kFirstIsLowest && text.size() - from >= sizeof word;", "never"): 1,
-    ("if (position >= next && _text.size() - position >= kBlock) {", "always"): 3,
-    ("if (position >= next && _text.size() - position >= kBlock) {", "never"): 1,
-    ("if (isPlain(_text.data() + position, kBlock)) {", "always"): 1,
-    ("if (byte >= 0x20 && byte < 0x80) {", "always"): 2,
+    ("if (left >= kBlock && isPlain(next, kBlock)) {", "always"): 3,
+    ("} else if (left >= kPart && isPlain(next, kPart)) {", "always"): 3,
+    # What is at a tag is at no comment either, and its text stands in the document.
+    ("if (_isAtTag()) return true;", "always"): 1,
+    ("if (_isAtTag()) return true;  // as most are", "always"): 1,
+    ("return _text.size() - _at >= 2 && _text[_at] == '<' && _text[_at + 1] != '!' &&", "always"): 4,
     ('const bool isThere = rest.size() >= size && rest.starts_with("</") && rest[size - 1] == \'>\' &&', "always"): 4,
     ("if (_wide.size() < count * kMostForAUnit) _wide.resize(count * kMostForAUnit);", "never"): 1,
     ("if (known == pair) return true;", "always"): 1,
