@@ -144,6 +144,7 @@ AccountComparison compareAccounts(const std::vector<Dictionary>& before,
   AccountComparison comparison;
   Finder finder(after, rights.correctedKeys);
   std::vector<std::optional<std::size_t>> found;  // of each account before
+  found.reserve(before.size());
   for (const Dictionary& account : before) found.push_back(finder.take(account));
   const std::vector<bool> changed = changedAccounts(before, after, found, rights.correctedKeys);
   std::optional<std::size_t> last;

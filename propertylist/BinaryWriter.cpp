@@ -78,6 +78,7 @@ std::optional<Bytes> BinaryWriter::write() {
   if (!_number()) return std::nullopt;
   _referenceSize = sizeFor(_objects.size() - 1);
   if (_references.size() * _referenceSize > kMaximumFileSize) return std::nullopt;
+  _bytes.resize(_expectedSize());
   _putBytes(kMagic.data(), kMagic.size());
   _offsets.reserve(_objects.size());
   for (std::size_t i = 0; i < _objects.size(); ++i) {
@@ -98,8 +99,14 @@ void BinaryWriter::_makeRoomFor(std::size_t values) {
   const std::size_t expected = std::min(values, kMost);
   _objects.reserve(expected);
   _references.reserve(2 * expected);
-  _texts.makeRoomFor(expected / 2);
+  _texts.makeRoomFor(expected / 4);
   _recent.resize(std::min(kMostRecent, std::bit_ceil(expected)));
+}
+
+// Somewhat more than most files take, so that what is written need not move while it grows: a head
+// of four bytes and an offset of as many for each object, and every eighth letter in UTF-16.
+std::size_t BinaryWriter::_expectedSize() const {
+  return _objects.size() * 8 + _contentBytes / 8 * 9 + _references.size() * _referenceSize;
 }
 
 // Numbering
@@ -205,6 +212,7 @@ BinaryWriter::Number BinaryWriter::_numberOfNewText(const Text& text,
       _texts.find(*hash, [&](std::size_t number) { return *_objects[number].text == text; });
   if (known == TextTable::kNone) {
     known = _add({nullptr, &text});
+    _contentBytes += text.size();
     _texts.add(*hash, known);
   }
   if (text.size() > kShort) _byAddress.emplace(&text, static_cast<Number>(known));
@@ -222,6 +230,7 @@ BinaryWriter::Number BinaryWriter::_numberOfData(const Bytes& data, const Value&
   if (known == TextTable::kNone) {
     known = _add({&value, nullptr});
     _datas.add(hash, known);
+    _contentBytes += data.size();
   }
   if (data.size() > kShort) _byAddress.emplace(&data, static_cast<Number>(known));
   return static_cast<Number>(known);

@@ -39,6 +39,7 @@ class BinaryWriter {
   };
 
   void _makeRoomFor(std::size_t values);
+  std::size_t _expectedSize() const;
   bool _number();
   bool _numberMembers(std::size_t container);
   template <typename Members, typename ValueOf>
@@ -76,6 +77,7 @@ class BinaryWriter {
   std::vector<Recent> _recent;
   Bytes _wide;  // the text that is being put, in UTF-16
   std::vector<std::uint64_t> _offsets;
+  std::size_t _contentBytes = 0;  // of all texts and data
   std::size_t _referenceSize = 1;
   Bytes _bytes;
   std::size_t _end = 0;  // of what is written; _bytes may have room behind it
