@@ -89,7 +89,8 @@ std::size_t mostMemory() {
 class LongSharedText : public ::testing::Test {
  protected:
   static constexpr std::size_t kPlaces = 500;
-  ~LongSharedText() override { EXPECT_LT(mostMemory() - before, std::size_t{200} << 20U); }
+  // The address sanitizer keeps up to 256 MiB of what was given back.
+  ~LongSharedText() override { EXPECT_LT(mostMemory() - before, std::size_t{400} << 20U); }
   AccountsDevice device;
   const Value text = std::string(std::size_t{1} << 20U, 'x');
   const std::size_t before = mostMemory();
