@@ -1,6 +1,8 @@
 // Looking at stores, collections and records.
 #include "deviceimage/RecordStores.h"
 
+#include <sqlite3.h>
+
 #include <unordered_map>
 
 #include "deviceimage/Database.h"
@@ -125,6 +127,8 @@ RecordStores::Collections RecordStores::listCollections(Dataclass dataclass, Row
       collection.row = query.integer(0);
       collection.parent = query.optionalInteger(1);
       if (collection.parent) collection.path = result.collections[places[*collection.parent]].path;
+      if (collection.path.size() == kDeepestFolder)
+        throw DatabaseFailure(SQLITE_CORRUPT, "the folders of the database are nested too deep");
       collection.path.push_back(query.text(2));
       collection.writable = query.boolean(3);
       collection.isDefault = query.boolean(4);

@@ -7,9 +7,6 @@
 namespace deviceimage {
 namespace {
 
-// Folders in folders. Deeper ones, or folders that hold themselves, only a damaged database has.
-constexpr std::size_t kDeepestFolder = 1000;
-
 constexpr std::string_view kFindCollection =
     "SELECT id FROM collections WHERE store = ?1 AND kind = ?2 AND ifnull(parent, 0) = ifnull(?3, "
     "0) "

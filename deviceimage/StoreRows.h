@@ -17,6 +17,9 @@
 // the caller's transaction; every operation may raise DatabaseFailure.
 namespace deviceimage {
 
+// Folders in folders. Deeper ones, or folders that hold themselves, only a damaged database has.
+inline constexpr std::size_t kDeepestFolder = 1000;
+
 // Seconds since 1970 UTC.
 std::int64_t secondsNow();
 

@@ -236,6 +236,22 @@ TEST(ReadOnlyFolders, LeaveTheirNameToNoNewOne) {
   EXPECT_EQ(names, (std::vector<std::string>{"Notes", "Notes 2"}));
 }
 
+TEST(FoldersInFolders, FailAListingWhereTheyAreTooDeep) {
+  const TemporaryImage image;
+  const std::vector<std::string> path(1000, "A");
+  ASSERT_TRUE(image.stores()
+                  .addRecords(Dataclass::bookmarks, "x", std::vector{record("a", "1", 1, path)})
+                  .status.isSuccess());
+  RecordStores stores = image.stores();
+  const Row store = stores.findStore(Dataclass::bookmarks, "x").store->row;
+  EXPECT_EQ(stores.listCollections(Dataclass::bookmarks, store).collections.back().path, path);
+  runSQL(image.path(DeviceImage::databaseFile(platform::BookmarksSyncType)),
+         "INSERT INTO collections (store, kind, parent, name, writable, is_default) "
+         "SELECT store, kind, max(id), 'B', 1, 0 FROM collections");
+  EXPECT_THAT(stores.listCollections(Dataclass::bookmarks, store).status.error.value().description,
+              HasSubstr("nested too deep"));
+}
+
 TEST(FoldersThatHoldOneAnother, FailACopyInsteadOfGoingRoundForEver) {
   const TemporaryImage image;
   ASSERT_TRUE(
