@@ -83,8 +83,8 @@ std::optional<Bytes> BinaryWriter::write() {
   _offsets.reserve(_objects.size());
   for (std::size_t i = 0; i < _objects.size(); ++i) {
     constexpr std::size_t kAhead = 16;
-    if (i + kAhead < _objects.size()) __builtin_prefetch(_objects[i + kAhead].text);
-    _offsets.push_back(_end);
+    if (i + kAhead < _objects.size()) __builtin_prefetch(_objects[i + kAhead].place());
+    _offsets.push_back(static_cast<std::uint32_t>(_end));
     if (!_put(_objects[i]) || _end > kMaximumFileSize) return std::nullopt;
   }
   _putOffsetsAndTrailer();
@@ -99,7 +99,7 @@ void BinaryWriter::_makeRoomFor(std::size_t values) {
   const std::size_t expected = std::min(values, kMost);
   _objects.reserve(expected);
   _references.reserve(2 * expected);
-  _texts.makeRoomFor(expected / 4);
+  _texts.makeRoomFor(expected / 6);
   _recent.resize(std::min(kMostRecent, std::bit_ceil(expected)));
 }
 
@@ -114,16 +114,13 @@ std::size_t BinaryWriter::_expectedSize() const {
 bool BinaryWriter::_number() {
   if (!_numberOf(_value, 1)) return false;
   for (std::size_t i = 0; i < _objects.size(); ++i) {
-    const Value* const value = _objects[i].value;
-    const bool isContainer =
-        value != nullptr && (value->kind() == Kind::array || value->kind() == Kind::dictionary);
-    if (isContainer && !_numberMembers(i)) return false;
+    if (_objects[i].depth > 0 && !_numberMembers(i)) return false;
   }
   return true;
 }
 
 bool BinaryWriter::_numberMembers(std::size_t container) {
-  const Value& value = *_objects[container].value;
+  const Value& value = _objects[container].value();
   const std::uint32_t depth = _objects[container].depth;
   _objects[container].firstReference = static_cast<std::uint32_t>(_references.size());
   if (const Array* const array = value.asArray())
@@ -177,7 +174,7 @@ std::optional<BinaryWriter::Number> BinaryWriter::_numberOf(const Value& value, 
     case Kind::dictionary:
     case Kind::array:
       if (depth > kMaximumDepth) return std::nullopt;
-      return _add({&value, nullptr, 0, depth});
+      return _add(Object(value, static_cast<std::uint16_t>(depth)));
     case Kind::string:
       return _numberOfText(*value.asString(), hash);
     case Kind::data:
@@ -209,9 +206,9 @@ BinaryWriter::Number BinaryWriter::_numberOfNewText(const Text& text,
   }
   if (!hash) hash = TextTable::hashOf(text);
   std::size_t known =
-      _texts.find(*hash, [&](std::size_t number) { return *_objects[number].text == text; });
+      _texts.find(*hash, [&](std::size_t number) { return *_objects[number].text() == text; });
   if (known == TextTable::kNone) {
-    known = _add({nullptr, &text});
+    known = _add(Object(text));
     _contentBytes += text.size();
     _texts.add(*hash, known);
   }
@@ -226,9 +223,9 @@ BinaryWriter::Number BinaryWriter::_numberOfData(const Bytes& data, const Value&
   }
   const std::uint64_t hash = TextTable::hashOf(viewOf(data));
   std::size_t known = _datas.find(
-      hash, [&](std::size_t number) { return *_objects[number].value->asData() == data; });
+      hash, [&](std::size_t number) { return *_objects[number].value().asData() == data; });
   if (known == TextTable::kNone) {
-    known = _add({&value, nullptr});
+    known = _add(Object(value));
     _datas.add(hash, known);
     _contentBytes += data.size();
   }
@@ -242,9 +239,9 @@ std::optional<BinaryWriter::Number> BinaryWriter::_numberOfScalar(
     return std::nullopt;
   if (!hash) hash = hashOfScalar(value);
   std::size_t known =
-      _scalars.find(*hash, [&](std::size_t number) { return *_objects[number].value == value; });
+      _scalars.find(*hash, [&](std::size_t number) { return _objects[number].value() == value; });
   if (known == TextTable::kNone) {
-    known = _add({&value, nullptr});
+    known = _add(Object(value));
     _scalars.add(*hash, known);
   }
   return static_cast<Number>(known);
@@ -259,8 +256,8 @@ BinaryWriter::Number BinaryWriter::_add(const Object& object) {
 
 // False for a text that is not UTF-8.
 bool BinaryWriter::_put(const Object& object) {
-  if (object.text != nullptr) return _putText(*object.text);
-  const Value& value = *object.value;
+  if (object.text() != nullptr) return _putText(*object.text());
+  const Value& value = object.value();
   switch (value.kind()) {
     case Kind::dictionary:
       _putHead(kDictionary, sizeOf(value));
@@ -380,7 +377,7 @@ void BinaryWriter::_putOffsetsAndTrailer() {
   const std::uint64_t table = _end;
   const std::size_t offsetSize = sizeFor(_offsets.back());
   std::uint8_t* room = _room(_offsets.size() * offsetSize);
-  for (const std::uint64_t offset : _offsets) {
+  for (const std::uint32_t offset : _offsets) {
     putBigEndian(room, offset, offsetSize);
     room += offsetSize;
   }

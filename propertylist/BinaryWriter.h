@@ -26,11 +26,22 @@ class BinaryWriter {
  private:
   using Number = std::uint32_t;
   // A text, for a string or a key, or any other value.
-  struct Object {
-    const Value* value;
-    const Text* text;
+  class Object {
+   public:
+    explicit Object(const Text& text) : _isText(true), _content(&text) {}
+    explicit Object(const Value& value, std::uint16_t d = 0) : depth(d), _content(&value) {}
+    // Null when it is another value.
+    const Text* text() const { return _isText ? static_cast<const Text*>(_content) : nullptr; }
+    // It is no text.
+    const Value& value() const { return *static_cast<const Value*>(_content); }
+    const void* place() const { return _content; }
+
     std::uint32_t firstReference = 0;  // of a container, in _references
-    std::uint32_t depth = 0;           // of a container: containers around it and itself
+    std::uint16_t depth = 0;           // of a container: containers around it and itself
+
+   private:
+    bool _isText = false;
+    const void* _content;
   };
   // Where a text stands in memory, and its number; see _recentAt.
   struct Recent {
@@ -75,9 +86,9 @@ class BinaryWriter {
   TextTable _scalars;
   std::unordered_map<const void*, Number> _byAddress;
   std::vector<Recent> _recent;
-  Bytes _wide;  // the text that is being put, in UTF-16
-  std::vector<std::uint64_t> _offsets;
-  std::size_t _contentBytes = 0;  // of all texts and data
+  Bytes _wide;                          // the text that is being put, in UTF-16
+  std::vector<std::uint32_t> _offsets;  // no file is larger than they can tell
+  std::size_t _contentBytes = 0;        // of all texts and data
   std::size_t _referenceSize = 1;
   Bytes _bytes;
   std::size_t _end = 0;  // of what is written; _bytes may have room behind it
