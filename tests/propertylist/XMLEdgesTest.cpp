@@ -43,6 +43,7 @@ TEST(XMLEdges, AreRefusedWithTheReason) {
        "the end of a section that has no beginning"},
       {"unknown entity before the end", "<plist><string>a&x;", "an entity that is not predefined"},
       {"element before the end", "<plist><string>a<b>", "an element inside of a text"},
+      {"reference before the end", "<plist><string>a&lt;b", "the end of the document is missing"},
       {"bracket before the end", "<plist><string>a]", "the end of the document is missing"},
       {"return before the end", "<plist><string>a\r", "the end of the document is missing"},
       {"key that ends as a text", "<plist><dict><key>a</string><true/></dict></plist>",
