@@ -69,13 +69,12 @@ class IdentifierTable {
     return _indexes.find(
         hash, [&](std::size_t index) { return _identifierOf(_entries[index]) == identifier; });
   }
-  std::size_t _bytes() const { return _identifiers.size() + _entries.size() * sizeof(Entry); }
   void _forgetRemoved();
 
   std::string _identifiers;
   std::vector<Entry> _entries;
   std::size_t _removed = 0;       // entries that are not there any more
-  std::size_t _removedBytes = 0;  // theirs and their identifiers'
+  std::size_t _removedBytes = 0;  // of their identifiers
   propertylist::TextTable _indexes;
 };
 
@@ -109,7 +108,10 @@ T& IdentifierTable<T>::operator[](std::string_view identifier) {
   const std::uint64_t hash = propertylist::TextTable::hashOf(identifier);
   const std::size_t known = _indexOf(hash, identifier);
   if (known != propertylist::TextTable::kNone) return _entries[known].value;
-  if (_removedBytes > _bytes() / 2) _forgetRemoved();
+  // What is not there takes more memory than what is.
+  if (_removedBytes + _removed * sizeof(Entry) >
+      (_identifiers.size() + _entries.size() * sizeof(Entry)) / 2)
+    _forgetRemoved();
   if (identifier.size() >= kRemoved - _identifiers.size()) throw std::bad_alloc();
   _indexes.makeRoomFor(1);
   _identifiers += identifier;
@@ -134,8 +136,7 @@ IdentifierTable<Other> IdentifierTable<T>::withValues(const ValueOf& valueOf) co
   other._identifiers = _identifiers;
   other._indexes = _indexes;
   other._removed = _removed;
-  other._removedBytes = _removed * sizeof(typename IdentifierTable<Other>::Entry);
-  other._removedBytes += _removedBytes - _removed * sizeof(Entry);
+  other._removedBytes = _removedBytes;
   other._entries.reserve(_entries.size());
   for (const Entry& entry : _entries)
     other._entries.push_back(
@@ -149,7 +150,7 @@ void IdentifierTable<T>::remove(std::string_view identifier) {
   const std::size_t index = _indexOf(hash, identifier);
   if (index == propertylist::TextTable::kNone) return;
   _indexes.remove(hash, index);
-  _removedBytes += _entries[index].size + sizeof(Entry);
+  _removedBytes += _entries[index].size;
   _entries[index].size = kRemoved;
   _entries[index].value = T();
   ++_removed;

@@ -43,6 +43,7 @@ class Finder {
     std::vector<std::size_t> indexes;
     std::size_t next = 0;
   };
+  using CandidatesByContent = std::unordered_map<std::string, Candidates, deviceimage::KeyedHash>;
 
   static std::string_view identifierIn(const Dictionary& account) {
     const propertylist::Text* text = propertylist::findString(account, "Identifier");
@@ -60,7 +61,7 @@ class Finder {
   }
 
   // Most lists have no account that is looked for like this.
-  std::unordered_map<std::string, Candidates>& _byContent() {
+  CandidatesByContent& _byContent() {
     if (_ofContents.empty()) {
       for (std::size_t index = 0; index < _accounts.size(); ++index)
         _ofContents[_contents.of(_accounts[index])].indexes.push_back(index);
@@ -71,7 +72,7 @@ class Finder {
   const std::vector<Dictionary>& _accounts;
   AccountContents _contents;  // apart from what may be corrected
   std::unordered_map<std::string_view, Candidates, deviceimage::KeyedHash> _byIdentifier;
-  std::unordered_map<std::string, Candidates> _ofContents;
+  CandidatesByContent _ofContents;
   std::vector<bool> _taken;
 };
 

@@ -106,7 +106,8 @@ void BinaryWriter::_makeRoomFor(std::size_t values) {
 // Somewhat more than most files take, so that what is written need not move while it grows: a head
 // of four bytes and an offset of as many for each object, and every eighth letter in UTF-16.
 std::size_t BinaryWriter::_expectedSize() const {
-  return _objects.size() * 8 + _contentBytes / 8 * 9 + _references.size() * _referenceSize;
+  return std::min(kMaximumFileSize, _objects.size() * 8 + _contentBytes / 8 * 9 +
+                                        _references.size() * _referenceSize);
 }
 
 // Numbering

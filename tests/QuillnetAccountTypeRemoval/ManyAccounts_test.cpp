@@ -61,9 +61,9 @@ TEST_F(ManyAccounts, ReplaceEveryAccountOfAType) {
 // Each time its child goes and comes again, among those of the others.
 TEST_F(ManyAccounts, ThatAreOneAndTheSame) {
   std::vector<Value> infos(accounts.begin(), accounts.end());
-  infos.insert(infos.end(), 2 * kAccounts, Value(manyAccountsInfo(kAccounts)));
+  infos.insert(infos.end(), 12 * kAccounts, Value(manyAccountsInfo(kAccounts)));
   const auto store = OpenStore::ofAccounts(Array(std::move(infos)));
-  EXPECT_EQ(store->count(), 3 * kAccounts);
+  EXPECT_EQ(store->count(), 13 * kAccounts);
   EXPECT_EQ(store->childAccountsByID().size(), 2 * (kAccounts + 1));
 }
 
@@ -134,7 +134,7 @@ TEST_F(LongSharedText, OfADataclassIsNotCopiedForEachPlaceInTheList) {
 
 // Each place costs what it costs to see that it is the same text.
 TEST_F(LongSharedText, OfADataclassIsNotReadForEachPlaceInTheList) {
-  constexpr std::size_t kManyPlaces = 50'000;
+  constexpr std::size_t kManyPlaces = 1'000'000;
   const AccountPtr account = ASSBasicAccount::initWithProperties(accountInfo(
       "a", "CalDAV", {{"Enabled Dataclasses", Array(std::vector<Value>(kManyPlaces, text))}}));
   account->setEnabledForDataclass(true, kAccountDataclassCalendars);

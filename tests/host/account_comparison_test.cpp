@@ -167,19 +167,19 @@ TEST(CompareAccounts, TellsAccountsWithoutIdentifiersApartByTheEndsOfTheirTexts)
               ElementsAre(AccountOutcome::dropped, AccountOutcome::notSelected));
 }
 
-// Ten gigabytes, were each looked at for itself.
+// Forty gigabytes on each side, were each looked at for itself.
 TEST(CompareAccounts, LooksOnceAtWhatManyAccountsShare) {
   const propertylist::Value text = std::string(1'000'000, 'x');
   std::vector<Dictionary> before;
   std::vector<Dictionary> after;
   const propertylist::Value again = std::string(*text.asString());
-  for (int number = 0; number < 10'000; ++number) {
+  for (int number = 0; number < 40'000; ++number) {
     before.push_back({{"Type", "Exchange"}, {"Number", number}, {"Note", text}});
     after.push_back({{"Type", "Exchange"}, {"Number", number}, {"Note", again}});
   }
   const AccountComparison comparison = compare(before, after);
   EXPECT_THAT(comparison.contradictions, IsEmpty());
-  EXPECT_EQ(comparison.accounts.size(), 10'000U);
+  EXPECT_EQ(comparison.accounts.size(), 40'000U);
 }
 
 }  // namespace
