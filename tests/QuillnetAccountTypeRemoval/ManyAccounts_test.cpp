@@ -17,6 +17,13 @@ Dictionary manyAccountsInfo(std::size_t i) {
       {{"ChildAccounts", Array{accountInfo("c" + number), accountInfo("d" + number)}}});
 }
 
+// Ends this process when it takes many times the processor time that such a test needs, also with a
+// sanitizer.
+void limitProcessorTime() {
+  constexpr rlimit kSeconds{20, 20};
+  ASSERT_EQ(setrlimit(RLIMIT_CPU, &kSeconds), 0);
+}
+
 // Ten thousand accounts with two children each: an operation that walked every account, or every
 // child, for every account would be felt here.
 class ManyAccounts : public ::testing::Test {
@@ -60,6 +67,7 @@ TEST_F(ManyAccounts, ReplaceEveryAccountOfAType) {
 
 // Each time its child goes and comes again, among those of the others.
 TEST_F(ManyAccounts, ThatAreOneAndTheSame) {
+  limitProcessorTime();
   std::vector<Value> infos(accounts.begin(), accounts.end());
   infos.insert(infos.end(), 12 * kAccounts, Value(manyAccountsInfo(kAccounts)));
   const auto store = OpenStore::ofAccounts(Array(std::move(infos)));
@@ -134,6 +142,7 @@ TEST_F(LongSharedText, OfADataclassIsNotCopiedForEachPlaceInTheList) {
 
 // Each place costs what it costs to see that it is the same text.
 TEST_F(LongSharedText, OfADataclassIsNotReadForEachPlaceInTheList) {
+  limitProcessorTime();
   constexpr std::size_t kManyPlaces = 1'000'000;
   const AccountPtr account = ASSBasicAccount::initWithProperties(accountInfo(
       "a", "CalDAV", {{"Enabled Dataclasses", Array(std::vector<Value>(kManyPlaces, text))}}));
