@@ -20,7 +20,7 @@ Dictionary manyAccountsInfo(std::size_t i) {
 // Ends this process when it takes many times the processor time that such a test needs, also with a
 // sanitizer.
 void limitProcessorTime() {
-  constexpr rlimit kSeconds{20, 20};
+  constexpr rlimit kSeconds{30, 30};
   ASSERT_EQ(setrlimit(RLIMIT_CPU, &kSeconds), 0);
 }
 
