@@ -27,12 +27,14 @@ bool ownerIsTrusted(const struct stat& status) {
   return stat(kThisProgram, &program) == 0 && status.st_uid == program.st_uid;
 }
 
-bool holdsThisProgram(const std::filesystem::path& folder) {
+std::filesystem::path thisProgram() {
   std::error_code error;
   std::filesystem::path program = std::filesystem::read_symlink(kThisProgram, error);
-  if (error) program = "/";  // then every folder below it is looked at
-  const auto [end, ignored] =
-      std::mismatch(folder.begin(), folder.end(), program.begin(), program.end());
+  return error ? "/" : program;  // then every folder below it is looked at
+}
+
+bool holds(const std::filesystem::path& folder, const std::filesystem::path& file) {
+  const auto [end, ignored] = std::mismatch(folder.begin(), folder.end(), file.begin(), file.end());
   return end == folder.end();
 }
 
@@ -69,8 +71,9 @@ std::optional<std::string> whyNotTrusted(const std::string& path, const TrustWor
   if (othersMayWrite(status))
     return path + " may be written by others; take the right from them with chmod go-w.";
   if (!ownerIsTrusted(status)) return path + " belongs to another user" + giveItBack(words);
+  const std::filesystem::path program = thisProgram();
   for (std::filesystem::path above = std::filesystem::path(path).parent_path();
-       !holdsThisProgram(above); above = above.parent_path())
+       !holds(above, program); above = above.parent_path())
     if (auto reason = whyFolderAboveIsNotTrusted(above.string(), words)) return reason;
   return std::nullopt;
 }
