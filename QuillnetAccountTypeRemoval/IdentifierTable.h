@@ -2,6 +2,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <memory>
 #include <new>
 #include <string>
 #include <string_view>
@@ -12,10 +13,17 @@
 
 namespace accountsettings {
 
+// What several IdentifierTables may share.
+struct IdentifierNames {
+  std::string identifiers;  // one behind the other
+  // Of the entries that are there, and of those that were removed while this was shared.
+  propertylist::TextTable indexes;
+};
+
 // What a store knows by identifier. Visited in the order in which the identifiers came; one that
 // was removed and comes again is the last. The identifiers lie one behind the other in one text, so
-// that an entry costs no allocation of its own. Pointers and references are valid until the next
-// set.
+// that an entry costs no allocation of its own; a table that was made from another one shares them
+// with it until either gets a further one. Pointers and references are valid until the next set.
 template <typename T>
 class IdentifierTable {
  public:
@@ -26,7 +34,9 @@ class IdentifierTable {
   // Null when there is nothing under the identifier.
   T* find(std::string_view identifier) {
     const std::size_t index = _indexOf(propertylist::TextTable::hashOf(identifier), identifier);
-    return index != propertylist::TextTable::kNone ? &_entries[index].value : nullptr;
+    return index != propertylist::TextTable::kNone && _entries[index].isThere()
+               ? &_entries[index].value
+               : nullptr;
   }
   const T* find(std::string_view identifier) const {
     return const_cast<IdentifierTable*>(this)->find(identifier);
@@ -53,29 +63,36 @@ class IdentifierTable {
  private:
   template <typename>
   friend class IdentifierTable;
-  // Where the identifier lies in _identifiers, in two numbers of half the usual size, and what is
+  static constexpr std::uint32_t kRemoved = std::uint32_t{1} << 31U;
+  // Where the identifier lies among all of them, in two numbers of half the usual size, and what is
   // under it.
   struct Entry {
     std::uint32_t begin = 0;
-    std::uint32_t size = 0;
+    std::uint32_t sizeAndRemoved = 0;
     T value = T();
-    bool isThere() const { return size != kRemoved; }
+    bool isThere() const { return (sizeAndRemoved & kRemoved) == 0; }
+    std::size_t size() const { return sizeAndRemoved & ~kRemoved; }
   };
-  static constexpr std::uint32_t kRemoved = ~std::uint32_t{0};
   std::string_view _identifierOf(const Entry& entry) const {
-    return {_identifiers.data() + entry.begin, entry.size};
+    return {_names->identifiers.data() + entry.begin, entry.size()};
   }
   std::size_t _indexOf(std::uint64_t hash, std::string_view identifier) const {
-    return _indexes.find(
+    if (!_names) return propertylist::TextTable::kNone;
+    return _names->indexes.find(
         hash, [&](std::size_t index) { return _identifierOf(_entries[index]) == identifier; });
+  }
+  IdentifierNames& _ownNames();
+  // Whether what is not there takes more memory than what is.
+  bool _isMostlyRemoved() const {
+    return _names && _removedBytes + _removed * sizeof(Entry) >
+                         (_names->identifiers.size() + _entries.size() * sizeof(Entry)) / 2;
   }
   void _forgetRemoved();
 
-  std::string _identifiers;
+  std::shared_ptr<IdentifierNames> _names;  // null in a new table
   std::vector<Entry> _entries;
   std::size_t _removed = 0;       // entries that are not there any more
   std::size_t _removedBytes = 0;  // of their identifiers
-  propertylist::TextTable _indexes;
 };
 
 template <typename T>
@@ -103,64 +120,86 @@ class IdentifierTable<T>::Iterator {
   std::size_t _index;
 };
 
+// Its own from now on.
+template <typename T>
+IdentifierNames& IdentifierTable<T>::_ownNames() {
+  if (!_names) {
+    _names = std::make_shared<IdentifierNames>();
+  } else if (_names.use_count() > 1) {
+    _names = std::make_shared<IdentifierNames>(*_names);
+  }
+  return *_names;
+}
+
 template <typename T>
 T& IdentifierTable<T>::operator[](std::string_view identifier) {
   const std::uint64_t hash = propertylist::TextTable::hashOf(identifier);
-  const std::size_t known = _indexOf(hash, identifier);
-  if (known != propertylist::TextTable::kNone) return _entries[known].value;
-  // What is not there takes more memory than what is.
-  if (_removedBytes + _removed * sizeof(Entry) >
-      (_identifiers.size() + _entries.size() * sizeof(Entry)) / 2)
+  std::size_t known = _indexOf(hash, identifier);
+  if (known != propertylist::TextTable::kNone && _entries[known].isThere())
+    return _entries[known].value;
+  if (_isMostlyRemoved()) {
     _forgetRemoved();
-  if (identifier.size() >= kRemoved - _identifiers.size()) throw std::bad_alloc();
-  _indexes.makeRoomFor(1);
-  _identifiers += identifier;
-  _entries.push_back({static_cast<std::uint32_t>(_identifiers.size() - identifier.size()),
-                      static_cast<std::uint32_t>(identifier.size())});
-  _indexes.add(hash, _entries.size() - 1);
+    known = propertylist::TextTable::kNone;
+  }
+  IdentifierNames& names = _ownNames();
+  if (identifier.size() >= kRemoved - names.identifiers.size()) throw std::bad_alloc();
+  names.indexes.makeRoomFor(1);
+  const auto begin = static_cast<std::uint32_t>(names.identifiers.size());
+  names.identifiers += identifier;
+  _entries.push_back({begin, static_cast<std::uint32_t>(identifier.size())});
+  if (known != propertylist::TextTable::kNone) names.indexes.remove(hash, known);
+  names.indexes.add(hash, _entries.size() - 1);
   return _entries.back().value;
 }
 
 template <typename T>
 void IdentifierTable<T>::reserve(std::size_t more) {
   constexpr std::size_t kUsualSize = 36;  // of a UUID
+  IdentifierNames& names = _ownNames();
   _entries.reserve(_entries.size() + more);
-  _identifiers.reserve(_identifiers.size() + more * kUsualSize);
-  _indexes.makeRoomFor(more);
+  names.identifiers.reserve(names.identifiers.size() + more * kUsualSize);
+  names.indexes.makeRoomFor(more);
 }
 
 template <typename T>
 template <typename Other, typename ValueOf>
 IdentifierTable<Other> IdentifierTable<T>::withValues(const ValueOf& valueOf) const {
   IdentifierTable<Other> other;
-  other._identifiers = _identifiers;
-  other._indexes = _indexes;
+  other._names = _names;
   other._removed = _removed;
   other._removedBytes = _removedBytes;
   other._entries.reserve(_entries.size());
   for (const Entry& entry : _entries)
     other._entries.push_back(
-        {entry.begin, entry.size, entry.isThere() ? valueOf(entry.value) : Other()});
+        {entry.begin, entry.sizeAndRemoved, entry.isThere() ? valueOf(entry.value) : Other()});
   return other;
 }
 
+// From an index that is shared nothing is removed: the other table may need it, and a copy could
+// fail.
 template <typename T>
 void IdentifierTable<T>::remove(std::string_view identifier) {
   const std::uint64_t hash = propertylist::TextTable::hashOf(identifier);
   const std::size_t index = _indexOf(hash, identifier);
-  if (index == propertylist::TextTable::kNone) return;
-  _indexes.remove(hash, index);
-  _removedBytes += _entries[index].size;
-  _entries[index].size = kRemoved;
+  if (index == propertylist::TextTable::kNone || !_entries[index].isThere()) return;
+  if (_names.use_count() == 1) _names->indexes.remove(hash, index);
+  _removedBytes += _entries[index].size();
+  _entries[index].sizeAndRemoved |= kRemoved;
   _entries[index].value = T();
   ++_removed;
 }
 
+// Values are moved, because one may be large.
 template <typename T>
 void IdentifierTable<T>::_forgetRemoved() {
   IdentifierTable kept;
-  for (const Entry& entry : _entries) {
-    if (entry.isThere()) kept.set(_identifierOf(entry), entry.value);
+  IdentifierNames& names = kept._ownNames();
+  names.identifiers.reserve(_names->identifiers.size() - _removedBytes);
+  names.indexes.makeRoomFor(size());
+  kept._entries.reserve(size());
+  // From here on nothing fails.
+  for (Entry& entry : _entries) {
+    if (entry.isThere()) kept.set(_identifierOf(entry), std::move(entry.value));
   }
   *this = std::move(kept);
 }

@@ -3,6 +3,7 @@
 
 #include <sqlite3.h>
 
+#include <algorithm>
 #include <unordered_map>
 
 #include "deviceimage/Database.h"
@@ -11,6 +12,9 @@
 
 namespace deviceimage {
 namespace {
+
+// Of the paths of a listing's folders, in bytes. Each has a path of its own.
+constexpr std::size_t kMostOfPaths = std::size_t{256} << 20U;
 
 std::string storeQuery(Dataclass dataclass, std::string_view condition) {
   const std::string visible = dataclass == Dataclass::reminders ? "reminders_visible" : "visible";
@@ -122,6 +126,7 @@ RecordStores::Collections RecordStores::listCollections(Dataclass dataclass, Row
         "FROM tree JOIN collections c ON c.id = tree.id ORDER BY level, c.id");
     query.bind(store, recordKind(dataclass));
     std::unordered_map<Row, std::size_t, KeyedHash> places;
+    std::size_t room = kMostOfPaths;
     while (query.step()) {
       Collection collection;
       collection.row = query.integer(0);
@@ -130,6 +135,11 @@ RecordStores::Collections RecordStores::listCollections(Dataclass dataclass, Row
       if (collection.path.size() == kDeepestFolder)
         throw DatabaseFailure(SQLITE_CORRUPT, "the folders of the database are nested too deep");
       collection.path.push_back(query.text(2));
+      for (const std::string& name : collection.path)
+        room -= std::min(room, sizeof name + name.size());
+      if (room == 0)
+        throw DatabaseFailure(SQLITE_TOOBIG,
+                              "the folders of the database are too many, nested too deep");
       collection.writable = query.boolean(3);
       collection.isDefault = query.boolean(4);
       collection.records = query.integer(5);
@@ -138,6 +148,7 @@ RecordStores::Collections RecordStores::listCollections(Dataclass dataclass, Row
     }
     return platform::Status::success();
   });
+  if (!result.status.isSuccess()) result.collections.clear();
   return result;
 }
 

@@ -14,6 +14,9 @@ constexpr std::string_view kFindCollection =
 constexpr std::string_view kInsertCollection =
     "INSERT INTO collections (store, kind, parent, name, writable) VALUES (?1, ?2, ?3, ?4, ?5)";
 
+constexpr const char* kTooDeep =
+    "the folders of the database are nested too deep, or hold one another";
+
 // What a store's first collection is called.
 std::string_view firstCollectionName(Dataclass dataclass) {
   switch (dataclass) {
@@ -168,22 +171,25 @@ Row CollectionMap::targetOf(Row collection) {
   std::vector<std::pair<Row, Source>> unknown;
   std::optional<Row> next = collection;
   std::optional<Row> target;
-  while (next && !target) {
+  std::size_t depth = 0;
+  while (next) {
     if (const auto known = _known.find(*next); known != _known.end()) {
-      target = known->second;
+      target = known->second.row;
+      depth = known->second.depth;
       break;
     }
-    if (unknown.size() > kDeepestFolder || !_readSource.bind(*next).step())
-      throw DatabaseFailure(SQLITE_CORRUPT, "the folders of the database hold one another");
+    if (unknown.size() == kDeepestFolder || !_readSource.bind(*next).step())
+      throw DatabaseFailure(SQLITE_CORRUPT, kTooDeep);
     Source source{_readSource.optionalInteger(0), _readSource.text(1), _readSource.text(2),
                   _readSource.boolean(3)};
     const Row row = *next;
     next = source.parent;
     unknown.emplace_back(row, std::move(source));
   }
+  if (depth + unknown.size() > kDeepestFolder) throw DatabaseFailure(SQLITE_CORRUPT, kTooDeep);
   for (auto it = unknown.rbegin(); it != unknown.rend(); ++it) {
     target = _findOrMake(it->second, target);
-    _known.emplace(it->first, *target);
+    _known.emplace(it->first, Target{*target, ++depth});
   }
   return *target;
 }

@@ -70,13 +70,17 @@ class CollectionMap {
     std::string name;
     bool writable = true;
   };
+  struct Target {
+    Row row = 0;
+    std::size_t depth = 0;  // 1 for a folder without a parent
+  };
   Row _findOrMake(const Source& source, std::optional<Row> parent);
   Database& _database;
   Row _targetStore;
   Statement _readSource;
   Statement _find;
   Statement _insert;
-  std::unordered_map<Row, Row, KeyedHash> _known;
+  std::unordered_map<Row, Target, KeyedHash> _known;
 };
 
 }  // namespace deviceimage

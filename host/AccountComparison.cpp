@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <map>
 #include <optional>
+#include <span>
 #include <string_view>
 #include <unordered_map>
 
@@ -26,14 +27,14 @@ class Finder {
   Finder(const std::vector<Dictionary>& accounts, const std::vector<std::string>& correctedKeys)
       : _accounts(accounts), _contents(correctedKeys) {
     for (std::size_t index = 0; index < accounts.size(); ++index)
-      _byIdentifier[identifierIn(accounts[index])].indexes.push_back(index);
+      _candidatesOf(identifierIn(accounts[index])).indexes.push_back(index);
     _taken.resize(accounts.size());
   }
 
   std::optional<std::size_t> take(const Dictionary& account) {
     const std::string_view identifier = identifierIn(account);
     return identifier.empty() ? _takeFrom(_byContent()[_contents.of(account)])
-                              : _takeFrom(_byIdentifier[identifier]);
+                              : _takeFrom(_candidatesOf(identifier));
   }
 
   bool isTaken(std::size_t index) const { return _taken[index]; }
@@ -48,6 +49,15 @@ class Finder {
   static std::string_view identifierIn(const Dictionary& account) {
     const propertylist::Text* text = propertylist::findString(account, "Identifier");
     return text != nullptr ? std::string_view(*text) : std::string_view();
+  }
+
+  // A small file may give one long identifier to very many accounts: it is looked at once.
+  Candidates& _candidatesOf(std::string_view identifier) {
+    constexpr std::size_t kShort = 64;
+    if (identifier.size() <= kShort) return _byIdentifier[identifier];
+    Candidates*& known = _byPlace[identifier.data()];
+    if (known == nullptr) known = &_byIdentifier[identifier];
+    return *known;
   }
 
   std::optional<std::size_t> _takeFrom(Candidates& candidates) {
@@ -72,6 +82,7 @@ class Finder {
   const std::vector<Dictionary>& _accounts;
   AccountContents _contents;  // apart from what may be corrected
   std::unordered_map<std::string_view, Candidates, deviceimage::KeyedHash> _byIdentifier;
+  std::unordered_map<const char*, Candidates*> _byPlace;  // those of long identifiers
   CandidatesByContent _ofContents;
   std::vector<bool> _taken;
 };
@@ -117,8 +128,25 @@ void noteGoneAccount(const Dictionary& account, const AccountReport& report,
         "The " + nameOf(report) + " was not to be retired and is gone from the settings file.");
 }
 
-// Which accounts are not the same as what was found of them. All are compared at once, and one by
-// one only when there is a difference: what many of them share is then compared once.
+// Which of these values differ, in halves until each difference is found: what many of those that
+// are compared at once share is compared once.
+void noteChanges(std::span<const propertylist::Value> expected,
+                 std::span<const propertylist::Value> present, std::size_t first,
+                 std::vector<bool>& changed) {
+  const auto arrayOf = [](std::span<const propertylist::Value> values) {
+    return propertylist::Array(std::vector(values.begin(), values.end()));
+  };
+  if (arrayOf(expected) == arrayOf(present)) return;
+  if (expected.size() == 1) {
+    changed[first] = true;
+    return;
+  }
+  const std::size_t half = expected.size() / 2;
+  noteChanges(expected.first(half), present.first(half), first, changed);
+  noteChanges(expected.subspan(half), present.subspan(half), first + half, changed);
+}
+
+// Which accounts are not the same as what was found of them.
 std::vector<bool> changedAccounts(const std::vector<Dictionary>& before,
                                   const std::vector<Dictionary>& after,
                                   const std::vector<std::optional<std::size_t>>& found,
@@ -131,9 +159,7 @@ std::vector<bool> changedAccounts(const std::vector<Dictionary>& before,
     present.emplace_back(found[index] ? without(after[*found[index]], correctedKeys)
                                       : Dictionary());
   }
-  if (propertylist::Array(expected) == propertylist::Array(present)) return changed;
-  for (std::size_t index = 0; index < before.size(); ++index)
-    changed[index] = expected[index] != present[index];
+  noteChanges(expected, present, 0, changed);
   return changed;
 }
 

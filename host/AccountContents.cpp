@@ -21,16 +21,15 @@ std::string_view viewOf(const Bytes& data) {
 
 }  // namespace
 
-// What the file form cannot hold has not come from a file.
 std::string AccountContents::of(const Dictionary& account) {
   std::string& content = _contents[account.begin()];
   if (!content.empty()) return content;
-  Dictionary shortened;
+  std::vector<Dictionary::Entry> shortened;
   for (const Dictionary::Entry& entry : account) {
     if (std::find(_ignoredKeys.begin(), _ignoredKeys.end(), entry.key()) == _ignoredKeys.end())
-      shortened.set(_shortText(entry.key()), _short(entry.value()));
+      shortened.emplace_back(_shortText(entry.key()), _short(entry.value()));
   }
-  const auto bytes = propertylist::writeBinaryPropertyList(shortened);
+  const auto bytes = propertylist::writeBinaryPropertyList(Dictionary(std::move(shortened)));
   content = bytes ? deviceimage::contentHash(viewOf(*bytes)) : "none";
   return content;
 }

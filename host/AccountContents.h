@@ -16,7 +16,8 @@ class AccountContents {
   explicit AccountContents(const std::vector<std::string>& ignoredKeys)
       : _ignoredKeys(ignoredKeys) {}
 
-  // The same text for accounts that are equal apart from the ignored keys, and for no others.
+  // The same text for accounts that are equal apart from the ignored keys, and for no others; but
+  // one text for all that no file can hold when what they share is written out.
   std::string of(const propertylist::Dictionary& account);
 
  private:

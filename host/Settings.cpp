@@ -98,10 +98,9 @@ std::int64_t integerValue(const Value* value) {
 
 bool Selection::covers(const Dictionary& account) const {
   const std::string_view type = typeOf(account);
-  const std::int64_t status = integerValue(account.find(statusKey));
   return std::any_of(rules.begin(), rules.end(), [&](const Rule& rule) {
-    return status == rule.status &&
-           std::find(rule.types.begin(), rule.types.end(), type) != rule.types.end();
+    return std::find(rule.types.begin(), rule.types.end(), type) != rule.types.end() &&
+           integerValue(account.find(statusKey)) == rule.status;
   });
 }
 

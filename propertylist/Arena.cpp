@@ -62,7 +62,7 @@ Value Arena::value(const Raw& raw) {
   const bool hasNode = raw.kind == Kind::dictionary || raw.kind == Kind::array ||
                        raw.kind == Kind::string || raw.kind == Kind::data;
   if (hasNode && raw.bits != 0) retain();
-  return {raw.kind, raw.bits, raw.isNegative};
+  return {raw.kind, raw.bits};
 }
 
 }  // namespace propertylist

@@ -35,15 +35,15 @@ class Arena final : public storage::Owner {
 
   // A value as it lies in the arena: its bits, or its node.
   struct Raw {
-    Kind kind = Kind::dictionary;
-    bool isNegative = false;
-    std::uint64_t bits = 0;  // or the address of its node, 0 for an empty container
+    Kind kind = Kind::dictionary;  // or Kind::boolean for an integer below zero, as in Value
+    std::uint64_t bits = 0;        // or the address of its node, 0 for an empty container
 
     storage::Node* node() const { return storage::nodeOf(bits); }
     void setNode(const storage::Node* node) { bits = storage::bitsOf(node); }
   };
 
-  static Raw scalar(Kind kind, std::uint64_t bits, bool isNegative = false);
+  static Raw scalar(Kind kind, std::uint64_t bits);
+  static Raw integer(std::uint64_t bits, bool isNegative);
   Raw newText(std::string_view text);
   // The text of `size` bytes, behind which eight more can be read. `isASCII` tells whether all are.
   Raw newASCII(const char* bytes, std::size_t size, bool& isASCII);
@@ -53,6 +53,7 @@ class Arena final : public storage::Owner {
   Raw newDictionary(std::size_t size);
   static void put(const Raw& array, std::size_t index, const Raw& member);
   static void putKey(const Raw& dictionary, std::size_t index, const Raw& text);
+  // After its key.
   static void putValue(const Raw& dictionary, std::size_t index, const Raw& value);
   static const Text& keyAt(const Raw& dictionary, std::size_t index);
   static std::size_t sizeOf(const Raw& dictionary);
@@ -92,12 +93,15 @@ inline void* Arena::_allocate(std::size_t size) {
   return memory;
 }
 
-inline Arena::Raw Arena::scalar(Kind kind, std::uint64_t bits, bool isNegative) {
+inline Arena::Raw Arena::scalar(Kind kind, std::uint64_t bits) {
   Raw raw;
   raw.kind = kind;
-  raw.isNegative = isNegative;
   raw.bits = bits;
   return raw;
+}
+
+inline Arena::Raw Arena::integer(std::uint64_t bits, bool isNegative) {
+  return scalar(isNegative ? Kind::boolean : Kind::integer, bits);
 }
 
 inline Arena::Raw Arena::newText(std::string_view text) {
@@ -139,19 +143,22 @@ inline Dictionary::Entry* Arena::_entriesOf(const Raw& dictionary) {
 }
 
 inline const Value::TextNode& Arena::_keyOf(const Dictionary::Entry& entry) {
-  return *static_cast<const Value::TextNode*>(entry._key._node());
+  return *static_cast<const Value::TextNode*>(entry._value._key());
 }
 
 inline void Arena::put(const Raw& array, std::size_t index, const Raw& member) {
-  new (_membersOf(array) + index) Value(member.kind, member.bits, member.isNegative);
+  new (_membersOf(array) + index) Value(member.kind, member.bits);
 }
 
 inline void Arena::putKey(const Raw& dictionary, std::size_t index, const Raw& text) {
-  new (&_entriesOf(dictionary)[index]._key) Reference(text.node());
+  new (&_entriesOf(dictionary)[index]._value) Value(Kind::dictionary, 0);
+  _entriesOf(dictionary)[index]._setKey(text.bits);
 }
 
 inline void Arena::putValue(const Raw& dictionary, std::size_t index, const Raw& value) {
-  new (&_entriesOf(dictionary)[index]._value) Value(value.kind, value.bits, value.isNegative);
+  Value& place = _entriesOf(dictionary)[index]._value;
+  place._keyAndTag |= static_cast<std::uint64_t>(value.kind);
+  place._content.bits = value.bits;
 }
 
 inline const Text& Arena::keyAt(const Raw& dictionary, std::size_t index) {
@@ -190,7 +197,7 @@ void Arena::sort(const Raw& dictionary, const IsBefore& isBefore) {
                   sizeof *first);
     ++kept;
   }
-  node.size = kept;
+  node.setSize(kept);
 }
 
 }  // namespace propertylist

@@ -43,13 +43,11 @@ class BinaryReader {
     std::uint32_t values = 1;  // how many values it stands for with all that it holds
     std::uint16_t depth = 0;   // how many containers lie in one another, itself included
     Kind kind = Kind::dictionary;
-    State state : 4 = State::unknown;  // open: some reference in it is still to be followed
-    bool isNegative : 4 = false;
+    State state = State::unknown;  // open: some reference in it is still to be followed
 
-    Arena::Raw raw() const { return Arena::scalar(kind, bitsOrNode, isNegative); }
+    Arena::Raw raw() const { return Arena::scalar(kind, bitsOrNode); }
     void hold(const Arena::Raw& raw) {
       kind = raw.kind;
-      isNegative = raw.isNegative;
       bitsOrNode = raw.bits;
     }
     // Of what holds nothing further.

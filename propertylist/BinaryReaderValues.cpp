@@ -102,7 +102,7 @@ bool BinaryReader::_makeInteger(Object& object, const Header& header) {
       isWide ? _number(header.contents, 8) : (hasHighestBit ? ~std::uint64_t{0} : 0);
   const bool isNegative = high == ~std::uint64_t{0} && hasHighestBit;
   if (high != 0 && !isNegative) return _fail(header.at, "an integer of more than 64 bits");
-  object.finish(Arena::scalar(Kind::integer, low, isNegative));
+  object.finish(Arena::integer(low, isNegative));
   return true;
 }
 

@@ -93,7 +93,7 @@ std::optional<Bytes> BinaryWriter::write() {
   return std::move(_bytes);
 }
 
-// For what so many values need at most, as long as they do not share much.
+// For what most files of so many values need.
 void BinaryWriter::_makeRoomFor(std::size_t values) {
   constexpr std::size_t kMost = std::size_t{1} << 22U;
   const std::size_t expected = std::min(values, kMost);

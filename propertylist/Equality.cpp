@@ -40,8 +40,8 @@ class Value::Comparison {
   bool _compare(const Pair& pair) {
     const Value& a = *pair.a;
     const Value& b = *pair.b;
-    if (a._kind != b._kind) return false;
-    switch (a._kind) {
+    if (a._tag() != b._tag()) return false;
+    switch (a._tag()) {
       case Kind::dictionary:
         return _compareEntries(pair);
       case Kind::array:
@@ -53,7 +53,7 @@ class Value::Comparison {
                _compareBytes(a._dataNode().data, b._dataNode().data, &a._dataNode(),
                              &b._dataNode());
       default:
-        return a._hasBitsOf(b);
+        return a._content.bits == b._content.bits;
     }
   }
 
@@ -79,7 +79,7 @@ class Value::Comparison {
     for (std::size_t i = 0; i < a->size; ++i) {
       const Dictionary::Entry& left = a->first[i];
       const Dictionary::Entry& right = b->first[i];
-      if (!_compareTexts(left._key._node(), right._key._node())) return false;
+      if (!_compareTexts(left._value._key(), right._value._key())) return false;
       _waiting.push_back({&left._value, &right._value, areInside});
     }
     return true;

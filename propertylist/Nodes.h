@@ -21,18 +21,25 @@ struct Value::DataNode : storage::Node {
   Bytes data;
 };
 
-struct Array::Node : storage::Node {
-  Node(storage::Owner* o, const Value* f, std::size_t s) : storage::Node(o), first(f), size(s) {}
-  const Value* first;
-  std::size_t size;
-  bool isShared = false;  // of an arena: its file refers to it more than once
+// What the nodes of arrays and of dictionaries have in common.
+template <typename Member>
+struct ContainerNode : storage::Node {
+  ContainerNode(storage::Owner* o, const Member* f, std::size_t s)
+      : storage::Node(o), first(f), size(s & kMostMembers), isShared(false) {}
+  void setSize(std::size_t s) { size = s & kMostMembers; }
+
+  static constexpr std::size_t kMostMembers = ~std::size_t{0} >> 1U;
+  const Member* first;
+  std::size_t size : 63;
+  bool isShared : 1;  // of an arena: its file refers to it more than once
 };
 
-struct Dictionary::Node : storage::Node {
-  Node(storage::Owner* o, const Entry* f, std::size_t s) : storage::Node(o), first(f), size(s) {}
-  const Entry* first;
-  std::size_t size;
-  bool isShared = false;  // of an arena: its file refers to it more than once
+struct Array::Node : ContainerNode<Value> {
+  using ContainerNode::ContainerNode;
+};
+
+struct Dictionary::Node : ContainerNode<Dictionary::Entry> {
+  using ContainerNode::ContainerNode;
 };
 
 }  // namespace propertylist

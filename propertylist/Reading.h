@@ -55,7 +55,7 @@ PROPERTYLIST_EXPORT FileReadResult readPropertyListFile(const std::string& path)
 // Reads files for whoever asks for one file again and again: one with the same bytes as the list
 // that was read last has the same value, and is not taken apart anew. The file itself is read each
 // time, so what anybody wrote meanwhile is seen. Keeps the bytes of one list, up to
-// kMaximumKeptSize, and its value, of up to kMinimumValueLimit values. For any thread.
+// kMaximumKeptSize, and its value. For any thread.
 class PROPERTYLIST_EXPORT RepeatedReading {
  public:
   static constexpr std::size_t kMaximumKeptSize = std::size_t{1} << 20U;  // bytes

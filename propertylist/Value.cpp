@@ -87,7 +87,7 @@ struct Array::OwnNode final : ContainerOwner, Node {
   explicit OwnNode(std::vector<Value> v) : Node(this, v.data(), v.size()), values(std::move(v)) {}
   void update() {
     first = values.data();
-    size = values.size();
+    setSize(values.size());
   }
   std::vector<Value> values;
 };
@@ -134,7 +134,7 @@ struct Dictionary::OwnNode final : ContainerOwner, Node {
   explicit OwnNode(std::vector<Entry> e) : Node(this, e.data(), e.size()), entries(std::move(e)) {}
   void update() {
     first = entries.data();
-    size = entries.size();
+    setSize(entries.size());
   }
   std::vector<Entry> entries;
 };
@@ -143,11 +143,38 @@ const Dictionary::Node* Dictionary::_dictionary() const {
   return static_cast<const Node*>(_node());
 }
 
-Dictionary::Entry::Entry(std::string_view key, Value value)
-    : _key(Reference(Value::_newText(key))), _value(std::move(value)) {}
+Dictionary::Entry::Entry(std::string_view key, Value value) : _value(std::move(value)) {
+  _setKey(storage::bitsOf(Value::_newText(key)));
+}
+
+Dictionary::Entry::Entry(const Entry& other) noexcept : _value(other._value) {
+  if (other._keyBits() == 0) return;
+  _setKey(other._keyBits());
+  other._value._key()->owner->retain();
+}
+
+Dictionary::Entry::Entry(Entry&& other) noexcept : _value(std::move(other._value)) {
+  _setKey(other._keyBits());
+  other._value._keyAndTag &= Value::kTagBits;
+}
+
+Dictionary::Entry& Dictionary::Entry::operator=(const Entry& other) noexcept {
+  return *this = Entry(other);
+}
+
+Dictionary::Entry& Dictionary::Entry::operator=(Entry&& other) noexcept {
+  Entry taken(std::move(other));
+  std::swap(_value._keyAndTag, taken._value._keyAndTag);
+  std::swap(_value._content.bits, taken._value._content.bits);
+  return *this;
+}
+
+Dictionary::Entry::~Entry() {
+  if (_keyBits() != 0) _value._key()->owner->release();
+}
 
 const Text& Dictionary::Entry::key() const {
-  return static_cast<const Value::TextNode*>(_key._node())->text;
+  return static_cast<const Value::TextNode*>(_value._key())->text;
 }
 
 Dictionary::Dictionary(std::initializer_list<std::pair<std::string_view, Value>> entries)
@@ -233,16 +260,17 @@ Dictionary::OwnNode& Dictionary::_mutable() {
 // Value
 
 Value::Value(Dictionary dictionary)
-    : _kind(Kind::dictionary), _content(Reference(std::move(dictionary))) {}
-Value::Value(Array array) : _kind(Kind::array), _content(Reference(std::move(array))) {}
+    : _keyAndTag(static_cast<std::uint64_t>(Kind::dictionary)),
+      _content(Reference(std::move(dictionary))) {}
+Value::Value(Array array)
+    : _keyAndTag(static_cast<std::uint64_t>(Kind::array)), _content(Reference(std::move(array))) {}
 // NOLINTNEXTLINE(performance-unnecessary-value-param): whoever has a string to give away does
 Value::Value(std::string string) : Value(std::string_view(string)) {}
 Value::Value(std::string_view string) : Value(NodeTag(), Kind::string, _newText(string)) {}
 Value::Value(const char* string) : Value(std::string_view(string)) {}
 Value::Value(std::shared_ptr<const std::string> string)
     : Value(NodeTag(), Kind::string, new SharedTextNode(std::move(string))) {}
-Value::Value(Date date)
-    : Value(Kind::date, std::bit_cast<std::uint64_t>(date.secondsSince2001), false) {}
+Value::Value(Date date) : Value(Kind::date, std::bit_cast<std::uint64_t>(date.secondsSince2001)) {}
 Value::Value(Bytes data) : Value(NodeTag(), Kind::data, new OwnDataNode(std::move(data))) {}
 
 Value& Value::operator=(const Value& other) noexcept {
@@ -251,46 +279,45 @@ Value& Value::operator=(const Value& other) noexcept {
 
 Value& Value::operator=(Value&& other) noexcept {
   Value taken(std::move(other));
-  std::swap(_kind, taken._kind);
-  std::swap(_isNegative, taken._isNegative);
+  const std::uint64_t changed = (_keyAndTag ^ taken._keyAndTag) & kTagBits;
+  _keyAndTag ^= changed;
+  taken._keyAndTag ^= changed;
   std::swap(_content.bits, taken._content.bits);  // of a reference too: it is moved, not counted
   return *this;
 }
 
 const Dictionary* Value::asDictionary() const {
-  return _kind == Kind::dictionary ? &_content.dictionary : nullptr;
+  return _tag() == Kind::dictionary ? &_content.dictionary : nullptr;
 }
 
-const Array* Value::asArray() const { return _kind == Kind::array ? &_content.array : nullptr; }
+const Array* Value::asArray() const { return _tag() == Kind::array ? &_content.array : nullptr; }
 
-const Text* Value::asString() const { return _kind == Kind::string ? &_textNode().text : nullptr; }
+const Text* Value::asString() const { return _tag() == Kind::string ? &_textNode().text : nullptr; }
 
 std::optional<std::int64_t> Value::asInteger() const {
-  if (_kind != Kind::integer) return std::nullopt;
   const auto asSigned = static_cast<std::int64_t>(_content.bits);
-  if ((asSigned < 0) != _isNegative) return std::nullopt;
-  return asSigned;
+  if (_isNegative() || (_tag() == Kind::integer && asSigned >= 0)) return asSigned;
+  return std::nullopt;
 }
 
 std::optional<std::uint64_t> Value::asUnsigned() const {
-  if (_kind != Kind::integer || _isNegative) return std::nullopt;
-  return _content.bits;
+  return _tag() == Kind::integer ? std::optional(_content.bits) : std::nullopt;
 }
 
 std::optional<double> Value::asReal() const {
-  return _kind == Kind::real ? std::optional(std::bit_cast<double>(_content.bits)) : std::nullopt;
+  return _tag() == Kind::real ? std::optional(std::bit_cast<double>(_content.bits)) : std::nullopt;
 }
 
 std::optional<bool> Value::asBoolean() const {
-  return _kind == Kind::boolean ? std::optional(_content.bits != 0) : std::nullopt;
+  return kind() == Kind::boolean ? std::optional(_content.bits != 0) : std::nullopt;
 }
 
 std::optional<Date> Value::asDate() const {
-  return _kind == Kind::date ? std::optional(Date{std::bit_cast<double>(_content.bits)})
-                             : std::nullopt;
+  return _tag() == Kind::date ? std::optional(Date{std::bit_cast<double>(_content.bits)})
+                              : std::nullopt;
 }
 
-const Bytes* Value::asData() const { return _kind == Kind::data ? &_dataNode().data : nullptr; }
+const Bytes* Value::asData() const { return _tag() == Kind::data ? &_dataNode().data : nullptr; }
 
 // Lookups by key and kind
 

@@ -202,7 +202,7 @@ class PROPERTYLIST_EXPORT Value {
     if (_hasNode()) _content.reference.~Reference();
   }
 
-  Kind kind() const { return _kind; }
+  Kind kind() const { return _isNegative() ? Kind::integer : _tag(); }
 
   // What the value holds when it is of that kind, else null or empty. Pointers are valid until the
   // value changes.
@@ -234,22 +234,27 @@ class PROPERTYLIST_EXPORT Value {
   struct OwnDataNode;
   struct NodeTag {};
 
+  // The kind, but Kind::boolean for an integer below zero: its highest bit tells it from booleans.
+  using Tag = Kind;
+  static constexpr std::uint64_t kTagBits = 7;
+
   // Takes over one count of the node's, which is one of this kind; or, for a value that lies in an
   // arena and is never destroyed, none.
   Value(NodeTag /*tag*/, Kind kind, storage::Node* node) noexcept
-      : _kind(kind), _content(Reference(node)) {}
-  Value(Kind kind, std::uint64_t bits, bool isNegative) noexcept
-      : _kind(kind), _isNegative(isNegative), _content(bits) {}
+      : _keyAndTag(static_cast<std::uint64_t>(kind)), _content(Reference(node)) {}
+  Value(Tag tag, std::uint64_t bits) noexcept
+      : _keyAndTag(static_cast<std::uint64_t>(tag)), _content(bits) {}
   static storage::Node* _newText(std::string_view text);
+  Tag _tag() const { return static_cast<Tag>(_keyAndTag & kTagBits); }
+  storage::Node* _key() const { return storage::nodeOf(_keyAndTag & ~kTagBits); }
+  bool _isNegative() const { return _tag() == Kind::boolean && _content.bits >> 63U != 0; }
   bool _hasNode() const {
-    return _kind == Kind::dictionary || _kind == Kind::array || _kind == Kind::string ||
-           _kind == Kind::data;
+    const Tag tag = _tag();
+    return tag == Kind::dictionary || tag == Kind::array || tag == Kind::string ||
+           tag == Kind::data;
   }
   const TextNode& _textNode() const;
   const DataNode& _dataNode() const;
-  bool _hasBitsOf(const Value& other) const {
-    return _content.bits == other._content.bits && _isNegative == other._isNegative;
-  }
 
   // Numbers, booleans and dates by their bits; everything else by reference.
   union Content {
@@ -261,14 +266,22 @@ class PROPERTYLIST_EXPORT Value {
     Dictionary dictionary;
     Array array;
   };
-  Kind _kind = Kind::dictionary;
-  bool _isNegative = false;  // an integer below zero
+  // The tag, and above it the address of its entry's key when it is the value of an entry: nodes
+  // lie at multiples of eight. So an entry takes two words, not three. Copies have no key, and what
+  // is assigned to a value leaves its key alone.
+  std::uint64_t _keyAndTag;
   Content _content;
 };
 
 class PROPERTYLIST_EXPORT Dictionary::Entry {
  public:
   Entry(std::string_view key, Value value);
+  Entry(const Entry& other) noexcept;
+  Entry(Entry&& other) noexcept;
+  Entry& operator=(const Entry& other) noexcept;
+  Entry& operator=(Entry&& other) noexcept;
+  ~Entry();
+
   const Text& key() const;
   const Value& value() const { return _value; }
 
@@ -276,13 +289,13 @@ class PROPERTYLIST_EXPORT Dictionary::Entry {
   friend class Dictionary;
   friend class Value;
   friend class Arena;
-  Entry(Reference key, Value value) : _key(std::move(key)), _value(std::move(value)) {}
-  Reference _key;  // a text
-  Value _value;
+  void _setKey(std::uint64_t node) { _value._keyAndTag |= node; }
+  std::uint64_t _keyBits() const { return _value._keyAndTag & ~Value::kTagBits; }
+  Value _value;  // which carries the key, a counted text; none after the entry was moved from
 };
 
 inline Value::Value(const Value& other) noexcept
-    : _kind(other._kind), _isNegative(other._isNegative), _content(std::uint64_t{0}) {
+    : _keyAndTag(other._keyAndTag & kTagBits), _content(std::uint64_t{0}) {
   if (_hasNode()) {
     new (&_content.reference) Reference(other._content.reference);
   } else {
@@ -292,28 +305,28 @@ inline Value::Value(const Value& other) noexcept
 
 // A value that was moved from is an empty dictionary, so that a string always has a text.
 inline Value::Value(Value&& other) noexcept
-    : _kind(other._kind), _isNegative(other._isNegative), _content(std::uint64_t{0}) {
+    : _keyAndTag(other._keyAndTag & kTagBits), _content(std::uint64_t{0}) {
   if (_hasNode()) {
     new (&_content.reference) Reference(std::move(other._content.reference));
   } else {
     _content.bits = other._content.bits;
     new (&other._content.reference) Reference();
   }
-  other._kind = Kind::dictionary;
+  static_assert(Kind::dictionary == Kind{0});
+  other._keyAndTag &= ~kTagBits;
 }
 
 template <typename T>
-requires std::same_as<T, bool> Value::Value(T boolean)
-    : Value(Kind::boolean, boolean ? 1U : 0U, false) {}
+requires std::same_as<T, bool> Value::Value(T boolean) : Value(Kind::boolean, boolean ? 1U : 0U) {}
 
 template <typename T>
 requires(std::integral<T> && !std::same_as<T, bool> &&
          !std::same_as<T, char>) Value::Value(T integer)
-    : Value(Kind::integer, static_cast<std::uint64_t>(integer), std::cmp_less(integer, 0)) {}
+    : Value(std::cmp_less(integer, 0) ? Kind::boolean : Kind::integer,
+            static_cast<std::uint64_t>(integer)) {}
 
 template <std::floating_point T>
-Value::Value(T real)
-    : Value(Kind::real, std::bit_cast<std::uint64_t>(static_cast<double>(real)), false) {}
+Value::Value(T real) : Value(Kind::real, std::bit_cast<std::uint64_t>(static_cast<double>(real))) {}
 
 // The value under `key` when it is of the named kind, else null or empty: one step for the usual
 // two.

@@ -33,10 +33,10 @@ class Value::Counting {
   };
 
   void _look(const Value& value, bool isInside) {
-    if (value._kind == Kind::dictionary && !value._content.dictionary.empty()) {
+    if (value._tag() == Kind::dictionary && !value._content.dictionary.empty()) {
       const auto& node = *value._content.dictionary._dictionary();
       _enter(node, &node.first->_value, sizeof *node.first, isInside);
-    } else if (value._kind == Kind::array && !value._content.array.empty()) {
+    } else if (value._tag() == Kind::array && !value._content.array.empty()) {
       const auto& node = *value._content.array._array();
       _enter(node, node.first, sizeof *node.first, isInside);
     } else {
@@ -63,7 +63,7 @@ class Value::Counting {
       const std::byte* const place = container.members + container.next * container.stride;
       ++container.next;
       const auto& member = *reinterpret_cast<const Value*>(place);
-      if (member._kind == Kind::dictionary || member._kind == Kind::array)
+      if (member._tag() == Kind::dictionary || member._tag() == Kind::array)
         return _look(member, container.isInArena);
       container.values = std::min(container.values + 1, _limit + 1);
     }

@@ -153,7 +153,7 @@ class XMLReader {
     if (element == Element::integer) {
       const std::optional<IntegerText> integer = parseIntegerText(_text);
       if (!integer) return std::nullopt;
-      return Arena::scalar(Kind::integer, integer->bits, integer->isNegative);
+      return Arena::integer(integer->bits, integer->isNegative);
     }
     if (element == Element::real) return _scalar(Kind::real, parseRealText(_text));
     if (element == Element::date) {

@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include <array>
+#include <map>
 #include <set>
 #include <string>
 #include <vector>
@@ -100,6 +102,97 @@ TEST(IdentifierTable, KeepsTheOthersHoweverOftenOneGoesAndComes) {
   ASSERT_EQ(table.size(), 100U);
   for (int i = 0; i < 100; ++i) EXPECT_EQ(table.at("kept " + std::to_string(i)), i);
   EXPECT_EQ(entriesOf(table).front(), "kept 0=0");
+}
+
+Table sameAs(const Table& table) {
+  return table.withValues<int>([](int value) { return value; });
+}
+
+TEST(IdentifierTable, IsNotChangedByChangesOfATableThatWasMadeFromIt) {
+  Table table;
+  table.set("a", 1);
+  table.set("b", 2);
+  Table other = sameAs(table);
+  other.remove("a");
+  other.set("b", 3);
+  EXPECT_EQ(entriesOf(other), Entries{"b=3"});
+  other.set("c", 4);
+  other.set("a", 5);
+  EXPECT_EQ(entriesOf(other), (Entries{"b=3", "c=4", "a=5"}));
+  EXPECT_EQ(other.at("a"), 5);
+  EXPECT_EQ(entriesOf(table), (Entries{"a=1", "b=2"}));
+  EXPECT_EQ(table.at("a"), 1);
+  EXPECT_EQ(table.find("c"), nullptr);
+}
+
+TEST(IdentifierTable, ChangesWithoutTheTableThatWasMadeFromIt) {
+  Table table;
+  table.set("a", 1);
+  table.set("b", 2);
+  table.remove("b");
+  const Table other = sameAs(table);
+  table.remove("a");
+  table.set("b", 3);
+  table.set("a", 4);
+  EXPECT_EQ(entriesOf(table), (Entries{"b=3", "a=4"}));
+  EXPECT_EQ(entriesOf(other), Entries{"a=1"});
+  EXPECT_EQ(other.find("b"), nullptr);
+}
+
+// Two tables, one of which is made anew from the other one now and then.
+TEST(IdentifierTable, FindsWhatIsThereAfterAnyChangesOfTwoThatShare) {
+  constexpr int kIdentifiers = 40;
+  std::array<Table, 2> tables;
+  std::array<std::map<std::string, int>, 2> models;
+  unsigned random = 1;
+  for (int step = 0; step < 100'000; ++step) {
+    random = random * 1664525U + 1013904223U;
+    const std::string identifier = "account " + std::to_string((random >> 16U) % kIdentifiers);
+    const std::size_t side = random >> 8U & 1U;
+    const unsigned action = random >> 9U & 15U;
+    if (action == 0) {
+      tables[side] = sameAs(tables[1 - side]);
+      models[side] = models[1 - side];
+    } else if (action < 8) {
+      tables[side].set(identifier, step);
+      models[side][identifier] = step;
+    } else {
+      tables[side].remove(identifier);
+      models[side].erase(identifier);
+    }
+    for (std::size_t i = 0; i < 2; ++i) {
+      const int* const found = tables[i].find(identifier);
+      ASSERT_EQ(found != nullptr, models[i].contains(identifier));
+      if (found != nullptr) {
+        ASSERT_EQ(*found, models[i].at(identifier));
+      }
+      ASSERT_EQ(tables[i].size(), models[i].size());
+    }
+  }
+}
+
+// How often a value was copied since the last count.
+struct Counted {
+  Counted() = default;
+  Counted(const Counted& /*other*/) { ++copies; }
+  Counted(Counted&& /*other*/) noexcept {}
+  Counted& operator=(const Counted& /*other*/) {
+    ++copies;
+    return *this;
+  }
+  Counted& operator=(Counted&& /*other*/) noexcept { return *this; }
+  ~Counted() = default;
+  static inline int copies = 0;
+};
+
+TEST(IdentifierTable, CopiesNoValueWhenOneGoesAndComes) {
+  IdentifierTable<Counted> table;
+  for (int i = 0; i < 3; ++i) table.set("kept " + std::to_string(i), Counted());
+  for (int i = 0; i < 1000; ++i) {
+    table.set("passing", Counted());
+    table.remove("passing");
+  }
+  EXPECT_EQ(Counted::copies, 0);
 }
 
 TEST(IdentifierTable, KeepsWhatItHasWhenRoomIsMade) {

@@ -1,3 +1,5 @@
+#include <sys/resource.h>
+
 #include "tests/creators/CreatorsDevice.h"
 
 namespace accountsettings {
@@ -171,6 +173,27 @@ TEST_F(ChangeRecords, AreAppendedAndLeaveTheComparedPropertiesAlone) {
   EXPECT_EQ(table.at("ForContacts"), (Array{"earlier", change(1, "1", "CalDAV", {kContacts})}));
   EXPECT_EQ(original, enabled({kContacts}, {{"IsActive", true}}));
   EXPECT_EQ(current, enabled({kContacts}, {{"ChildAccounts", Array{}}, {"k", 1}}));
+}
+
+// In bytes: the most that this process ever had.
+std::size_t mostMemory() {
+  rusage usage{};
+  getrusage(RUSAGE_SELF, &usage);
+  return static_cast<std::size_t>(usage.ru_maxrss) * 1024;
+}
+
+// A small file may name one long dataclass very often; copied, these would take a gigabyte.
+TEST_F(ChangeRecords, CopyNoDataclassForEachPlaceInTheList) {
+  const Value text = std::string(std::size_t{1} << 20U, 'x');
+  std::vector<Value> places(500, text);
+  places.emplace_back(kContacts);
+  const Properties original =
+      Dictionary{{"Type", "CalDAV"}, {"Enabled Dataclasses", Array(places)}};
+  const Properties current = with(*original, "k", 1);
+  const std::size_t before = mostMemory();
+  EXPECT_EQ(toldOf(Change::modified, original, current), Lines{"ForContacts"});
+  // The address sanitizer keeps up to 256 MiB of what was given back.
+  EXPECT_LT(mostMemory() - before, std::size_t{400} << 20U);
 }
 
 }  // namespace

@@ -248,8 +248,56 @@ TEST(FoldersInFolders, FailAListingWhereTheyAreTooDeep) {
   runSQL(image.path(DeviceImage::databaseFile(platform::BookmarksSyncType)),
          "INSERT INTO collections (store, kind, parent, name, writable, is_default) "
          "SELECT store, kind, max(id), 'B', 1, 0 FROM collections");
+  const RecordStores::Collections listed = stores.listCollections(Dataclass::bookmarks, store);
+  EXPECT_THAT(listed.status.error.value().description, HasSubstr("nested too deep"));
+  EXPECT_THAT(listed.collections, testing::IsEmpty());
+}
+
+// Ten thousand folders, each below one of a name of 100,000 bytes.
+TEST(FoldersInFolders, FailAListingWhoseNamesTakeTooMuch) {
+  const TemporaryImage image;
+  ASSERT_TRUE(image.stores()
+                  .addRecords(Dataclass::bookmarks, "x",
+                              std::vector{record("a", "1", 1, {std::string(100'000, 'A')})})
+                  .status.isSuccess());
+  RecordStores stores = image.stores();
+  const Row store = stores.findStore(Dataclass::bookmarks, "x").store->row;
+  runSQL(image.path(DeviceImage::databaseFile(platform::BookmarksSyncType)),
+         "WITH RECURSIVE n (i) AS (SELECT 1 UNION SELECT i + 1 FROM n WHERE i < 10000) "
+         "INSERT INTO collections (store, kind, parent, name, writable, is_default) "
+         "SELECT c.store, c.kind, c.id, 'B' || i, 1, 0 FROM n, collections c "
+         "WHERE c.name LIKE 'AA%'");
   EXPECT_THAT(stores.listCollections(Dataclass::bookmarks, store).status.error.value().description,
-              HasSubstr("nested too deep"));
+              HasSubstr("too many, nested too deep"));
+}
+
+// Of 1,001 folders in one another, and then of two halves that make 1,001.
+TEST(FoldersInFolders, FailACopyWhereTheyAreTooDeepToBeListed) {
+  const TemporaryImage image;
+  const std::vector<std::string> path(1000, "A");
+  ASSERT_TRUE(image.stores()
+                  .addRecords(Dataclass::bookmarks, "x",
+                              std::vector{record("a", "1", 1, {path.begin(), path.begin() + 500}),
+                                          record("b", "1", 1, path)})
+                  .status.isSuccess());
+  const auto copied = [&](const char* to) {
+    DeviceImageServices made(image.image);
+    platform::SyncDataSource& sources = made.services().syncDataSource;
+    const auto target = sources.createDataSource("Bookmarks", to, std::nullopt).source;
+    const auto source = sources.createDataSource("Bookmarks", "x", std::nullopt).source;
+    EXPECT_TRUE(sources.migrateRecords(source, target).isSuccess());
+    return sources.commit(target);
+  };
+  EXPECT_TRUE(copied("deep").isSuccess());
+  const std::string database = image.path(DeviceImage::databaseFile(platform::BookmarksSyncType));
+  runSQL(database,
+         "INSERT INTO collections (store, kind, parent, name, writable, is_default) "
+         "SELECT c.store, c.kind, max(c.id), 'B', 1, 0 FROM collections c "
+         "JOIN records r ON r.collection = c.id WHERE r.uid = 'b' AND r.store = 1; "
+         "UPDATE records SET collection = last_insert_rowid() WHERE uid = 'b' AND store = 1");
+  EXPECT_THAT(copied("deeper").error.value().description, HasSubstr("nested too deep"));
+  runSQL(database, "DELETE FROM records WHERE uid = 'a' AND store = 1");
+  EXPECT_THAT(copied("deepest").error.value().description, HasSubstr("nested too deep"));
 }
 
 TEST(FoldersThatHoldOneAnother, FailACopyInsteadOfGoingRoundForEver) {
