@@ -59,8 +59,9 @@ class Image {
   // Gives the file of the number these bytes. It stays open, because looking for it takes longer
   // than all that is done with it.
   void write(std::size_t number, std::span<const std::uint8_t> bytes) const {
-    if (::ftruncate(_files[number], 0) != 0 || ::pwrite(_files[number], bytes.data(), bytes.size(),
-                                                        0) != static_cast<ssize_t>(bytes.size()))
+    const auto size = static_cast<ssize_t>(bytes.size());
+    if (::pwrite(_files[number], bytes.data(), bytes.size(), 0) != size ||
+        ::ftruncate(_files[number], size) != 0)
       throw std::runtime_error("cannot write a file of " + _path.string());
   }
 
