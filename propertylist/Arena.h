@@ -11,7 +11,7 @@
 #include <string_view>
 #include <vector>
 
-#include "propertylist/Nodes.h"
+#include "propertylist/Value.h"
 
 namespace propertylist {
 

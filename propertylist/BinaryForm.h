@@ -35,4 +35,11 @@ inline constexpr std::size_t kObjectCountAt = 8;    // 8 bytes
 inline constexpr std::size_t kTopObjectAt = 16;     // 8 bytes
 inline constexpr std::size_t kOffsetTableAt = 24;   // 8 bytes
 
+// The sizes that offsets and references come in.
+inline std::size_t sizeFor(std::uint64_t largest) {
+  if (largest <= 0xFF) return 1;
+  if (largest <= 0xFFFF) return 2;
+  return largest <= 0xFFFFFFFF ? 4 : 8;
+}
+
 }  // namespace propertylist::binary

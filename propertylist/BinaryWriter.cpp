@@ -4,12 +4,9 @@
 #include <array>
 #include <bit>
 #include <cmath>
-#include <cstring>
 
-#include "propertylist/BigEndian.h"
 #include "propertylist/BinaryForm.h"
 #include "propertylist/Reading.h"
-#include "propertylist/UTF8.h"
 #include "propertylist/ValueCount.h"
 #include "propertylist/Writing.h"
 
@@ -21,15 +18,10 @@ namespace {
 
 // Texts and data up to this size are found faster by content than by address and content.
 constexpr std::size_t kShort = 64;
+// From so many values on, the tables do not lie in the nearest caches.
+constexpr std::uint64_t kMany = std::uint64_t{1} << 16U;
 // Of how many texts the place in memory is remembered at most. A power of two.
 constexpr std::size_t kMostRecent = 1024;
-
-// The sizes that offsets and references come in.
-std::size_t sizeFor(std::uint64_t largest) {
-  if (largest <= 0xFF) return 1;
-  if (largest <= 0xFFFF) return 2;
-  return largest <= 0xFFFFFFFF ? 4 : 8;
-}
 
 std::string_view viewOf(const Bytes& data) {
   return {reinterpret_cast<const char*>(data.data()), data.size()};
@@ -39,29 +31,36 @@ bool isScalar(Kind kind) {
   return kind == Kind::integer || kind == Kind::real || kind == Kind::boolean || kind == Kind::date;
 }
 
-// Of the kind and the number that the scalar holds.
-std::uint64_t hashOfScalar(const Value& value) {
-  std::uint64_t bits = 0;
-  bool isNegative = false;
-  if (value.kind() == Kind::real) {
-    bits = std::bit_cast<std::uint64_t>(*value.asReal());
-  } else if (value.kind() == Kind::date) {
-    bits = std::bit_cast<std::uint64_t>(value.asDate()->secondsSince2001);
-  } else if (value.kind() == Kind::boolean) {
-    bits = *value.asBoolean() ? 1 : 0;
-  } else if (const auto positive = value.asUnsigned()) {
-    bits = *positive;
-  } else {
-    bits = static_cast<std::uint64_t>(*value.asInteger());
-    isNegative = true;  // tells it from a large one
+// What tells a scalar from all others: its number in bits, and its kind with the sign of an
+// integer.
+struct ScalarBits {
+  explicit ScalarBits(const Value& value) : kind(static_cast<std::uint64_t>(value.kind()) * 2) {
+    if (value.kind() == Kind::real) {
+      bits = std::bit_cast<std::uint64_t>(*value.asReal());
+    } else if (value.kind() == Kind::date) {
+      bits = std::bit_cast<std::uint64_t>(value.asDate()->secondsSince2001);
+    } else if (value.kind() == Kind::boolean) {
+      bits = *value.asBoolean() ? 1 : 0;
+    } else if (const auto positive = value.asUnsigned()) {
+      bits = *positive;
+    } else {
+      bits = static_cast<std::uint64_t>(*value.asInteger());
+      ++kind;
+    }
   }
-  return TextTable::hashOf(bits,
-                           static_cast<std::uint64_t>(value.kind()) * 2 + (isNegative ? 1 : 0));
-}
+  std::uint64_t hash() const { return TextTable::hashOf(bits, kind); }
+  bool operator==(const ScalarBits&) const = default;
 
-std::size_t sizeOf(const Value& container) {
-  const Array* const array = container.asArray();
-  return array != nullptr ? array->size() : container.asDictionary()->size();
+  std::uint64_t bits = 0;
+  std::uint64_t kind;
+};
+
+// The first members of a container with that node, which lie behind it in an arena.
+void prefetchMembers(const storage::Node* node) {
+  constexpr std::size_t kLine = 64;
+  constexpr std::size_t kLines = 5;  // some eighteen entries
+  const auto* const bytes = reinterpret_cast<const std::byte*>(node);
+  for (std::size_t line = 0; line < kLines; ++line) __builtin_prefetch(bytes + line * kLine);
 }
 
 }  // namespace
@@ -74,22 +73,25 @@ std::optional<Bytes> BinaryWriter::write() {
   // Each value takes a byte at least, so a value of more would only be laid out to be refused.
   const std::uint64_t values = countValues(_value, kMaximumFileSize);
   if (values > kMaximumFileSize) return std::nullopt;
+  _hasMany = values > kMany;
   _makeRoomFor(static_cast<std::size_t>(values));
   if (!_number()) return std::nullopt;
   _referenceSize = sizeFor(_objects.size() - 1);
   if (_references.size() * _referenceSize > kMaximumFileSize) return std::nullopt;
   _bytes.resize(_expectedSize());
+  _next = _bytes.data();
+  _left = _bytes.size();
   _putBytes(kMagic.data(), kMagic.size());
   _offsets.reserve(_objects.size());
   for (std::size_t i = 0; i < _objects.size(); ++i) {
-    constexpr std::size_t kAhead = 16;
+    constexpr std::size_t kAhead = 48;
     if (i + kAhead < _objects.size()) __builtin_prefetch(_objects[i + kAhead].place());
-    _offsets.push_back(static_cast<std::uint32_t>(_end));
-    if (!_put(_objects[i]) || _end > kMaximumFileSize) return std::nullopt;
+    _offsets.push_back(static_cast<std::uint32_t>(_end()));
+    if (!_put(_objects[i]) || _end() > kMaximumFileSize) return std::nullopt;
   }
   _putOffsetsAndTrailer();
-  if (_end > kMaximumFileSize) return std::nullopt;
-  _bytes.resize(_end);
+  if (_end() > kMaximumFileSize) return std::nullopt;
+  _bytes.resize(_end());
   return std::move(_bytes);
 }
 
@@ -99,7 +101,9 @@ void BinaryWriter::_makeRoomFor(std::size_t values) {
   const std::size_t expected = std::min(values, kMost);
   _objects.reserve(expected);
   _references.reserve(2 * expected);
-  _texts.makeRoomFor(expected / 6);
+  _texts.makeRoomFor(expected / 5);
+  _scalars.makeRoomFor(expected / 20);
+  _datas.makeRoomFor(expected / 40);
   _recent.resize(std::min(kMostRecent, std::bit_ceil(expected)));
 }
 
@@ -113,8 +117,11 @@ std::size_t BinaryWriter::_expectedSize() const {
 // Numbering
 
 bool BinaryWriter::_number() {
-  if (!_numberOf(_value, 1)) return false;
+  if (_numberOf(_value, 1) == kNoNumber) return false;
+  constexpr std::size_t kAhead = 4;
   for (std::size_t i = 0; i < _objects.size(); ++i) {
+    if (i + kAhead < _objects.size() && _objects[i + kAhead].depth > 0)
+      prefetchMembers(_objects[i + kAhead].value()._node());
     if (_objects[i].depth > 0 && !_numberMembers(i)) return false;
   }
   return true;
@@ -134,47 +141,48 @@ bool BinaryWriter::_numberMembers(std::size_t container) {
       dictionary, depth + 1, [](const Dictionary::Entry& entry) -> auto& { return entry.value(); });
 }
 
-// Hashes some values before it looks the first one up: in a large list each is somewhere else in
-// memory, and comes from there while the next ones are hashed.
+// Where there are many values, hashes some before it looks the first one up: each is somewhere else
+// in memory, and comes from there while the next ones are hashed.
 template <typename Members, typename ValueOf>
 bool BinaryWriter::_referToValues(const Members& members, std::uint32_t depth,
                                   const ValueOf& valueOf) {
-  constexpr std::ptrdiff_t kAhead = 16;
-  std::array<std::optional<std::uint64_t>, kAhead> hashes;
+  constexpr std::ptrdiff_t kAhead = 32;
+  std::array<std::uint64_t, kAhead> hashes;
   for (auto from = members.begin(); from != members.end();) {
     const auto to = from + std::min(kAhead, members.end() - from);
     std::transform(from, to, hashes.begin(),
-                   [&](const auto& member) { return _hashAhead(valueOf(member)); });
+                   [&](const auto& member) { return _hasMany ? _hashAhead(valueOf(member)) : 0; });
     for (auto hash = hashes.begin(); from != to; ++from, ++hash) {
-      const std::optional<Number> number = _numberOf(valueOf(*from), depth, *hash);
-      if (!number) return false;
-      _references.push_back(*number);
+      const Number number = _numberOf(valueOf(*from), depth, *hash);
+      if (number == kNoNumber) return false;
+      _references.push_back(number);
     }
   }
   return true;
 }
 
-// The hash of a text or scalar that has to be looked up by its content.
-std::optional<std::uint64_t> BinaryWriter::_hashAhead(const Value& value) {
+// The hash of a text or scalar that has to be looked up by its content; else 0.
+std::uint64_t BinaryWriter::_hashAhead(const Value& value) {
   if (const Text* const text = value.asString()) {
-    if (text->size() > kShort || _recentAt(*text).text == text) return std::nullopt;
+    if (text->size() > kShort || _recentAt(*text).text == text) return 0;
     const std::uint64_t hash = TextTable::hashOf(*text);
     _texts.prefetch(hash);
     return hash;
   }
-  if (!isScalar(value.kind())) return std::nullopt;
-  const std::uint64_t hash = hashOfScalar(value);
+  if (!isScalar(value.kind())) return 0;
+  const std::uint64_t hash = ScalarBits(value).hash();
   _scalars.prefetch(hash);
   return hash;
 }
 
-// The number of `value`, which is a new one for a container. `depth` counts `value` if it is one.
-std::optional<BinaryWriter::Number> BinaryWriter::_numberOf(const Value& value, std::uint32_t depth,
-                                                            std::optional<std::uint64_t> hash) {
+// The number of `value`, which is a new one for a container; kNoNumber when it cannot be written.
+// `depth` counts `value` if it is a container.
+BinaryWriter::Number BinaryWriter::_numberOf(const Value& value, std::uint32_t depth,
+                                             std::uint64_t hash) {
   switch (value.kind()) {
     case Kind::dictionary:
     case Kind::array:
-      if (depth > kMaximumDepth) return std::nullopt;
+      if (depth > kMaximumDepth) return kNoNumber;
       return _add(Object(value, static_cast<std::uint16_t>(depth)));
     case Kind::string:
       return _numberOfText(*value.asString(), hash);
@@ -192,26 +200,24 @@ BinaryWriter::Recent& BinaryWriter::_recentAt(const Text& text) {
   return _recent[(address >> 4U ^ address >> 14U) & (_recent.size() - 1)];
 }
 
-BinaryWriter::Number BinaryWriter::_numberOfText(const Text& text,
-                                                 std::optional<std::uint64_t> hash) {
+BinaryWriter::Number BinaryWriter::_numberOfText(const Text& text, std::uint64_t hash) {
   Recent& recent = _recentAt(text);
   if (recent.text != &text) recent = {&text, _numberOfNewText(text, hash)};
   return recent.number;
 }
 
-BinaryWriter::Number BinaryWriter::_numberOfNewText(const Text& text,
-                                                    std::optional<std::uint64_t> hash) {
+BinaryWriter::Number BinaryWriter::_numberOfNewText(const Text& text, std::uint64_t hash) {
   if (text.size() > kShort) {
     const auto known = _byAddress.find(&text);
     if (known != _byAddress.end()) return known->second;
   }
-  if (!hash) hash = TextTable::hashOf(text);
+  if (hash == 0) hash = TextTable::hashOf(text);
   std::size_t known =
-      _texts.find(*hash, [&](std::size_t number) { return *_objects[number].text() == text; });
+      _texts.find(hash, [&](std::size_t number) { return *_objects[number].text() == text; });
   if (known == TextTable::kNone) {
     known = _add(Object(text));
     _contentBytes += text.size();
-    _texts.add(*hash, known);
+    _texts.add(hash, known);
   }
   if (text.size() > kShort) _byAddress.emplace(&text, static_cast<Number>(known));
   return static_cast<Number>(known);
@@ -234,16 +240,16 @@ BinaryWriter::Number BinaryWriter::_numberOfData(const Bytes& data, const Value&
   return static_cast<Number>(known);
 }
 
-std::optional<BinaryWriter::Number> BinaryWriter::_numberOfScalar(
-    const Value& value, std::optional<std::uint64_t> hash) {
+BinaryWriter::Number BinaryWriter::_numberOfScalar(const Value& value, std::uint64_t hash) {
   if (const auto date = value.asDate(); date && !std::isfinite(date->secondsSince2001))
-    return std::nullopt;
-  if (!hash) hash = hashOfScalar(value);
-  std::size_t known =
-      _scalars.find(*hash, [&](std::size_t number) { return _objects[number].value() == value; });
+    return kNoNumber;
+  const ScalarBits bits(value);
+  if (hash == 0) hash = bits.hash();
+  std::size_t known = _scalars.find(
+      hash, [&](std::size_t number) { return ScalarBits(_objects[number].value()) == bits; });
   if (known == TextTable::kNone) {
     known = _add(Object(value));
-    _scalars.add(*hash, known);
+    _scalars.add(hash, known);
   }
   return static_cast<Number>(known);
 }
@@ -251,143 +257,6 @@ std::optional<BinaryWriter::Number> BinaryWriter::_numberOfScalar(
 BinaryWriter::Number BinaryWriter::_add(const Object& object) {
   _objects.push_back(object);
   return static_cast<Number>(_objects.size() - 1);
-}
-
-// Putting
-
-// False for a text that is not UTF-8.
-bool BinaryWriter::_put(const Object& object) {
-  if (object.text() != nullptr) return _putText(*object.text());
-  const Value& value = object.value();
-  switch (value.kind()) {
-    case Kind::dictionary:
-      _putHead(kDictionary, sizeOf(value));
-      _putReferences(object, sizeOf(value) * 2);
-      break;
-    case Kind::array:
-      _putHead(kArray, sizeOf(value));
-      _putReferences(object, sizeOf(value));
-      break;
-    case Kind::string:  // has a text
-      break;
-    case Kind::integer:
-      _putInteger(value);
-      break;
-    case Kind::real:
-      _putNumber(kReal | 3U, 1);
-      _putNumber(std::bit_cast<std::uint64_t>(*value.asReal()), 8);
-      break;
-    case Kind::boolean:
-      _putNumber(*value.asBoolean() ? kTrue : kFalse, 1);
-      break;
-    case Kind::date:
-      _putNumber(kDate, 1);
-      _putNumber(std::bit_cast<std::uint64_t>(value.asDate()->secondsSince2001), 8);
-      break;
-    case Kind::data:
-      _putHead(kData, value.asData()->size());
-      _putBytes(value.asData()->data(), value.asData()->size());
-      break;
-  }
-  return true;
-}
-
-// ASCII where that is enough, else UTF-16.
-bool BinaryWriter::_putText(std::string_view text) {
-  if (!isASCII(text)) return _putWideText(text);
-  _putHead(kASCII, text.size());
-  _putBytes(text.data(), text.size());
-  return true;
-}
-
-bool BinaryWriter::_putWideText(std::string_view text) {
-  constexpr std::size_t kUnit = 2;
-  if (_wide.size() < text.size() * kUnit) _wide.resize(text.size() * kUnit);
-  std::uint8_t* to = _wide.data();
-  const auto put = [&to](char32_t unit) {
-    *to++ = static_cast<std::uint8_t>(unit >> 8U);
-    *to++ = static_cast<std::uint8_t>(unit);
-  };
-  for (std::size_t position = 0; position < text.size();) {
-    const std::optional<char32_t> codePoint = decodeUTF8(text, position);
-    if (!codePoint) return false;
-    if (*codePoint < 0x10000) {
-      put(*codePoint);
-    } else {
-      put(0xD800 + ((*codePoint - 0x10000) >> 10U));
-      put(0xDC00 + ((*codePoint - 0x10000) & 0x3FFU));
-    }
-  }
-  const auto size = static_cast<std::size_t>(to - _wide.data());
-  _putHead(kUTF16, size / kUnit);
-  _putBytes(_wide.data(), size);
-  return true;
-}
-
-// Integers of 1, 2 and 4 bytes are unsigned, those of 8 are signed. What is above takes 16.
-void BinaryWriter::_putInteger(const Value& integer) {
-  if (const auto negative = integer.asInteger(); negative && *negative < 0) {
-    _putNumber(kInteger | 3U, 1);
-    return _putNumber(static_cast<std::uint64_t>(*negative), 8);
-  }
-  const std::uint64_t number = *integer.asUnsigned();
-  if (number >> 63U == 0) return _putCount(number);
-  _putNumber(kInteger | 4U, 1);
-  _putNumber(0, 8);
-  _putNumber(number, 8);
-}
-
-void BinaryWriter::_putReferences(const Object& container, std::size_t count) {
-  std::uint8_t* room = _room(count * _referenceSize);
-  for (std::size_t i = 0; i < count; ++i, room += _referenceSize)
-    putBigEndian(room, _references[container.firstReference + i], _referenceSize);
-}
-
-void BinaryWriter::_putHead(std::uint8_t type, std::uint64_t count) {
-  if (count < kLongCount) {
-    return _putNumber(type | count, 1);
-  }
-  _putNumber(type | kLongCount, 1);
-  _putCount(count);
-}
-
-// An integer object of the smallest size; `count` is not above the signed range.
-void BinaryWriter::_putCount(std::uint64_t count) {
-  const std::size_t size = sizeFor(count);
-  _putNumber(kInteger | static_cast<std::uint64_t>(std::countr_zero(size)), 1);
-  _putNumber(count, size);
-}
-
-void BinaryWriter::_putNumber(std::uint64_t number, std::size_t size) {
-  putBigEndian(_room(size), number, size);
-}
-
-void BinaryWriter::_putBytes(const void* bytes, std::size_t size) {
-  if (size > 0) std::memcpy(_room(size), bytes, size);
-}
-
-// Room for so many bytes more, which count as written.
-std::uint8_t* BinaryWriter::_room(std::size_t size) {
-  if (_bytes.size() - _end < size) _bytes.resize(std::max(_bytes.size() * 2, _end + size));
-  std::uint8_t* const room = _bytes.data() + _end;
-  _end += size;
-  return room;
-}
-
-void BinaryWriter::_putOffsetsAndTrailer() {
-  const std::uint64_t table = _end;
-  const std::size_t offsetSize = sizeFor(_offsets.back());
-  std::uint8_t* room = _room(_offsets.size() * offsetSize);
-  for (const std::uint32_t offset : _offsets) {
-    putBigEndian(room, offset, offsetSize);
-    room += offsetSize;
-  }
-  _putNumber(0, kOffsetSizeAt);
-  _putNumber(offsetSize, 1);
-  _putNumber(_referenceSize, 1);
-  _putNumber(_objects.size(), 8);
-  _putNumber(0, 8);  // the top object
-  _putNumber(table, 8);
 }
 
 }  // namespace propertylist

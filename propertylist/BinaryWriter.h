@@ -25,6 +25,7 @@ class BinaryWriter {
 
  private:
   using Number = std::uint32_t;
+  static constexpr Number kNoNumber = ~Number{0};
   // A text, for a string or a key, or any other value.
   class Object {
    public:
@@ -55,14 +56,14 @@ class BinaryWriter {
   bool _numberMembers(std::size_t container);
   template <typename Members, typename ValueOf>
   bool _referToValues(const Members& members, std::uint32_t depth, const ValueOf& valueOf);
-  std::optional<std::uint64_t> _hashAhead(const Value& value);
+  // A hash of 0 is not known yet.
+  std::uint64_t _hashAhead(const Value& value);
   Recent& _recentAt(const Text& text);
-  std::optional<Number> _numberOf(const Value& value, std::uint32_t depth,
-                                  std::optional<std::uint64_t> hash = std::nullopt);
-  Number _numberOfText(const Text& text, std::optional<std::uint64_t> hash = std::nullopt);
-  Number _numberOfNewText(const Text& text, std::optional<std::uint64_t> hash);
+  Number _numberOf(const Value& value, std::uint32_t depth, std::uint64_t hash = 0);
+  Number _numberOfText(const Text& text, std::uint64_t hash = 0);
+  Number _numberOfNewText(const Text& text, std::uint64_t hash);
   Number _numberOfData(const Bytes& data, const Value& value);
-  std::optional<Number> _numberOfScalar(const Value& value, std::optional<std::uint64_t> hash);
+  Number _numberOfScalar(const Value& value, std::uint64_t hash);
   Number _add(const Object& object);
 
   bool _put(const Object& object);
@@ -74,7 +75,22 @@ class BinaryWriter {
   void _putCount(std::uint64_t count);
   void _putNumber(std::uint64_t number, std::size_t size);
   void _putBytes(const void* bytes, std::size_t size);
-  std::uint8_t* _room(std::size_t size);
+  // Room for so many bytes more, which count as written.
+  std::uint8_t* _room(std::size_t size) {
+    if (size > _left) _makeMoreRoom(size);
+    std::uint8_t* const room = _next;
+    _next += size;
+    _left -= size;
+    return room;
+  }
+  void _makeMoreRoom(std::size_t size);
+  // The last ones that were written.
+  void _giveBack(std::size_t size) {
+    _next -= size;
+    _left += size;
+  }
+  // Of what is written.
+  std::size_t _end() const { return static_cast<std::size_t>(_next - _bytes.data()); }
   void _putOffsetsAndTrailer();
 
   const Value& _value;
@@ -89,9 +105,11 @@ class BinaryWriter {
   Bytes _wide;                          // the text that is being put, in UTF-16
   std::vector<std::uint32_t> _offsets;  // no file is larger than they can tell
   std::size_t _contentBytes = 0;        // of all texts and data
+  bool _hasMany = false;
   std::size_t _referenceSize = 1;
   Bytes _bytes;
-  std::size_t _end = 0;  // of what is written; _bytes may have room behind it
+  std::uint8_t* _next = nullptr;  // in _bytes, where there is room for so many more
+  std::size_t _left = 0;
 };
 
 }  // namespace propertylist

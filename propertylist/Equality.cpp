@@ -2,7 +2,6 @@
 #include <unordered_map>
 #include <vector>
 
-#include "propertylist/Nodes.h"
 #include "propertylist/Value.h"
 
 namespace propertylist {

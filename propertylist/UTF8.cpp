@@ -17,8 +17,6 @@ std::size_t asciiPrefix(std::string_view text, std::size_t from) {
   return at;
 }
 
-bool isASCII(std::string_view text) { return asciiPrefix(text, 0) == text.size(); }
-
 std::size_t characterBoundary(std::string_view text, std::size_t at) {
   constexpr std::size_t kMostFollowing = 3;
   const auto isFollowing = [text](std::size_t position) {

@@ -1,6 +1,5 @@
 #pragma once
 
-#include <array>
 #include <cstddef>
 #include <optional>
 #include <string>
@@ -15,7 +14,6 @@ inline std::optional<char32_t> decodeUTF8(std::string_view text, std::size_t& po
 
 // Where the ASCII that begins at `from` ends; `from` is within `text`.
 std::size_t asciiPrefix(std::string_view text, std::size_t from);
-bool isASCII(std::string_view text);
 
 // The last place up to `at` where `text` can be cut without splitting a character. In bytes that
 // are not UTF-8 it is `at` itself or at most three bytes before. `at` is within `text`.
@@ -85,9 +83,9 @@ inline char* putUTF8(char* to, char32_t codePoint) {
 }
 
 inline char* putUTF8Unit(char* to, char32_t unit) {
-  constexpr std::array<unsigned char, 3> kLead = {0, 0xC0, 0xE0};
+  constexpr unsigned kLeads = 0xE0C000;  // of three, two and one bytes
   const unsigned more = static_cast<unsigned>(unit >= 0x80) + static_cast<unsigned>(unit >= 0x800);
-  to[0] = static_cast<char>(kLead[more] | static_cast<unsigned char>(unit >> 6 * more));
+  to[0] = static_cast<char>(static_cast<unsigned char>(kLeads >> 8 * more | unit >> 6 * more));
   to[1] = static_cast<char>(0x80U | (unit >> 6 * (more / 2) & 0x3FU));
   to[2] = static_cast<char>(0x80U | (unit & 0x3FU));
   return to + 1 + more;

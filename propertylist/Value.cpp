@@ -5,8 +5,6 @@
 #include <utility>
 #include <vector>
 
-#include "propertylist/Nodes.h"
-
 namespace propertylist {
 
 using storage::Owner;
@@ -74,13 +72,6 @@ struct Value::OwnDataNode final : Owner, DataNode {
 
 storage::Node* Value::_newText(std::string_view text) { return OwnTextNode::make(text); }
 
-const Value::TextNode& Value::_textNode() const {
-  return *static_cast<const TextNode*>(_content.reference._node());
-}
-const Value::DataNode& Value::_dataNode() const {
-  return *static_cast<const DataNode*>(_content.reference._node());
-}
-
 // Array
 
 struct Array::OwnNode final : ContainerOwner, Node {
@@ -92,18 +83,11 @@ struct Array::OwnNode final : ContainerOwner, Node {
   std::vector<Value> values;
 };
 
-const Array::Node* Array::_array() const { return static_cast<const Node*>(_node()); }
-
 Array::Array(std::initializer_list<Value> values) : Array(std::vector<Value>(values)) {}
 
 Array::Array(std::vector<Value> values) {
   if (!values.empty()) _bits = storage::bitsOf(new OwnNode(std::move(values)));
 }
-
-std::size_t Array::size() const { return _bits != 0 ? _array()->size : 0; }
-const Value& Array::operator[](std::size_t index) const { return _array()->first[index]; }
-const Value* Array::begin() const { return _bits != 0 ? _array()->first : nullptr; }
-const Value* Array::end() const { return begin() + size(); }
 
 bool Array::contains(const Value& value) const { return std::find(begin(), end(), value) != end(); }
 
@@ -139,42 +123,8 @@ struct Dictionary::OwnNode final : ContainerOwner, Node {
   std::vector<Entry> entries;
 };
 
-const Dictionary::Node* Dictionary::_dictionary() const {
-  return static_cast<const Node*>(_node());
-}
-
 Dictionary::Entry::Entry(std::string_view key, Value value) : _value(std::move(value)) {
   _setKey(storage::bitsOf(Value::_newText(key)));
-}
-
-Dictionary::Entry::Entry(const Entry& other) noexcept : _value(other._value) {
-  if (other._keyBits() == 0) return;
-  _setKey(other._keyBits());
-  other._value._key()->owner->retain();
-}
-
-Dictionary::Entry::Entry(Entry&& other) noexcept : _value(std::move(other._value)) {
-  _setKey(other._keyBits());
-  other._value._keyAndTag &= Value::kTagBits;
-}
-
-Dictionary::Entry& Dictionary::Entry::operator=(const Entry& other) noexcept {
-  return *this = Entry(other);
-}
-
-Dictionary::Entry& Dictionary::Entry::operator=(Entry&& other) noexcept {
-  Entry taken(std::move(other));
-  std::swap(_value._keyAndTag, taken._value._keyAndTag);
-  std::swap(_value._content.bits, taken._value._content.bits);
-  return *this;
-}
-
-Dictionary::Entry::~Entry() {
-  if (_keyBits() != 0) _value._key()->owner->release();
-}
-
-const Text& Dictionary::Entry::key() const {
-  return static_cast<const Value::TextNode*>(_value._key())->text;
 }
 
 Dictionary::Dictionary(std::initializer_list<std::pair<std::string_view, Value>> entries)
@@ -198,12 +148,6 @@ Dictionary::Dictionary(std::vector<Entry> entries) {
   }
   if (!entries.empty()) _bits = storage::bitsOf(new OwnNode(std::move(entries)));
 }
-
-std::size_t Dictionary::size() const { return _bits != 0 ? _dictionary()->size : 0; }
-const Dictionary::Entry* Dictionary::begin() const {
-  return _bits != 0 ? _dictionary()->first : nullptr;
-}
-const Dictionary::Entry* Dictionary::end() const { return begin() + size(); }
 
 const Dictionary::Entry* Dictionary::_lowerBound(std::string_view key) const {
   return std::lower_bound(begin(), end(), key,
@@ -285,39 +229,6 @@ Value& Value::operator=(Value&& other) noexcept {
   std::swap(_content.bits, taken._content.bits);  // of a reference too: it is moved, not counted
   return *this;
 }
-
-const Dictionary* Value::asDictionary() const {
-  return _tag() == Kind::dictionary ? &_content.dictionary : nullptr;
-}
-
-const Array* Value::asArray() const { return _tag() == Kind::array ? &_content.array : nullptr; }
-
-const Text* Value::asString() const { return _tag() == Kind::string ? &_textNode().text : nullptr; }
-
-std::optional<std::int64_t> Value::asInteger() const {
-  const auto asSigned = static_cast<std::int64_t>(_content.bits);
-  if (_isNegative() || (_tag() == Kind::integer && asSigned >= 0)) return asSigned;
-  return std::nullopt;
-}
-
-std::optional<std::uint64_t> Value::asUnsigned() const {
-  return _tag() == Kind::integer ? std::optional(_content.bits) : std::nullopt;
-}
-
-std::optional<double> Value::asReal() const {
-  return _tag() == Kind::real ? std::optional(std::bit_cast<double>(_content.bits)) : std::nullopt;
-}
-
-std::optional<bool> Value::asBoolean() const {
-  return kind() == Kind::boolean ? std::optional(_content.bits != 0) : std::nullopt;
-}
-
-std::optional<Date> Value::asDate() const {
-  return _tag() == Kind::date ? std::optional(Date{std::bit_cast<double>(_content.bits)})
-                              : std::nullopt;
-}
-
-const Bytes* Value::asData() const { return _tag() == Kind::data ? &_dataNode().data : nullptr; }
 
 // Lookups by key and kind
 

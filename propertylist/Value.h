@@ -224,6 +224,7 @@ class PROPERTYLIST_EXPORT Value {
   friend class Array;
   friend class Dictionary;
   friend class Arena;
+  friend class BinaryWriter;
   class Comparison;
   class Counting;
   friend std::uint64_t countValues(const Value& value, std::uint64_t limit);
@@ -246,6 +247,7 @@ class PROPERTYLIST_EXPORT Value {
       : _keyAndTag(static_cast<std::uint64_t>(tag)), _content(bits) {}
   static storage::Node* _newText(std::string_view text);
   Tag _tag() const { return static_cast<Tag>(_keyAndTag & kTagBits); }
+  storage::Node* _node() const { return storage::nodeOf(_content.bits); }
   storage::Node* _key() const { return storage::nodeOf(_keyAndTag & ~kTagBits); }
   bool _isNegative() const { return _tag() == Kind::boolean && _content.bits >> 63U != 0; }
   bool _hasNode() const {
@@ -338,3 +340,5 @@ PROPERTYLIST_EXPORT std::optional<bool> findBoolean(const Dictionary& dictionary
                                                     std::string_view key);
 
 }  // namespace propertylist
+
+#include "propertylist/Nodes.h"

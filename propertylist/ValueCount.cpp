@@ -4,7 +4,7 @@
 #include <unordered_map>
 #include <vector>
 
-#include "propertylist/Nodes.h"
+#include "propertylist/Value.h"
 
 namespace propertylist {
 
@@ -14,7 +14,7 @@ class Value::Counting {
   explicit Counting(std::uint64_t limit) : _limit(limit) {}
 
   std::uint64_t of(const Value& value) {
-    _open.push_back({nullptr, 0, 0, 1, 0, false, false});  // stands around everything
+    _open.push_back({nullptr, nullptr, 0, false, false});  // stands around everything
     _look(value, false);
     while (_open.size() > 1) _continue();
     return _open.front().values;
@@ -22,10 +22,8 @@ class Value::Counting {
 
  private:
   struct Container {
-    const std::byte* members;  // values, or entries with a value each
-    std::size_t size;
-    std::size_t next;    // the member whose turn it is
-    std::size_t stride;  // from one value to the next
+    const Value* next;  // the member whose turn it is
+    const Value* end;
     std::uint64_t values;
     bool isInArena;
     bool isRemembered;
@@ -35,38 +33,38 @@ class Value::Counting {
   void _look(const Value& value, bool isInside) {
     if (value._tag() == Kind::dictionary && !value._content.dictionary.empty()) {
       const auto& node = *value._content.dictionary._dictionary();
-      _enter(node, &node.first->_value, sizeof *node.first, isInside);
+      static_assert(sizeof *node.first == sizeof(Value));  // entries are values with their keys
+      _enter(node, &node.first->_value, isInside);
     } else if (value._tag() == Kind::array && !value._content.array.empty()) {
       const auto& node = *value._content.array._array();
-      _enter(node, node.first, sizeof *node.first, isInside);
+      _enter(node, node.first, isInside);
     } else {
       _add(1);
     }
   }
 
+  static bool _mayHold(const Value& value) {
+    return value._tag() == Kind::dictionary || value._tag() == Kind::array;
+  }
+
   template <typename Node>
-  void _enter(const Node& node, const Value* first, std::size_t stride, bool isInside) {
+  void _enter(const Node& node, const Value* first, bool isInside) {
     const bool isInArena = node.owner->isArena();
     const bool hasOnePlace = isInArena ? isInside && !node.isShared : node.owner->isSole();
     if (!hasOnePlace) {
       const auto known = _known.find(&node);
       if (known != _known.end()) return _add(known->second);
     }
-    _open.push_back({reinterpret_cast<const std::byte*>(first), node.size, 0, stride, 1, isInArena,
-                     !hasOnePlace, &node});
+    _open.push_back({first, first + node.size, 1, isInArena, !hasOnePlace, &node});
   }
 
   void _continue() {
     Container& container = _open.back();
     // Leaves are counted here; what is entered comes back to the next member.
-    while (container.next < container.size) {
-      const std::byte* const place = container.members + container.next * container.stride;
-      ++container.next;
-      const auto& member = *reinterpret_cast<const Value*>(place);
-      if (member._tag() == Kind::dictionary || member._tag() == Kind::array)
-        return _look(member, container.isInArena);
-      container.values = std::min(container.values + 1, _limit + 1);
-    }
+    const Value* const first = container.next;
+    container.next = std::find_if(first, container.end, _mayHold);
+    _add(static_cast<std::uint64_t>(container.next - first));
+    if (container.next != container.end) return _look(*container.next++, container.isInArena);
     const std::uint64_t values = container.values;
     if (container.isRemembered) _known.emplace(container.node, values);
     _open.pop_back();
