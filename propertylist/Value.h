@@ -247,7 +247,6 @@ class PROPERTYLIST_EXPORT Value {
       : _keyAndTag(static_cast<std::uint64_t>(tag)), _content(bits) {}
   static storage::Node* _newText(std::string_view text);
   Tag _tag() const { return static_cast<Tag>(_keyAndTag & kTagBits); }
-  storage::Node* _node() const { return storage::nodeOf(_content.bits); }
   storage::Node* _key() const { return storage::nodeOf(_keyAndTag & ~kTagBits); }
   bool _isNegative() const { return _tag() == Kind::boolean && _content.bits >> 63U != 0; }
   bool _hasNode() const {
