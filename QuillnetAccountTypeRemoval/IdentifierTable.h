@@ -23,7 +23,8 @@ struct IdentifierNames {
 // What a store knows by identifier. Visited in the order in which the identifiers came; one that
 // was removed and comes again is the last. The identifiers lie one behind the other in one text, so
 // that an entry costs no allocation of its own; a table that was made from another one shares them
-// with it until either gets a further one. Pointers and references are valid until the next set.
+// with it until either gets a further one; so both are for one thread at a time. Pointers and
+// references are valid until the next set.
 template <typename T>
 class IdentifierTable {
  public:

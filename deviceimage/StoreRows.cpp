@@ -3,6 +3,7 @@
 #include <sqlite3.h>
 
 #include <chrono>
+#include <unordered_set>
 
 namespace deviceimage {
 namespace {
@@ -169,6 +170,7 @@ CollectionMap::CollectionMap(Database& database, Row targetStore)
 Row CollectionMap::targetOf(Row collection) {
   // Up to the first folder that is known or has no parent, then down again.
   std::vector<std::pair<Row, Source>> unknown;
+  std::unordered_set<Row> seen;
   std::optional<Row> next = collection;
   std::optional<Row> target;
   std::size_t depth = 0;
@@ -178,7 +180,8 @@ Row CollectionMap::targetOf(Row collection) {
       depth = known->second.depth;
       break;
     }
-    if (unknown.size() == kDeepestFolder || !_readSource.bind(*next).step())
+    if (unknown.size() == kDeepestFolder || !seen.insert(*next).second ||
+        !_readSource.bind(*next).step())
       throw DatabaseFailure(SQLITE_CORRUPT, kTooDeep);
     Source source{_readSource.optionalInteger(0), _readSource.text(1), _readSource.text(2),
                   _readSource.boolean(3)};

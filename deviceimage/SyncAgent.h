@@ -26,27 +26,27 @@ class SyncAgent {
 
   // Reads the agent's preferences anew. What cannot be read counts as absent.
   explicit SyncAgent(const DeviceImage& image);
-  explicit SyncAgent(std::optional<std::string> accountName)
-      : _accountName(std::move(accountName)) {}
+  explicit SyncAgent(std::optional<std::string> accountName);
 
   // The Quillnet agent's account name; empty when it has none that is a string.
   const std::optional<std::string>& accountName() const { return _accountName; }
 
   // The Quillnet agent's own store: "Quillnet:" and the account name; empty without a name.
-  std::optional<std::string> quillnetStoreIdentifier() const;
+  const std::optional<std::string>& quillnetStoreIdentifier() const { return _quillnetStore; }
 
   // The store that holds the dataclass's records of the top-level account with these properties
   // (one entry of the settings file's "Accounts"). Empty when the account has no identifier, or is
   // a Quillnet account and the agent has no name. Among several calendar children the one with the
-  // smallest identifier counts.
-  std::optional<std::string> storeIdentifier(const propertylist::Dictionary& account,
-                                             Dataclass dataclass) const;
+  // smallest identifier counts. A text of the account or of this agent.
+  std::optional<std::string_view> storeIdentifier(const propertylist::Dictionary& account,
+                                                  Dataclass dataclass) const;
 
   // Whether accounts of this type belong to the Quillnet service ("Quillnet", "VantorAccount").
   static bool isQuillnetType(std::string_view accountType);
 
  private:
   std::optional<std::string> _accountName;
+  std::optional<std::string> _quillnetStore;
 };
 
 }  // namespace deviceimage

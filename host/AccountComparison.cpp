@@ -3,7 +3,6 @@
 #include <algorithm>
 #include <map>
 #include <optional>
-#include <span>
 #include <string_view>
 #include <unordered_map>
 
@@ -128,25 +127,8 @@ void noteGoneAccount(const Dictionary& account, const AccountReport& report,
         "The " + nameOf(report) + " was not to be retired and is gone from the settings file.");
 }
 
-// Which of these values differ, in halves until each difference is found: what many of those that
-// are compared at once share is compared once.
-void noteChanges(std::span<const propertylist::Value> expected,
-                 std::span<const propertylist::Value> present, std::size_t first,
-                 std::vector<bool>& changed) {
-  const auto arrayOf = [](std::span<const propertylist::Value> values) {
-    return propertylist::Array(std::vector(values.begin(), values.end()));
-  };
-  if (arrayOf(expected) == arrayOf(present)) return;
-  if (expected.size() == 1) {
-    changed[first] = true;
-    return;
-  }
-  const std::size_t half = expected.size() / 2;
-  noteChanges(expected.first(half), present.first(half), first, changed);
-  noteChanges(expected.subspan(half), present.subspan(half), first + half, changed);
-}
-
-// Which accounts are not the same as what was found of them.
+// Which accounts are not the same as what was found of them. All are compared at once; only where
+// there is a difference by their contents, which takes longer but looks once at what they share.
 std::vector<bool> changedAccounts(const std::vector<Dictionary>& before,
                                   const std::vector<Dictionary>& after,
                                   const std::vector<std::optional<std::size_t>>& found,
@@ -159,7 +141,14 @@ std::vector<bool> changedAccounts(const std::vector<Dictionary>& before,
     present.emplace_back(found[index] ? without(after[*found[index]], correctedKeys)
                                       : Dictionary());
   }
-  noteChanges(expected, present, 0, changed);
+  if (propertylist::Array(expected) == propertylist::Array(present)) return changed;
+  AccountContents contents(correctedKeys);
+  for (std::size_t index = 0; index < before.size(); ++index) {
+    if (!found[index]) continue;
+    const std::string content = contents.of(before[index]);
+    changed[index] = content != contents.of(after[*found[index]]) ||
+                     (content == AccountContents::kNone && expected[index] != present[index]);
+  }
   return changed;
 }
 
@@ -175,11 +164,12 @@ AccountComparison compareAccounts(const std::vector<Dictionary>& before,
   for (const Dictionary& account : before) found.push_back(finder.take(account));
   const std::vector<bool> changed = changedAccounts(before, after, found, rights.correctedKeys);
   std::optional<std::size_t> last;
+  SelectedAccounts selected(selection);
   for (std::size_t index = 0; index < before.size(); ++index) {
     const Dictionary& account = before[index];
     const std::optional<std::size_t> place = found[index];
     AccountReport report = reportOf(account);
-    if (selection.covers(account)) {
+    if (selected.cover(account)) {
       report.outcome = place ? AccountOutcome::kept : AccountOutcome::retired;
       if (place) comparison.leftBehind.push_back("The " + nameOf(report) + " is still there.");
     } else if (!place) {

@@ -30,7 +30,7 @@ std::string AccountContents::of(const Dictionary& account) {
       shortened.emplace_back(_shortText(entry.key()), _short(entry.value()));
   }
   const auto bytes = propertylist::writeBinaryPropertyList(Dictionary(std::move(shortened)));
-  content = bytes ? deviceimage::contentHash(viewOf(*bytes)) : "none";
+  content = bytes ? deviceimage::contentHash(viewOf(*bytes)) : std::string(kNone);
   return content;
 }
 

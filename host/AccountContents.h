@@ -1,6 +1,7 @@
 #pragma once
 
 #include <string>
+#include <string_view>
 #include <unordered_map>
 #include <vector>
 
@@ -12,12 +13,13 @@ namespace host {
 // a long text, is looked at once.
 class AccountContents {
  public:
+  static constexpr std::string_view kNone = "none";
   // The keys are not looked at. `ignoredKeys` outlives the object, and so does every account.
   explicit AccountContents(const std::vector<std::string>& ignoredKeys)
       : _ignoredKeys(ignoredKeys) {}
 
   // The same text for accounts that are equal apart from the ignored keys, and for no others; but
-  // one text for all that no file can hold when what they share is written out.
+  // kNone for all that no file can hold when what they share is written out.
   std::string of(const propertylist::Dictionary& account);
 
  private:

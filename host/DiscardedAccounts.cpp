@@ -1,5 +1,7 @@
 #include "host/DiscardedAccounts.h"
 
+#include <algorithm>
+#include <functional>
 #include <set>
 #include <utility>
 
@@ -44,10 +46,16 @@ std::vector<std::string> leftByNewSettings(const Settings& before, const Setting
 std::vector<std::string> recordsWithoutAccount(const Observation& now,
                                                const deviceimage::SyncAgent& agent,
                                                std::string_view prefix) {
-  std::set<std::string> owned;  // a store's name counts whatever it holds
+  // A store's name counts whatever it holds. What is longer than all is none.
+  std::size_t longest = 0;
+  for (const ObservedStore& store : now.stores)
+    longest = std::max(longest, store.account.value_or("").size());
+  std::set<std::string, std::less<>> owned;
   for (const propertylist::Dictionary& account : now.settings.accounts)
     for (const Dataclass dataclass : deviceimage::kDataclasses)
-      if (auto store = agent.storeIdentifier(account, dataclass)) owned.insert(std::move(*store));
+      if (const auto store = agent.storeIdentifier(account, dataclass);
+          store && store->size() <= longest && !owned.contains(*store))
+        owned.emplace(*store);
   std::vector<std::string> sentences;
   for (const ObservedStore& store : now.stores)
     if (store.account && store.account->starts_with(prefix) && !store.retired &&

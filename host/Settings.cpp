@@ -97,11 +97,26 @@ std::int64_t integerValue(const Value* value) {
 }
 
 bool Selection::covers(const Dictionary& account) const {
+  return SelectedAccounts(*this).cover(account);
+}
+
+bool SelectedAccounts::cover(const Dictionary& account) {
   const std::string_view type = typeOf(account);
-  return std::any_of(rules.begin(), rules.end(), [&](const Rule& rule) {
-    return std::find(rule.types.begin(), rule.types.end(), type) != rule.types.end() &&
-           integerValue(account.find(statusKey)) == rule.status;
-  });
+  return std::any_of(
+      _selection.rules.begin(), _selection.rules.end(), [&](const Selection::Rule& rule) {
+        return std::find(rule.types.begin(), rule.types.end(), type) != rule.types.end() &&
+               _statusOf(account) == rule.status;
+      });
+}
+
+std::int64_t SelectedAccounts::_statusOf(const Dictionary& account) {
+  constexpr std::size_t kShort = 64;
+  const Value* const status = account.find(_selection.statusKey);
+  const propertylist::Text* const text = status != nullptr ? status->asString() : nullptr;
+  if (text == nullptr || text->size() <= kShort) return integerValue(status);
+  const auto known = _numbers.find(text->data());
+  if (known != _numbers.end()) return known->second;
+  return _numbers.emplace(text->data(), leadingInteger(*text)).first->second;
 }
 
 bool UnkeepableAccounts::covers(const Dictionary& account) const {

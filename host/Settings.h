@@ -6,6 +6,7 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <unordered_map>
 #include <vector>
 
 #include "deviceimage/DeviceImage.h"
@@ -54,6 +55,19 @@ struct Selection {
   };
   std::vector<Rule> rules;  // one a migrator
   bool covers(const propertylist::Dictionary& account) const;
+};
+
+// The same for many accounts: a long status that they share is read once.
+class SelectedAccounts {
+ public:
+  // `selection` and the accounts outlive the object.
+  explicit SelectedAccounts(const Selection& selection) : _selection(selection) {}
+  bool cover(const propertylist::Dictionary& account);
+
+ private:
+  std::int64_t _statusOf(const propertylist::Dictionary& account);
+  const Selection& _selection;
+  std::unordered_map<const char*, std::int64_t> _numbers;  // of texts, by where they lie
 };
 
 // Accounts that a migrator cannot keep, although it is not to retire them: those of the types whose

@@ -1,5 +1,6 @@
 #include "host/StoreOwners.h"
 
+#include <algorithm>
 #include <set>
 
 namespace host {
@@ -19,6 +20,15 @@ std::set<Dataclass> enabledDataclasses(const Dictionary& account) {
   return enabled;
 }
 
+// Of the stores, and of those that may come: what is longer is looked for in vain, and a small file
+// may give it to very many accounts.
+std::size_t longestName(const std::vector<ObservedStore>& stores) {
+  std::size_t longest = 1024;
+  for (const ObservedStore& store : stores)
+    longest = std::max(longest, store.account.value_or("").size());
+  return longest;
+}
+
 }  // namespace
 
 StoreOwners::StoreOwners(const Observation& before, const Selection& selection,
@@ -27,15 +37,18 @@ StoreOwners::StoreOwners(const Observation& before, const Selection& selection,
   std::map<StoreName, std::size_t> claims;        // to an account
   std::map<std::string, std::size_t> firstOwner;  // of a store's name, whatever it holds
   const std::vector<Dictionary>& accounts = before.settings.accounts;
+  const std::size_t longest = longestName(before.stores);
+  SelectedAccounts selected(selection);
   for (std::size_t index = 0; index < accounts.size(); ++index) {
-    if (!selection.covers(accounts[index])) continue;
+    if (!selected.cover(accounts[index])) continue;
     const std::set<Dataclass> enabled = enabledDataclasses(accounts[index]);
     for (const Dataclass dataclass : deviceimage::kDataclasses) {
       if (enabled.contains(dataclass)) lineNames.emplace(index, dataclass);
       const auto store = agent.storeIdentifier(accounts[index], dataclass);
-      if (!store) continue;
+      if (!store || store->size() > longest) continue;
       firstOwner.emplace(*store, index);
-      if (enabled.contains(dataclass)) claims.emplace(StoreName(dataclass, *store), index);
+      if (enabled.contains(dataclass))
+        claims.emplace(StoreName(dataclass, std::string(*store)), index);
     }
   }
   for (const ObservedStore& store : before.stores) {

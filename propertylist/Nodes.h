@@ -43,6 +43,9 @@ struct Dictionary::Node : ContainerNode<Dictionary::Entry> {
   using ContainerNode::ContainerNode;
 };
 
+static_assert(static_cast<std::uint64_t>(Kind::data) == 7, "three bits hold each kind");
+static_assert(alignof(storage::Node) >= 8, "three bits of a key's address are free");
+
 inline const Value::TextNode& Value::_textNode() const {
   return *static_cast<const TextNode*>(_content.reference._node());
 }

@@ -21,15 +21,16 @@ PROGRAMS = ["propertylist_test", "account_settings_test", "platform_test", "loca
             "deviceimage_test"]
 GOAL = 98
 GROUPS = {
-    "readers": ["propertylist/Arena.cpp", "propertylist/Arena.h", "propertylist/BinaryReader.cpp",
-                "propertylist/BinaryReader.h", "propertylist/BinaryReaderValues.cpp", "propertylist/DateText.cpp",
-                "propertylist/LeafText.cpp", "propertylist/Reading.cpp", "propertylist/UTF8.cpp",
-                "propertylist/UTF8.h", "propertylist/XMLReader.cpp", "propertylist/XMLScanner.cpp"],
+    "readers": ["propertylist/Arena.cpp", "propertylist/Arena.h", "propertylist/BinaryForm.h",
+                "propertylist/BinaryReader.cpp", "propertylist/BinaryReader.h",
+                "propertylist/BinaryReaderValues.cpp", "propertylist/DateText.cpp", "propertylist/LeafText.cpp",
+                "propertylist/Reading.cpp", "propertylist/UTF8.cpp", "propertylist/UTF8.h",
+                "propertylist/XMLReader.cpp", "propertylist/XMLScanner.cpp"],
     "writer": ["propertylist/BinaryWriter.cpp", "propertylist/BinaryWriterBytes.cpp",
                "propertylist/ValueCount.cpp", "propertylist/XMLWriter.cpp"],
-    "values and tables": ["propertylist/Equality.cpp", "propertylist/Storage.h", "propertylist/TextTable.cpp",
-                          "propertylist/TextTable.h", "propertylist/Value.cpp", "propertylist/Value.h",
-                          "QuillnetAccountTypeRemoval/IdentifierTable.h"],
+    "values and tables": ["propertylist/Equality.cpp", "propertylist/Nodes.h", "propertylist/Storage.h",
+                          "propertylist/TextTable.cpp", "propertylist/TextTable.h", "propertylist/Value.cpp",
+                          "propertylist/Value.h", "QuillnetAccountTypeRemoval/IdentifierTable.h"],
     "loading and changing": ["QuillnetAccountTypeRemoval/ASSAccountsManagerLoading.cpp",
                              "QuillnetAccountTypeRemoval/ASSAccountsManagerMutations.cpp"],
     "merge and save": ["QuillnetAccountTypeRemoval/ASSAccountsManagerSaving.cpp",

@@ -125,6 +125,21 @@ TEST(BinaryWriter, StoresLongTextsOnceHoweverManyLieBetween) {
   EXPECT_EQ(readBinaryPropertyList(*written).value, value);
 }
 
+// Among so many the writer hashes some before it looks for the first.
+TEST(BinaryWriter, WritesEqualTextsOnceAmongVeryMany) {
+  constexpr std::size_t kTexts = 50'000;
+  constexpr std::size_t kPlaces = 70'000;
+  std::vector<Value> shared;
+  for (std::size_t i = 0; i < kTexts; ++i) shared.emplace_back("text " + std::to_string(i));
+  for (std::size_t i = kTexts; i < kPlaces; ++i) shared.push_back(shared[i - kTexts]);
+  std::vector<Value> apart;
+  for (const Value& text : shared) apart.emplace_back(std::string(*text.asString()));
+  const Bytes written = *writeBinaryPropertyList(Array(apart));
+  EXPECT_EQ(written.size(), 878'940U);
+  EXPECT_EQ(*writeBinaryPropertyList(Array(shared)), written);
+  EXPECT_EQ(readBinaryPropertyList(written).value, Value(Array(shared)));
+}
+
 TEST(BinaryWriter, WritesTextsOfOtherLettersOfEachLength) {
   EXPECT_EQ(objectsOf(Array{"\xC3\xA4\xC3\xB6", "\xC3\xBC"}),
             "a20102"

@@ -254,5 +254,52 @@ TEST(Dictionary, AnswersAValueOnlyInTheNamedKind) {
   EXPECT_EQ(findBoolean(dictionary, "absent"), std::nullopt);
 }
 
+TEST(Entry, KeepsItsKeyWhateverItsValueBecomes) {
+  std::vector<Dictionary::Entry> entries{{"a", -1}, {"b", true}, {"c", "text"}};
+  entries[0] = entries[2];
+  EXPECT_EQ(entries[0].key(), "c");
+  EXPECT_EQ(entries[0].value(), Value("text"));
+  entries[1] = std::move(entries[0]);
+  EXPECT_EQ(entries[1].key(), "c");
+  EXPECT_EQ(entries[1].value(), Value("text"));
+  const Dictionary::Entry& same = entries[1];
+  entries[1] = same;
+  EXPECT_EQ(entries[1].key(), "c");
+  entries[0] = Dictionary::Entry("d", Array{1});
+  EXPECT_EQ(entries[0].key(), "d");
+  EXPECT_EQ(entries[0].value(), Value(Array{1}));
+  EXPECT_EQ(entries[2].key(), "c");
+}
+
+TEST(Entry, GivesAwayCopiesOfItsValueWithoutItsKey) {
+  Dictionary dictionary{{"outer", Dictionary{{"inner", -5}}}};
+  Value copy = dictionary.begin()->value();
+  dictionary.set("outer", false);
+  dictionary.set("outer", copy);
+  copy = *copy.asDictionary()->find("inner");
+  EXPECT_EQ(copy, Value(-5));
+  EXPECT_EQ(keysOf(dictionary), std::vector<std::string>{"outer"});
+  EXPECT_EQ(dictionary, (Dictionary{{"outer", Dictionary{{"inner", -5}}}}));
+}
+
+TEST(Value, TellsBooleansFromIntegersBelowZero) {
+  constexpr auto kSmallest = std::numeric_limits<std::int64_t>::min();
+  constexpr auto kLargest = std::numeric_limits<std::uint64_t>::max();
+  for (const Value& integer : {Value(-1), Value(kSmallest)}) {
+    EXPECT_EQ(integer.kind(), Kind::integer);
+    EXPECT_EQ(integer.asBoolean(), std::nullopt);
+    EXPECT_EQ(integer.asUnsigned(), std::nullopt);
+  }
+  EXPECT_EQ(Value(kSmallest).asInteger(), kSmallest);
+  EXPECT_EQ(Value(kLargest).asUnsigned(), kLargest);
+  EXPECT_EQ(Value(kLargest).asInteger(), std::nullopt);
+  EXPECT_NE(Value(kLargest), Value(-1));
+  for (const bool boolean : {false, true}) {
+    EXPECT_EQ(Value(boolean).kind(), Kind::boolean);
+    EXPECT_EQ(Value(boolean).asInteger(), std::nullopt);
+    EXPECT_NE(Value(boolean), Value(boolean ? 1 : 0));
+  }
+}
+
 }  // namespace
 }  // namespace propertylist

@@ -27,7 +27,8 @@ ChosenStore chooseStore(const DeviceImage& image, Dataclass dataclass, const std
   // The device's own account has no store of a service.
   if (stringOrEmpty(*properties, kTypeKey) == "OnMyDevice")
     return {std::nullopt, fmt::format("the local store (account {})", account)};
-  std::optional<std::string> identifier = SyncAgent(image).storeIdentifier(*properties, dataclass);
+  const SyncAgent agent(image);
+  const std::optional<std::string_view> identifier = agent.storeIdentifier(*properties, dataclass);
   if (!identifier)
     throw CommandFailure(
         ExitCode::refused,
@@ -36,7 +37,7 @@ ChosenStore chooseStore(const DeviceImage& image, Dataclass dataclass, const std
                     image.absolutePath(*DeviceImage::preferencesFile(SyncAgent::kApplication)),
                     account));
   std::string description = fmt::format("store \"{}\" of account {}", *identifier, account);
-  return {std::move(identifier), std::move(description)};
+  return {std::string(*identifier), std::move(description)};
 }
 
 class StoreNames::Accounts {
@@ -45,9 +46,9 @@ class StoreNames::Accounts {
     const SyncAgent agent(image);
     for (const Dictionary& account : Settings(image).accounts())
       for (const Dataclass dataclass : deviceimage::kDataclasses)
-        if (auto store = agent.storeIdentifier(account, dataclass))
+        if (const auto store = agent.storeIdentifier(account, dataclass))
           // Of several accounts with one store the first in the file gives the name.
-          _names.try_emplace({deviceimage::syncTypeOf(dataclass), *std::move(store)},
+          _names.try_emplace({deviceimage::syncTypeOf(dataclass), std::string(*store)},
                              stringOrEmpty(account, kIdentifierKey));
   }
   std::string nameOf(Dataclass dataclass, const std::string& storeIdentifier) const {
