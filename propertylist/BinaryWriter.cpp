@@ -214,7 +214,7 @@ BinaryWriter::Number BinaryWriter::_numberOfNewText(const Text& text, std::uint6
   }
   if (hash == 0) hash = TextTable::hashOf(text);
   std::size_t known =
-      _texts.find(hash, [&](std::size_t number) { return *_objects[number].text() == text; });
+      _texts.find(hash, [&](std::size_t number) { return _objects[number].text() == text; });
   if (known == TextTable::kNone) {
     known = _add(Object(text));
     _contentBytes += text.size();

@@ -31,8 +31,8 @@ class BinaryWriter {
    public:
     explicit Object(const Text& text) : _isText(true), _content(&text) {}
     explicit Object(const Value& value, std::uint16_t d = 0) : depth(d), _content(&value) {}
-    // Null when it is another value.
-    const Text* text() const { return _isText ? static_cast<const Text*>(_content) : nullptr; }
+    bool isText() const { return _isText; }
+    const Text& text() const { return *static_cast<const Text*>(_content); }
     // It is no text.
     const Value& value() const { return *static_cast<const Value*>(_content); }
     const void* place() const { return _content; }

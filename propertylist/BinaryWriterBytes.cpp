@@ -63,7 +63,7 @@ bool copyASCII(std::uint8_t* to, std::string_view text) {
 
 // False for a text that is not UTF-8.
 bool BinaryWriter::_put(const Object& object) {
-  if (object.text() != nullptr) return _putText(*object.text());
+  if (object.isText()) return _putText(object.text());
   const Value& value = object.value();
   switch (value.kind()) {
     case Kind::dictionary:
