@@ -136,7 +136,7 @@ RecordStores::Collections RecordStores::listCollections(Dataclass dataclass, Row
         throw DatabaseFailure(SQLITE_CORRUPT, "the folders of the database are nested too deep");
       collection.path.push_back(query.text(2));
       for (const std::string& name : collection.path)
-        room -= std::min(room, sizeof name + name.size());
+        room -= std::min(room, sizeof(std::string) + name.size());
       if (room == 0)
         throw DatabaseFailure(SQLITE_TOOBIG,
                               "the folders of the database are too many, nested too deep");
