@@ -35,9 +35,7 @@ class IdentifierTable {
   // Null when there is nothing under the identifier.
   T* find(std::string_view identifier) {
     const std::size_t index = _indexOf(propertylist::TextTable::hashOf(identifier), identifier);
-    return index != propertylist::TextTable::kNone && _entries[index].isThere()
-               ? &_entries[index].value
-               : nullptr;
+    return _isThere(index) ? &_entries[index].value : nullptr;
   }
   const T* find(std::string_view identifier) const {
     return const_cast<IdentifierTable*>(this)->find(identifier);
@@ -81,6 +79,9 @@ class IdentifierTable {
     if (!_names) return propertylist::TextTable::kNone;
     return _names->indexes.find(
         hash, [&](std::size_t index) { return _identifierOf(_entries[index]) == identifier; });
+  }
+  bool _isThere(std::size_t index) const {
+    return index != propertylist::TextTable::kNone && _entries[index].isThere();
   }
   IdentifierNames& _ownNames();
   // Whether what is not there takes more memory than what is.
@@ -136,8 +137,7 @@ template <typename T>
 T& IdentifierTable<T>::operator[](std::string_view identifier) {
   const std::uint64_t hash = propertylist::TextTable::hashOf(identifier);
   std::size_t known = _indexOf(hash, identifier);
-  if (known != propertylist::TextTable::kNone && _entries[known].isThere())
-    return _entries[known].value;
+  if (_isThere(known)) return _entries[known].value;
   if (_isMostlyRemoved()) {
     _forgetRemoved();
     known = propertylist::TextTable::kNone;
@@ -182,7 +182,7 @@ template <typename T>
 void IdentifierTable<T>::remove(std::string_view identifier) {
   const std::uint64_t hash = propertylist::TextTable::hashOf(identifier);
   const std::size_t index = _indexOf(hash, identifier);
-  if (index == propertylist::TextTable::kNone || !_entries[index].isThere()) return;
+  if (!_isThere(index)) return;
   if (_names.use_count() == 1) _names->indexes.remove(hash, index);
   _removedBytes += _entries[index].size();
   _entries[index].sizeAndRemoved |= kRemoved;

@@ -31,10 +31,8 @@ class PROPERTYLIST_EXPORT TextTable {
         return slot.indexAndOne - 1;
     }
   }
-  // Has the memory that a find with this hash looks at come nearer meanwhile.
-  void prefetch(std::uint64_t hash) const {
-    if (!_slots.empty()) __builtin_prefetch(&_slots[hash & _mask]);
-  }
+  // Has the memory that a find with this hash looks at come nearer meanwhile. Room has been made.
+  void prefetch(std::uint64_t hash) const { __builtin_prefetch(&_slots[hash & _mask]); }
   // Adds what find did not find. `index` is less than 2^32 - 1.
   void add(std::uint64_t hash, std::size_t index);
   // Takes out what was added with this hash and index.

@@ -65,6 +65,15 @@ TEST_F(Mutations, InsertAppendsAndRegistersWithChildren) {
   EXPECT_EQ(store->children(), (Lines{"a1 of a", "a2 of a", "c1 of c", "d1 of d"}));
 }
 
+TEST_F(Mutations, DeletedAccountCanBeInsertedAgain) {
+  const AccountPtr deleted = store->accountWithIdentifier("a");
+  store->deleteAccount(deleted);
+  EXPECT_EQ(store->accountWithIdentifier("a"), nullptr);
+  store->insertAccount(deleted);
+  EXPECT_EQ(order(), (Lines{"b", "c", "a"}));
+  EXPECT_EQ(store->accountWithIdentifier("a"), deleted);
+}
+
 TEST_F(Mutations, InsertOfAKnownIdentifierChangesNothing) {
   const AccountPtr stored = at(0);
   store->insertAccount(record(parentInfo("a", {accountInfo("a9")})));

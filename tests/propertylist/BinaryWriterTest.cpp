@@ -140,6 +140,26 @@ TEST(BinaryWriter, WritesEqualTextsOnceAmongVeryMany) {
   EXPECT_EQ(readBinaryPropertyList(written).value, Value(Array(shared)));
 }
 
+TEST(BinaryWriter, WritesEqualScalarsOnceAmongVeryMany) {
+  constexpr int kPlaces = 40'000;
+  std::vector<Value> members;
+  for (int i = 0; i < kPlaces; ++i) {
+    members.emplace_back(i % 3 + 0.5);
+    members.emplace_back(Date{static_cast<double>(i % 3)});
+    members.emplace_back(i % 2 == 0);
+    members.emplace_back(-(i % 3));
+    members.emplace_back(Bytes{1});
+    members.emplace_back(Array());
+  }
+  const Value value{Array(members)};
+  const Bytes written = *writeBinaryPropertyList(value);
+  EXPECT_EQ(readBinaryPropertyList(written).value, value);
+  // The top array, the empty ones, and 12 others: three each of reals, dates and integers, two
+  // booleans and one data.
+  EXPECT_EQ(written[written.size() - 18], 40'013U >> 8U);
+  EXPECT_EQ(written[written.size() - 17], 40'013U & 0xFFU);
+}
+
 TEST(BinaryWriter, WritesTextsOfOtherLettersOfEachLength) {
   EXPECT_EQ(objectsOf(Array{"\xC3\xA4\xC3\xB6", "\xC3\xBC"}),
             "a20102"
