@@ -84,7 +84,9 @@ FullAccountPtr ASSAccountsManager::fullAccountWithIdentifierLoader(std::string_v
   if (identifier.empty()) return nullptr;
   const AccountPtr* found = topLevelAccountsByID_.find(identifier);
   if (found == nullptr) found = childAccountsByID_.find(identifier);
-  return found != nullptr ? (*found)->fullAccountUsingLoader(loader) : nullptr;
+  if (found == nullptr) return nullptr;
+  const AccountPtr account = *found;  // which the loader may delete
+  return account->fullAccountUsingLoader(loader);
 }
 
 std::vector<FullAccountPtr> ASSAccountsManager::accountsWithTypes(const StringList& types) {
@@ -100,7 +102,8 @@ std::vector<FullAccountPtr> ASSAccountsManager::accountsWithTypesWithLoader(
       matchingChildren[child->parentAccount().get()].emplace_back(identifier);
   }
   std::vector<FullAccountPtr> accounts;
-  for (const AccountPtr& account : *orderedTopLevelAccounts_) {
+  const AccountArray listed = *orderedTopLevelAccounts_;  // which the loader may change
+  for (const AccountPtr& account : listed) {
     if (isOfOneType(*account, types)) {
       FullAccountPtr full =
           fullAccountWithIdentifierLoader(account->identifier().value_or(""), loader);

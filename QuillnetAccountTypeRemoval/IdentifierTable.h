@@ -136,11 +136,12 @@ IdentifierNames& IdentifierTable<T>::_ownNames() {
 template <typename T>
 T& IdentifierTable<T>::operator[](std::string_view identifier) {
   const std::uint64_t hash = propertylist::TextTable::hashOf(identifier);
-  std::size_t known = _indexOf(hash, identifier);
+  const std::size_t known = _indexOf(hash, identifier);
   if (_isThere(known)) return _entries[known].value;
   if (_isMostlyRemoved()) {
+    const std::string kept(identifier);  // it may lie among those that are forgotten
     _forgetRemoved();
-    known = propertylist::TextTable::kNone;
+    return (*this)[kept];
   }
   IdentifierNames& names = _ownNames();
   if (identifier.size() >= kRemoved - names.identifiers.size()) throw std::bad_alloc();

@@ -185,6 +185,17 @@ struct Counted {
   static inline int copies = 0;
 };
 
+TEST(IdentifierTable, TakesAnIdentifierThatLiesInItself) {
+  const std::string longName(5000, 'a');
+  Table table;
+  table.set(longName, 1);
+  table.set("b", 2);
+  const std::string_view itself = (*table.begin()).first;
+  table.remove(itself);
+  table.set(itself, 3);
+  EXPECT_EQ(entriesOf(table), (Entries{"b=2", longName + "=3"}));
+}
+
 TEST(IdentifierTable, CopiesNoValueWhenOneGoesAndComes) {
   IdentifierTable<Counted> table;
   for (int i = 0; i < 3; ++i) table.set("kept " + std::to_string(i), Counted());

@@ -99,6 +99,40 @@ TEST_F(FullAccountQueries, LeaveOutAMatchingChildThatHasNone) {
   EXPECT_EQ(made(), Lines{"c"});
 }
 
+// A loader that deletes the accounts from the store, and looks at its argument afterwards.
+class DeletingLoader : public FullAccountLoader {
+ public:
+  explicit DeletingLoader(OpenStore& store, StringList identifiers)
+      : _store(store), _identifiers(std::move(identifiers)) {}
+  bool loadBundleForAccountWithProperties(const Dictionary& properties) override {
+    for (const std::string& identifier : _identifiers)
+      _store.deleteAccountWithIdentifier(identifier);
+    asked.emplace_back(*properties.find("Identifier")->asString());
+    return false;
+  }
+  Lines asked;
+
+ private:
+  OpenStore& _store;
+  StringList _identifiers;
+};
+
+TEST_F(FullAccountQueries, KeepAnAccountThatItsLoaderDeletes) {
+  const auto store = OpenStore::ofAccounts({accountInfo("1")});
+  DeletingLoader loader(*store, {"1"});
+  EXPECT_NE(store->fullAccountWithIdentifierLoader("1", &loader), nullptr);
+  EXPECT_EQ(loader.asked, Lines{"1"});
+  EXPECT_EQ(store->count(), 0U);
+}
+
+TEST_F(FullAccountQueries, ListWhatWasThereWhenALoaderDeletesIt) {
+  const auto store = OpenStore::ofAccounts(
+      {mailInfo("x", "Mail", withChildren({accountInfo("c", "CalDAV")})), accountInfo("1")});
+  DeletingLoader loader(*store, {"x"});
+  EXPECT_EQ(store->accountsWithTypesWithLoader({"CalDAV"}, &loader).size(), 2U);
+  EXPECT_EQ(loader.asked, (Lines{"c", "1"}));
+}
+
 TEST_F(FullAccountQueries, AnswerTheStoresOwnRecordAsTheDeviceLocalAccount) {
   device.setCreators(
       {{"OnMyDevice", Array{creator("FullAccount", kFullAccounts, "MakingCreator")}}});
