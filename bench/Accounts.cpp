@@ -6,6 +6,8 @@
 #include <random>
 #include <stdexcept>
 #include <string_view>
+#include <utility>
+#include <vector>
 
 #include "propertylist/LeafText.h"
 #include "propertylist/Reading.h"
@@ -21,6 +23,7 @@ using propertylist::Dictionary;
 using propertylist::Value;
 
 constexpr std::uint64_t kSeed = 20261121;
+constexpr std::size_t kMostKeys = 20;  // of an account
 
 struct Kind {
   const char* type;
@@ -46,7 +49,7 @@ constexpr std::array<const char*, 4> kHosts = {"mail.example.com", "imap.post.ex
                                                "dav.example.org", "exchange.firm.example"};
 
 // Makes one file. The engine's output is fixed by the language; the library's distributions are
-// not, and are not used.
+// not, and are not used. No expression draws twice where the compiler may choose which comes first.
 class Maker {
  public:
   Dictionary settings(std::size_t accounts) {
@@ -79,8 +82,9 @@ class Maker {
 
   std::string _description(const std::string& user) {
     const std::string number = std::to_string(_below(10'000));
-    return user + " at " + kHosts[_below(kHosts.size())] + ", room " + number + ", " +
-           kNames[_below(kNames.size())];
+    const char* const host = kHosts[_below(kHosts.size())];
+    const char* const name = kNames[_below(kNames.size())];
+    return user + " at " + host + ", room " + number + ", " + name;
   }
 
   static Array _dataclassesOf(const Kind& kind) {
@@ -99,7 +103,7 @@ class Maker {
             {"Enabled Dataclasses", Array{"com.vantor.Dataclass.Calendars"}}};
   }
 
-  // Twelve keys that every account has, then up to eight more.
+  // Twelve keys that every account has, then others until there are kMostKeys.
   Dictionary _account(std::size_t number) {
     const Kind& kind = kKinds[_below(kKinds.size())];
     const std::string identifier = _identifier();
@@ -107,7 +111,7 @@ class Maker {
     const char* const host = kHosts[_below(kHosts.size())];
     std::vector<Dictionary::Entry> entries;
     const auto add = [&](std::string_view key, Value value) {
-      entries.emplace_back(key, std::move(value));
+      if (entries.size() < kMostKeys) entries.emplace_back(key, std::move(value));
     };
     add("Identifier", identifier);
     add("Sync Identifier", identifier);
@@ -187,15 +191,15 @@ void put(std::string& json, const Value& value) {
   }
 }
 
-}  // namespace
-
-Dictionary settings(std::size_t accounts) { return Maker().settings(accounts); }
-
 std::string jsonText(const Value& value) {
   std::string json;
   put(json, value);
   return json;
 }
+
+}  // namespace
+
+Dictionary settings(std::size_t accounts) { return Maker().settings(accounts); }
 
 const Document& document(std::size_t accounts) {
   static std::map<std::size_t, std::unique_ptr<Document>> made;

@@ -2,7 +2,6 @@
 
 #include <cstddef>
 #include <string>
-#include <vector>
 
 #include "propertylist/Value.h"
 
@@ -28,7 +27,5 @@ struct Document {
   std::string json;
 };
 const Document& document(std::size_t accounts);
-
-std::string jsonText(const propertylist::Value& value);
 
 }  // namespace bench

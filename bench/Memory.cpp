@@ -1,5 +1,6 @@
-// What a store of accounts holds in memory, and the most that a save takes besides: every
-// allocation of this process is counted, as large as the allocator made it.
+// What a store of accounts holds in memory when it is loaded, and the most that is held while it
+// saves, the changes with it: every allocation of this process is counted, as large as the
+// allocator made it.
 //
 // usage: bench-memory ACCOUNTS        prints {"held": BYTES, "peak": BYTES, "binary": BYTES}
 #include <malloc.h>
@@ -7,9 +8,7 @@
 #include <algorithm>
 #include <cstdio>
 #include <cstdlib>
-#include <fstream>
 #include <new>
-#include <stdexcept>
 #include <string>
 
 #include "QuillnetAccountTypeRemoval/ASSAccountsManager.h"
@@ -40,13 +39,6 @@ void release(void* memory) {
   std::free(memory);
 }
 
-void put(const std::string& path, const propertylist::Bytes& bytes) {
-  std::ofstream file(path, std::fstream::binary | std::fstream::trunc);
-  file.write(reinterpret_cast<const char*>(bytes.data()),
-             static_cast<std::streamsize>(bytes.size()));
-  if (!file.flush()) throw std::runtime_error("cannot write " + path);
-}
-
 }  // namespace
 
 void* operator new(std::size_t size) { return allocate(size); }
@@ -67,17 +59,20 @@ int main(int argc, char** argv) {
   bench::device().use(files);
   const std::string path = bench::device().settingsPath();
   const propertylist::Bytes elsewhere = bench::changedElsewhere(accounts);
-  put(path, *propertylist::writeBinaryPropertyList(bench::settings(accounts)));
+  bench::writeFile(path, *propertylist::writeBinaryPropertyList(bench::settings(accounts)));
 
   const std::size_t before = allocated;
   const auto store = accountsettings::ASSAccountsManager::init();
   const std::size_t held = allocated - before;
   bench::changeSome(*store);
-  put(path, elsewhere);
-  const std::size_t beforeSaving = allocated;
+  bench::writeFile(path, elsewhere);
   most = allocated;
   store->saveAllAccounts();
-  const std::size_t peak = held + most - beforeSaving;
+  const std::size_t peak = most - before;
+  if (!bench::holdsChanges(path)) {
+    std::fputs("bench-memory: not saved\n", stderr);
+    return 1;
+  }
   std::printf("{\"held\": %zu, \"peak\": %zu, \"binary\": %zu}\n", held, peak, elsewhere.size());
   return 0;
 }

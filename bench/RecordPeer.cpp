@@ -50,6 +50,10 @@ class Query {
     reset();
     return found;
   }
+  void execute() {
+    step();
+    reset();
+  }
   sqlite3_int64 integer(int column) { return sqlite3_column_int64(_statement, column); }
   std::string text(int column) {
     const auto* const bytes =
@@ -72,7 +76,7 @@ sqlite3_int64 localStore(sqlite3* connection) {
 sqlite3_int64 onlyCollection(sqlite3* connection, sqlite3_int64 store, const std::string& kind) {
   Query insert(connection,
                "INSERT INTO collections (store, kind, name) VALUES (?1, ?2, 'Imported')");
-  insert.put(1, store).put(2, kind).step();
+  insert.put(1, store).put(2, kind).execute();
   return sqlite3_last_insert_rowid(connection);
 }
 
@@ -106,9 +110,9 @@ int copyRecords(sqlite3* connection, const std::string& account, const std::stri
     read.reset();
     if (findEqual.put(1, store).put(2, kind).put(3, baseUID).put(4, hash).put(5, row).isThere())
       continue;
-    dropSource.put(1, store).put(2, kind).put(3, account).put(4, uid).isThere();
+    dropSource.put(1, store).put(2, kind).put(3, account).put(4, uid).execute();
     if (findUID.put(1, store).put(2, kind).put(3, uid).isThere()) continue;
-    copy.put(1, row).put(2, store).put(3, collection).put(4, uid).put(5, account).isThere();
+    copy.put(1, row).put(2, store).put(3, collection).put(4, uid).put(5, account).execute();
     ++copied;
   }
   return copied;
@@ -119,8 +123,9 @@ int copyRecords(sqlite3* connection, const std::string& account, const std::stri
 int moveWithTheLibrary(const std::string& path, const std::string& account,
                        const std::string& kind) {
   sqlite3* opened = nullptr;
-  check(nullptr, sqlite3_open(path.c_str(), &opened));
-  const Connection connection(opened, sqlite3_close);
+  const int code = sqlite3_open(path.c_str(), &opened);
+  const Connection connection(opened, sqlite3_close);  // a failed one has to be closed too
+  check(opened, code);
   for (const char* pragma : {"PRAGMA foreign_keys = ON", "PRAGMA cell_size_check = ON",
                              "PRAGMA temp_store = MEMORY", "PRAGMA synchronous = EXTRA"})
     run(opened, pragma);
@@ -140,7 +145,7 @@ int moveWithTheLibrary(const std::string& path, const std::string& account,
         "UPDATE stores SET retired_at = strftime('%s', 'now') WHERE account = ?1 AND retired_at IS "
         "NULL")
       .put(1, account)
-      .isThere();
+      .execute();
   run(opened, "COMMIT");
   return copied;
 }

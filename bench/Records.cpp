@@ -4,6 +4,7 @@
 #include <benchmark/benchmark.h>
 
 #include <filesystem>
+#include <memory>
 #include <stdexcept>
 
 #include "bench/Rows.h"
@@ -45,11 +46,10 @@ std::string contentOf(Dataclass dataclass, const std::string& uid, std::size_t n
 // An image with one account's records, and a copy of it for each move.
 class Image {
  public:
-  Image(const Records& records, std::size_t count) : _records(records) {
+  Image(const Records& records, std::size_t count) {
     const auto made = DeviceImage::create(_path("full"));
     if (made.image == nullptr) throw std::runtime_error(made.error);
     deviceimage::RecordStores stores(made.image, deviceimage::RecordStores::Access::readWrite);
-    std::vector<std::string> contents;
     std::vector<deviceimage::NewRecord> added;
     for (std::size_t i = 0; i < count; ++i) {
       const std::string uid = "record-" + std::to_string(i) + "@example.com";
@@ -70,22 +70,37 @@ class Image {
  private:
   std::string _path(const std::string& name) const { return _directory.path() + "/" + name; }
   platform::TemporaryDirectory _directory;
-  Records _records;
 };
 
-bool moveHere(const std::string& path, const Records& records) {
+// The services of the image at `path`, without a log.
+std::unique_ptr<deviceimage::DeviceImageServices> servicesOf(const std::string& path) {
   const auto opened = DeviceImage::open(path);
   if (opened.image == nullptr) throw std::runtime_error(opened.error);
   deviceimage::ServiceOptions options;
   options.writesLog = false;
-  const deviceimage::DeviceImageServices services(opened.image, options);
-  platform::SyncDataSource& sources = services.services().syncDataSource;
+  return std::make_unique<deviceimage::DeviceImageServices>(opened.image, options);
+}
+
+bool moveHere(const std::string& path, const Records& records) {
+  const auto services = servicesOf(path);
+  platform::SyncDataSource& sources = services->services().syncDataSource;
   const auto name = sources.dataclassNameForSyncType(records.type);
   const auto from = sources.createDataSource(name, kAccount, std::nullopt).source;
   const auto into = sources.createDataSource(name, std::nullopt, std::nullopt).source;
   return sources.migrateRecords(from, into).isSuccess() && sources.commit(into).isSuccess() &&
          sources.removeStore(from, false).isSuccess() &&
          sources.deleteDataSource(from).isSuccess() && sources.deleteDataSource(into).isSuccess();
+}
+
+// Whether the local store of the image at `path` has so many records.
+bool areLocal(std::size_t count, const std::string& path, const Records& records) {
+  const auto services = servicesOf(path);
+  platform::SyncDataSource& sources = services->services().syncDataSource;
+  const auto name = sources.dataclassNameForSyncType(records.type);
+  const auto local = sources.createDataSource(name, std::nullopt, std::nullopt).source;
+  const auto counted = sources.countRecords(local);
+  return sources.deleteDataSource(local).isSuccess() && counted.status.isSuccess() &&
+         static_cast<std::size_t>(counted.count) == count;
 }
 
 void addMoves(const std::string& name, const Records& records) {
@@ -95,7 +110,10 @@ void addMoves(const std::string& name, const Records& records) {
       state.PauseTiming();
       const std::string path = image.freshCopy();
       state.ResumeTiming();
-      if (!moveHere(path, records)) return state.SkipWithError("not moved");
+      const bool isMoved = moveHere(path, records);
+      state.PauseTiming();
+      if (!isMoved || !areLocal(count, path, records)) return state.SkipWithError("not moved");
+      state.ResumeTiming();
     }
   });
   addSizeRows(name + "/sqlite3", [records](benchmark::State& state, std::size_t count) {

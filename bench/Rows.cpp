@@ -4,6 +4,8 @@
 #include <sstream>
 #include <vector>
 
+#include "propertylist/Reading.h"
+
 namespace bench {
 namespace {
 
@@ -30,6 +32,13 @@ void addRows(const std::string& name, const DocumentRow& row) {
   addSizeRows(name, [row](benchmark::State& state, std::size_t accounts) {
     row(state, document(accounts));
   });
+}
+
+void readBinary(benchmark::State& state, const Document& document) {
+  if (propertylist::readBinaryPropertyList(document.binary).value != document.value)
+    return state.SkipWithError("another value was read");
+  for ([[maybe_unused]] auto iteration : state)
+    benchmark::DoNotOptimize(propertylist::readBinaryPropertyList(document.binary));
 }
 
 int runRows(int argc, char** argv, const std::function<void()>& add) {

@@ -21,6 +21,9 @@ void addSizeRows(const std::string& name, const SizeRow& row);
 // Registers what `add` adds and runs what the command line asks for; the program's exit code.
 int runRows(int argc, char** argv, const std::function<void()>& add);
 
+// Reads the binary form and nothing else, once it is sure that this gives the document's value.
+void readBinary(benchmark::State& state, const Document& document);
+
 // The peers of the readers and the writer.
 void addJSONPeers();
 void addXMLPeers();

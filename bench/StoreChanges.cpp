@@ -1,5 +1,7 @@
 #include "bench/StoreChanges.h"
 
+#include <fstream>
+#include <iterator>
 #include <stdexcept>
 
 #include "bench/Accounts.h"
@@ -15,13 +17,14 @@ namespace {
 
 constexpr std::size_t kOneIn = 100;
 constexpr std::size_t kElsewhere = 3;  // so that no account is changed in both places
+constexpr const char* kChanged = "changed in memory";
 
 }  // namespace
 
 void changeSome(accountsettings::ASSAccountsManager& store) {
   const auto accounts = store.allBasicAccounts();
   for (std::size_t i = 0; i < accounts->size(); i += kOneIn)
-    (*accounts)[i]->setAccountPropertyForKey("changed in memory", "DisplayName");
+    (*accounts)[i]->setAccountPropertyForKey(kChanged, "DisplayName");
 }
 
 propertylist::Bytes changedElsewhere(std::size_t accounts) {
@@ -36,6 +39,20 @@ propertylist::Bytes changedElsewhere(std::size_t accounts) {
       Dictionary{{"Version", 12}, {"Accounts", std::move(list)}});
   if (!bytes) throw std::runtime_error("the changed settings have no binary form");
   return *bytes;
+}
+
+void writeFile(const std::string& path, const propertylist::Bytes& bytes) {
+  std::ofstream file(path, std::fstream::binary | std::fstream::trunc);
+  file.write(reinterpret_cast<const char*>(bytes.data()),
+             static_cast<std::streamsize>(bytes.size()));
+  if (!file.flush()) throw std::runtime_error("cannot write " + path);
+}
+
+// A text of plain ASCII lies in a binary list as it is.
+bool holdsChanges(const std::string& path) {
+  std::ifstream file(path, std::fstream::binary);
+  const std::string bytes{std::istreambuf_iterator<char>(file), {}};
+  return bytes.find(kChanged) != std::string::npos;
 }
 
 }  // namespace bench
