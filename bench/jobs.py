@@ -1,5 +1,6 @@
 """The whole migration as a process: this project's program and a plain script on equal images."""
 
+import contextlib
 import os
 import plistlib
 import shutil
@@ -14,6 +15,15 @@ from pathlib import Path
 HERE = Path(__file__).resolve().parent
 SETTINGS = "var/mobile/Library/Preferences/com.vantor.accountsettings.plist"
 RETIRED_IN = 20  # one account in so many
+
+
+def output_of(command: list, environment: dict | None = None) -> bytes:
+    """What the program prints; the end of this one, with what it said, when it fails."""
+    ended = subprocess.run(command, stdout=subprocess.PIPE, stderr=subprocess.PIPE, env=environment, check=False)
+    if ended.returncode != 0:
+        sys.exit(f"bench/run: {Path(command[0]).name} ended with {ended.returncode}:\n"
+                 + ended.stderr.decode(errors="replace"))
+    return ended.stdout
 
 
 class Job:
@@ -48,7 +58,7 @@ def left_in(image: Path) -> list:
         accounts = [account["Identifier"] for account in plistlib.load(file)["Accounts"]]
     records = []
     for database in sorted(image.glob("var/mobile/Library/*/*.sqlite")):
-        with sqlite3.connect(f"file:{database}?mode=ro", uri=True) as base:
+        with contextlib.closing(sqlite3.connect(f"file:{database}?mode=ro", uri=True)) as base:
             records += base.execute("SELECT kind, uid, base_uid, content_hash FROM records JOIN stores "
                                     "ON stores.id = store WHERE account IS NULL AND retired_at IS NULL").fetchall()
     return accounts + sorted(records)
@@ -56,8 +66,7 @@ def left_in(image: Path) -> list:
 
 def make_images(programs: Path, directory: Path, many: int) -> dict[str, Job]:
     sample = directory / "sample"
-    subprocess.run([HERE.parent / "examples/make-sample-image", sample, "--tool", programs / "device-image"],
-                   check=True, stdout=subprocess.DEVNULL)
+    output_of([HERE.parent / "examples/make-sample-image", sample, "--tool", programs / "device-image"])
     large, idle = directory / "large", directory / "idle"
     shutil.copytree(sample, large, symlinks=True)
     shutil.copytree(sample, idle, symlinks=True)
@@ -76,14 +85,17 @@ def change_settings(image: Path, change) -> None:
 
 
 def many_accounts(accounts: list[dict], many: int) -> list[dict]:
-    """The sample's accounts and others like them; one in RETIRED_IN is to go."""
+    """The sample's accounts that stay, and others like its accounts; of all of them one in RETIRED_IN is to go."""
     going = next(account for account in accounts if account.get("QuillnetStatus") == 1)
     staying = [account for account in accounts if "QuillnetStatus" not in account and account["Type"] != "OnMyDevice"]
     made = [account for account in accounts if account.get("QuillnetStatus") != 1]
     while len(made) < many:
         number = len(made)
-        model = going if number % RETIRED_IN == 0 else staying[number % len(staying)]
+        model = going if number % RETIRED_IN == RETIRED_IN - 1 else staying[number % len(staying)]
         made.append(renamed(model, number))
+    retired = sum(account.get("QuillnetStatus") == 1 for account in made)
+    if (len(made), retired) != (many, many // RETIRED_IN):
+        sys.exit(f"bench/run: {retired} of {len(made)} accounts are to go, not {many // RETIRED_IN} of {many}")
     return made
 
 

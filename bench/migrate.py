@@ -12,6 +12,9 @@ import sqlite3
 import sys
 import time
 
+if len(sys.argv) != 2:
+    print("usage: migrate.py IMAGE", file=sys.stderr)
+    sys.exit(2)
 LIBRARY = sys.argv[1] + "/var/mobile/Library/"
 SETTINGS = LIBRARY + "Preferences/com.vantor.accountsettings.plist"
 AGENT = LIBRARY + "Preferences/com.vantor.OTASyncAgent.plist"
@@ -88,7 +91,10 @@ def save(settings):
 def main():
     with open(SETTINGS, "rb") as file:
         settings = plistlib.load(file)
-    agent = plistlib.load(open(AGENT, "rb"))["AccountName"] if os.path.exists(AGENT) else None
+    agent = None
+    if os.path.exists(AGENT):
+        with open(AGENT, "rb") as file:
+            agent = plistlib.load(file)["AccountName"]
     for account in list(settings["Accounts"]):
         if account["Type"] not in ("Quillnet", "VantorAccount") or account.get("QuillnetStatus") != 1:
             continue

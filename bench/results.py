@@ -4,9 +4,11 @@ import math
 from typing import NamedTuple
 
 SIZES = [8, 100, 1_000, 10_000, 100_000]
+RECORD_SIZES = [100, 1_000, 10_000]  # of the rows that move records
 GROWTH_FROM = 100  # below, fixed costs show
 
-# Operation, the peer's row in the same operation, the least ratio of the peer's time to ours, at which sizes.
+# Operation, the peer's row in the same operation, the least ratio of the peer's time to ours, and the sizes
+# at which it has to be kept.
 FASTER_THAN = [
     ("read binary", "RapidJSON", 2.8, SIZES),
     ("read binary", "simdjson", None, SIZES),
@@ -17,7 +19,8 @@ FASTER_THAN = [
     ("write binary", "RapidJSON", 1.2, SIZES),
     ("write binary", "nlohmann-json", None, SIZES),
 ]
-# Operation and its measure, the operation and measure it is held against, the most it may take of it.
+# Operation, whose row and which operation ours is held against, the most that ours may take of its time, the
+# sizes at which that has to be kept, and the time that counts: the processor's or the clock's.
 AT_MOST = [
     ("load", "read alone", "load", 1.6, SIZES, "cpu"),
     ("save", "own", "load", 4.0, [10_000], "cpu"),
@@ -25,24 +28,30 @@ AT_MOST = [
     ("move contacts", "sqlite3", "move contacts", 1.5, [10_000], "cpu"),
     ("move events", "sqlite3", "move events", 1.5, [10_000], "cpu"),
 ]
-LINEAR = ["read binary", "read XML", "write binary", "load", "save", "delete one by one", "replace types",
-          "query identifiers", "query types", "list children", "move contacts", "move events"]
+# Operations whose time grows as the accounts do, and the sizes from which that is seen.
+LINEAR = {operation: [size for size in SIZES if size >= GROWTH_FROM] for operation in
+          ["read binary", "read XML", "write binary", "load", "save", "delete one by one", "replace types",
+           "query identifiers", "query types", "list children"]}
+LINEAR |= {"move contacts": RECORD_SIZES, "move events": RECORD_SIZES}
 MOST_GROWTH = 1.05
 MOST_HELD, MOST_PEAK = 1_200, 4.0  # bytes an account; of what is held
-JOB_FASTER = {"sample image": 5.0, "accounts": 10.0}
+MEMORY_SIZES = [1_000, 10_000, 100_000]  # below, fixed costs show
+JOB_FASTER = {"sample image": 5.0, "1,000 accounts": 10.0}
 MOST_IDLE = 0.030  # seconds of processor time
+BY_THE_CLOCK = ["durable save"]  # it waits for the disk
+BEGIN, END = "<!-- The table of bench/run begins here. -->", "<!-- It ends here. -->"
 
 
 class Row(NamedTuple):
     what: str
-    values: dict  # by number of accounts, or by None: a number
+    values: dict  # by number of accounts, or by None when it is of no number of them
     goal: str = ""
     met: str = ""
 
 
 class Results:
-    def __init__(self, rows: list[dict], memory: list[dict], jobs: list[dict]):
-        self.rows, self.memory, self.jobs = rows, memory, jobs
+    def __init__(self, rows: list[dict], memory: list[dict], jobs: list[dict], origin: dict | None = None):
+        self.rows, self.memory, self.jobs, self.origin = rows, memory, jobs, origin or {}
         self._times = {(row["operation"], row["who"], row["accounts"]): row for row in rows}
 
     def time(self, operation: str, who: str, size: int, measure: str = "cpu") -> float | None:
@@ -73,10 +82,11 @@ class Results:
         return math.log(ratio) / math.log(large / small)
 
 
-def verdict(values: list[float], goal: float | None, is_met) -> str:
-    if goal is None or not values:
+def verdict(values: dict, sizes: list, goal: float | None, is_met) -> str:
+    """Whether the goal is met at all the sizes that it names; nothing when one of them was not measured."""
+    if goal is None or not all(size in values for size in sizes):
         return ""
-    return "yes" if all(is_met(value, goal) for value in values) else "no"
+    return "yes" if all(is_met(values[size], goal) for size in sizes) else "no"
 
 
 def at_least(value: float, goal: float) -> bool:
@@ -91,15 +101,13 @@ def ratio_rows(results: Results) -> list[Row]:
     rows = []
     for operation, peer, goal, sizes in FASTER_THAN:
         ratios = results.ratios((operation, peer), (operation, "own"))
-        looked_at = [ratios[size] for size in sizes if size in ratios]
         rows.append(Row(f"{operation}, times as fast as {peer}", ratios, f"≥ {goal}" if goal else "",
-                        verdict(looked_at, goal, at_least)))
+                        verdict(ratios, sizes, goal, at_least)))
     for operation, other, base, goal, sizes, measure in AT_MOST:
         ratios = results.ratios((operation, "own"), (base, other), measure)
-        looked_at = [ratios[size] for size in sizes if size in ratios]
         against = f"{base} ({other})" if other != "own" else base
         rows.append(Row(f"{operation}, times the time of {against}", ratios, f"≤ {goal}",
-                        verdict(looked_at, goal, at_most)))
+                        verdict(ratios, sizes, goal, at_most)))
     rows += memory_rows(results)[1:]
     return rows + job_rows(results)
 
@@ -107,11 +115,10 @@ def ratio_rows(results: Results) -> list[Row]:
 def memory_rows(results: Results) -> list[Row]:
     held = {entry["accounts"]: entry["held"] / entry["accounts"] for entry in results.memory}
     peak = {entry["accounts"]: entry["peak"] / entry["held"] for entry in results.memory}
-    large = [size for size in held if size >= 1_000]  # below, fixed costs show
     return [Row("bytes an account held by a loaded store", held, f"≤ {MOST_HELD:,}",
-                verdict([held[size] for size in large], MOST_HELD, at_most)),
+                verdict(held, MEMORY_SIZES, MOST_HELD, at_most)),
             Row("peak while saving, times what is held", peak, f"≤ {MOST_PEAK}",
-                verdict([peak[size] for size in large], MOST_PEAK, at_most))]
+                verdict(peak, MEMORY_SIZES, MOST_PEAK, at_most))]
 
 
 def job_rows(results: Results) -> list[Row]:
@@ -120,33 +127,42 @@ def job_rows(results: Results) -> list[Row]:
     for job in dict.fromkeys(job["job"] for job in results.jobs):
         own, script = times[job, "own"], times[job, "Python script"]
         if job == "nothing to do":
-            rows.append(Row("whole job, nothing to do: ms of processor time", {None: own["processor"] * 1000},
-                            f"≤ {MOST_IDLE * 1000:.0f}", verdict([own["processor"]], MOST_IDLE, at_most)))
             continue
-        goal = JOB_FASTER["sample image" if job == "sample image" else "accounts"]
-        ratio = script["processor"] / own["processor"]
-        rows.append(Row(f"whole job, {job}: times as fast as the Python script", {None: ratio}, f"≥ {goal}",
-                        verdict([ratio], goal, at_least)))
+        goal = JOB_FASTER.get(job)
+        ratio = {None: script["processor"] / own["processor"]}
+        rows.append(Row(f"whole job, {job}: times as fast as the Python script", ratio, f"≥ {goal}" if goal else "",
+                        verdict(ratio, [None], goal, at_least)))
         rows.append(Row(f"whole job, {job}: the same by the clock", {None: script["clock"] / own["clock"]}))
     return rows
 
 
+def job_time_rows(results: Results) -> list[Row]:
+    rows = []
+    for job in results.jobs:
+        goal = MOST_IDLE * 1000 if (job["job"], job["who"]) == ("nothing to do", "own") else None
+        time = {None: job["processor"] * 1000}
+        rows.append(Row(f"whole job, {job['job']}, {job['who']}: ms of processor time", time,
+                        f"≤ {goal:.0f}" if goal else "", verdict(time, [None], goal, at_most)))
+    return rows
+
+
 def table_rows(results: Results) -> list[Row]:
-    rows = ratio_rows(results)
+    rows = ratio_rows(results) + job_time_rows(results)
     seen = dict.fromkeys((row["operation"], row["who"]) for row in results.rows)
     for operation, who in seen:
-        times = {size: time / size for size in SIZES if (time := results.time(operation, who, size))}
-        rows.append(Row(f"{operation}, {who}: ns an account", times))
-    for size_row in ("binary", "JSON"):
-        sizes = {entry["accounts"]: entry[size_row] / entry["accounts"] for entry in results.memory if size_row in entry}
-        if sizes:
-            rows.append(Row(f"{size_row} file: bytes an account", sizes))
+        measure = "clock" if operation in BY_THE_CLOCK else "cpu"
+        times = {size: time / size for size in SIZES if (time := results.time(operation, who, size, measure))}
+        rows.append(Row(f"{operation}, {who}: ns {'a record' if operation.startswith('move ') else 'an account'}"
+                        + (", by the clock" if measure == "clock" else ""), times))
+    rows.append(Row("binary file: bytes an account",
+                    {entry["accounts"]: entry["binary"] / entry["accounts"] for entry in results.memory}))
     rows.append(memory_rows(results)[0])
-    for operation in LINEAR:
+    for operation, sizes in LINEAR.items():
         growth = results.growth(operation)
         if growth is not None:
+            is_whole = all(results.time(operation, "own", size) for size in sizes)
             rows.append(Row(f"{operation}: exponent of growth", {None: growth}, f"≤ {MOST_GROWTH}",
-                            verdict([growth], MOST_GROWTH, at_most)))
+                            verdict({None: growth}, [None], MOST_GROWTH, at_most) if is_whole else ""))
     return rows
 
 
@@ -157,13 +173,11 @@ def shown(value: float) -> str:
 
 
 def table(results: Results) -> list[list[str]]:
-    """Cells: what, one column for each number of accounts, goal, met. A value of no number stands in the last."""
+    """Cells: what, one column for each number of accounts, one for values of no number, goal, met."""
     sizes = sorted({row["accounts"] for row in results.rows} | {entry["accounts"] for entry in results.memory})
-    lines = [["", *[f"{size:,}" for size in sizes], "goal", "met"]]
+    lines = [["", *[f"{size:,}" for size in sizes], "at any size", "goal", "met"]]
     for row in table_rows(results):
-        cells = [shown(row.values[size]) if size in row.values else "" for size in sizes]
-        if None in row.values:
-            cells[-1] = shown(row.values[None])
+        cells = [shown(row.values[size]) if size in row.values else "" for size in [*sizes, None]]
         lines.append([row.what, *cells, row.goal, row.met])
     return lines
 
@@ -177,3 +191,16 @@ def as_text(lines: list[list[str]]) -> str:
 def as_markdown(lines: list[list[str]]) -> str:
     head = ["| " + " | ".join(lines[0]) + " |", "|---|" + "---:|" * (len(lines[0]) - 1)]
     return "\n".join(head + ["| " + " | ".join(line) + " |" for line in lines[1:]])
+
+
+def origin_line(origin: dict) -> str:
+    return f"{origin['date']}, commit {origin['commit']}, {origin['processor']}, {origin['compiler']}"
+
+
+def put_between(document: str, generated: str) -> str:
+    """The document with `generated` in place of what stands between the markers; ValueError when one is missing."""
+    before, begin, rest = document.partition(BEGIN)
+    _, end, behind = rest.partition(END)
+    if not begin or not end:
+        raise ValueError(f"the line '{END if begin else BEGIN}' is missing")
+    return f"{before}{BEGIN}\n{generated}\n{END}{behind}"

@@ -5,15 +5,19 @@ import results
 SIZES = [200, 6_400]
 FILTERS = {
     "bench-lists": "^(read binary/(own|RapidJSON)|read XML/(own|expat)|write binary/(own|RapidJSON)|compare/own)/",
-    "bench-stores": "^(load|load/read alone|save|query .*|list .*|delete .*|replace .*)/",
+    "bench-stores": "^(load|save|query .*|list .*|delete .*|replace .*)/",
     "bench-records": "^move contacts/",
 }
-# Twice the time at twice the accounts is 1, four times 2; caches and a busy machine take their part.
-MOST_GROWTH = 1.75
+REPETITIONS = 3  # the least of which the median leaves out one that was disturbed
+# Twice the time at twice the accounts is 1, four times 2; caches and a busy machine take their part. What is
+# quadratic in a part of its work alone may come to no more than this between these sizes.
+MOST_GROWTH = 1.5
+# Two large lists together leave the near caches, and a neighbour may take the far one: up to 1.5 was measured.
+MOST_GROWTH_OF = {"compare": 1.75}
 # Operation, our row, the peer's operation and row, and how many times its time ours may be.
 MOST_OF_PEER = [
-    ("read binary", "own", "read binary", "RapidJSON", 6),
-    ("write binary", "own", "write binary", "RapidJSON", 8),
+    ("read binary", "own", "read binary", "RapidJSON", 3),
+    ("write binary", "own", "write binary", "RapidJSON", 4),
     ("read XML", "own", "read XML", "expat", 6),
     ("load", "own", "load", "read alone", 5),
     ("save", "own", "load", "own", 12),
@@ -25,13 +29,13 @@ def check(rows_of) -> int:
     """Prints one line for each rule; 1 when one is broken."""
     rows = []
     for program, wanted in FILTERS.items():
-        rows += rows_of(program, SIZES, 2, wanted, 0.03)
+        rows += rows_of(program, SIZES, REPETITIONS, wanted, 0.03)
     found = results.Results(rows, [], [])
     small, large = SIZES
     bad = 0
     for operation in dict.fromkeys(row["operation"] for row in rows):
         growth = found.growth_between(operation, small, large)
-        bad += told(f"{operation}: exponent of growth", growth, MOST_GROWTH)
+        bad += told(f"{operation}: exponent of growth", growth, MOST_GROWTH_OF.get(operation, MOST_GROWTH))
     for operation, who, other, peer, most in MOST_OF_PEER:
         ratio = found.time(operation, who, large) / found.time(other, peer, large)
         bad += told(f"{operation}: times the time of {other}, {peer}", ratio, most)
