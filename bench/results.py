@@ -4,7 +4,7 @@ import math
 from typing import NamedTuple
 
 SIZES = [8, 100, 1_000, 10_000, 100_000]
-RECORD_SIZES = [100, 1_000, 10_000]  # of the rows that move records
+FEWER_SIZES = [100, 1_000, 10_000]  # of the rows that move records, and of the one that is quadratic
 GROWTH_FROM = 100  # below, fixed costs show
 
 # Operation, the peer's row in the same operation, the least ratio of the peer's time to ours, and the sizes
@@ -30,9 +30,9 @@ AT_MOST = [
 ]
 # Operations whose time grows as the accounts do, and the sizes from which that is seen.
 LINEAR = {operation: [size for size in SIZES if size >= GROWTH_FROM] for operation in
-          ["read binary", "read XML", "write binary", "load", "save", "delete one by one", "replace types",
+          ["read binary", "read XML", "write binary", "load", "save", "delete from the end", "replace types",
            "query identifiers", "query types", "list children"]}
-LINEAR |= {"move contacts": RECORD_SIZES, "move events": RECORD_SIZES}
+LINEAR |= dict.fromkeys(["delete in any order", "move contacts", "move events"], FEWER_SIZES)
 MOST_GROWTH = 1.05
 MOST_HELD, MOST_PEAK = 1_200, 4.0  # bytes an account; of what is held
 MEMORY_SIZES = [1_000, 10_000, 100_000]  # below, fixed costs show

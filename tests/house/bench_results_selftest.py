@@ -106,7 +106,7 @@ class Check(unittest.TestCase):
         """What small.check answers, and its lines about bad rules, when all rows but `bad` are as they should be."""
         whos = {(operation, who) for operation, own, other, peer, _ in small.MOST_OF_PEER
                 for operation, who in ((operation, own), (other, peer))}
-        whos |= {("delete one by one", "own"), ("compare", "own")}
+        whos |= {("delete from the end", "own"), ("compare", "own")}
         made = [row for operation, who in sorted(whos)
                 for row in rows(operation, who, small.SIZES, **bad.get((operation, who), {}))]
         printed = io.StringIO()
@@ -119,8 +119,8 @@ class Check(unittest.TestCase):
         self.assertEqual(self.said({}), (0, []))
 
     def test_quadratic_time_is_bad(self):
-        self.assertEqual(self.said({("delete one by one", "own"): {"power": 2.0}}),
-                         (1, ["bad delete one by one: exponent of growth: 2.00, at most 1.5"]))
+        self.assertEqual(self.said({("delete from the end", "own"): {"power": 2.0}}),
+                         (1, ["bad delete from the end: exponent of growth: 2.00, at most 1.5"]))
 
     def test_comparing_may_wait_for_memory_and_not_be_quadratic(self):
         self.assertEqual(self.said({("compare", "own"): {"power": 1.6}}), (0, []))
