@@ -99,6 +99,8 @@ class ASSAccountsManager {
   void insertAccount(const AccountPtr& account);
   // Removes the last account that has the identifier of `account`, which need not be the same
   // object, and its children. Of two different accounts with one identifier the first stays listed.
+  // Looks through the list from its end, because an account's identifier may have been changed
+  // since: whoever deletes very many does so from the end, or in one call of the replacement below.
   void deleteAccount(const AccountPtr& account);
   // Deletes the top-level account with the identifier; nothing when there is none.
   void deleteAccountWithIdentifier(std::string_view identifier);

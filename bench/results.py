@@ -28,7 +28,7 @@ AT_MOST = [
     ("move contacts", "sqlite3", "move contacts", 1.5, [10_000], "cpu"),
     ("move events", "sqlite3", "move events", 1.5, [10_000], "cpu"),
 ]
-# Operations whose time grows as the accounts do, and the sizes from which that is seen.
+# Operations whose time is to grow as the accounts do, and the sizes from which that is seen.
 LINEAR = {operation: [size for size in SIZES if size >= GROWTH_FROM] for operation in
           ["read binary", "read XML", "write binary", "load", "save", "delete from the end", "replace types",
            "query identifiers", "query types", "list children"]}

@@ -9,11 +9,11 @@ FILTERS = {
     "bench-records": "^move contacts/",
 }
 REPETITIONS = 3  # the least of which the median leaves out one that was disturbed
-# Twice the time at twice the accounts is 1, four times 2; caches and a busy machine take their part. What is
-# quadratic in a part of its work alone may come to no more than this between these sizes.
+# Twice the time at twice the accounts is 1, four times 2; caches and a busy machine take their part.
 MOST_GROWTH = 1.6
-# Two large lists together leave the near caches, and a neighbour may take the far one: up to 1.5 was measured.
-MOST_GROWTH_OF = {"compare": 1.75}
+# Two large lists together leave the near caches, and a neighbour may take the far one: up to 1.5 was measured. A
+# deletion that walks over the whole list comes to 1.63 only, because a step of that takes little.
+MOST_GROWTH_OF = {"compare": 1.75, "delete from the end": 1.45}
 # Operation, our row, the peer's operation and row, and how many times its time ours may be.
 MOST_OF_PEER = [
     ("read binary", "own", "read binary", "RapidJSON", 3),

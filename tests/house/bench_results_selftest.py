@@ -120,7 +120,7 @@ class Check(unittest.TestCase):
 
     def test_quadratic_time_is_bad(self):
         self.assertEqual(self.said({("delete from the end", "own"): {"power": 2.0}}),
-                         (1, ["bad delete from the end: exponent of growth: 2.00, at most 1.6"]))
+                         (1, ["bad delete from the end: exponent of growth: 2.00, at most 1.45"]))
 
     def test_comparing_may_wait_for_memory_and_not_be_quadratic(self):
         self.assertEqual(self.said({("compare", "own"): {"power": 1.6}}), (0, []))
