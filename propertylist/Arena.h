@@ -121,11 +121,16 @@ inline Arena::Raw Arena::newASCII(const char* bytes, std::size_t size, bool& isA
   char* const characters = memory + sizeof(Value::TextNode);
   std::uint64_t word = 0;
   std::uint64_t all = 0;
-  for (std::size_t at = 0; at < size; at += sizeof word) {
+  std::size_t at = 0;
+  for (; at + sizeof word <= size; at += sizeof word) {
     std::memcpy(&word, bytes + at, sizeof word);
     std::memcpy(characters + at, &word, sizeof word);
-    const std::size_t behind = at + sizeof word > size ? at + sizeof word - size : 0;
-    all |= word << 8 * behind;  // without what is behind the text
+    all |= word;
+  }
+  if (at < size) {
+    std::memcpy(&word, bytes + at, sizeof word);
+    std::memcpy(characters + at, &word, sizeof word);
+    all |= word << 8 * (at + sizeof word - size);  // without what is behind the text
   }
   isASCII = (all & kHighBits) == 0;
   Raw raw;

@@ -29,7 +29,7 @@ bool BinaryReader::_makeUTF16(Object& object, const Header& header) {
     const std::size_t at = header.contents + i * 2;
     const auto unit = static_cast<char32_t>(_number(at, 2));
     if (!isSurrogate(unit)) {
-      next = putUTF8Unit(next, unit);
+      next = putUTF8(next, unit);
       continue;
     }
     // Two of them make one character.

@@ -28,9 +28,6 @@ inline constexpr std::size_t kLongestUTF8 = 4;
 // hold.
 inline char* putUTF8(char* to, char32_t codePoint);
 void appendUTF8(std::string& text, char32_t codePoint);
-// The same for a unit of 16 bits that is no surrogate, without a guess how long it is: always
-// writes three bytes.
-inline char* putUTF8Unit(char* to, char32_t unit);
 
 // Whether `codePoint` is a number that UTF-8 can hold.
 constexpr bool isScalarValue(char32_t codePoint) {
@@ -80,15 +77,6 @@ inline char* putUTF8(char* to, char32_t codePoint) {
   }
   *to++ = byteOf(0x80U | (codePoint & 0x3FU));
   return to;
-}
-
-inline char* putUTF8Unit(char* to, char32_t unit) {
-  constexpr unsigned kLeads = 0xE0C000;  // of three, two and one bytes
-  const unsigned more = static_cast<unsigned>(unit >= 0x80) + static_cast<unsigned>(unit >= 0x800);
-  to[0] = static_cast<char>(static_cast<unsigned char>(kLeads >> 8 * more | unit >> 6 * more));
-  to[1] = static_cast<char>(0x80U | (unit >> 6 * (more / 2) & 0x3FU));
-  to[2] = static_cast<char>(0x80U | (unit & 0x3FU));
-  return to + 1 + more;
 }
 
 }  // namespace propertylist
