@@ -2,7 +2,9 @@
 
 #include <dirent.h>
 #include <fcntl.h>
+#include <linux/openat2.h>
 #include <sys/stat.h>
+#include <sys/syscall.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -46,6 +48,17 @@ bool isOfMobile(std::string_view relative) {
   return relative == DeviceImage::kHomeDirectory ||
          isBelow(relative, DeviceImage::kHomeDirectory) ||
          isBelow(relative, DeviceImage::kTemporaryDirectory);
+}
+
+// Opens the directory that the components but the last lead to, in one step and without following a
+// link. -1 where the system cannot do that, and when the directory cannot be reached.
+int openInOneStep(int root, const std::vector<std::string>& components) {
+  std::string path = ".";
+  for (std::size_t i = 0; i + 1 < components.size(); ++i) path.append("/").append(components[i]);
+  open_how how = {};
+  how.flags = kDirectoryFlags;
+  how.resolve = RESOLVE_BENEATH | RESOLVE_NO_SYMLINKS;
+  return static_cast<int>(::syscall(SYS_openat2, root, path.c_str(), &how, sizeof how));
 }
 
 platform::Status failure(int code, std::string_view what, std::string_view relative) {
@@ -111,6 +124,9 @@ std::optional<std::string> DeviceImage::preferencesFile(std::string_view applica
 DeviceImage::Parent DeviceImage::_openParent(std::string_view relative, bool makeMissing) const {
   std::vector<std::string> components = componentsOf(relative);
   if (components.empty()) return {failure(EINVAL, "cannot use the name", relative), -1, {}};
+  const int reached = openInOneStep(_root, components);
+  if (reached >= 0) return {platform::Status::success(), reached, std::move(components.back())};
+  // Step by step: which one fails says what is wrong, and what is missing may be made.
   Descriptor directory(::openat(_root, ".", kDirectoryFlags));
   if (!directory.isOpen()) return {failure(errno, "cannot reach", relative), -1, {}};
   std::string walked;

@@ -61,11 +61,11 @@ struct ImageProblem {
 // A directory that mirrors the file system of a device. docs/device-image.md says what lies where.
 //
 // Names inside the image are relative ("var/mobile/Library"); a leading "/" is dropped. Every
-// operation walks such a name one component at a time and follows no link, so that nothing outside
-// the image is read or written, whatever the image holds; a name with "..", an empty component or a
-// NUL byte is refused with EINVAL, a link on the way with ELOOP or ENOTDIR. Directories are made
-// with mode 0700, files with 0600. When root works on an image, what it makes under var/mobile and
-// in tmp/ belongs to the image's user "mobile".
+// operation goes along such a name without following a link, so that nothing outside the image is
+// read or written, whatever the image holds and whoever changes it meanwhile; a name with "..", an
+// empty component or a NUL byte is refused with EINVAL, a link on the way with ELOOP or ENOTDIR.
+// Directories are made with mode 0700, files with 0600. When root works on an image, what it makes
+// under var/mobile and in tmp/ belongs to the image's user "mobile".
 //
 // The object holds the image's directory open. Any thread may use it.
 class DeviceImage {

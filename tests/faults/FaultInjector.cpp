@@ -1,7 +1,8 @@
 // Runs a command and lists its system calls, or fails or kills it at one of them:
 //
 //   fault_injector list COMMAND...
-//       prints "GENERATION NUMBER [PATH]" for each call, with the path that openat is asked for
+//       prints "GENERATION NUMBER [PATH]" for each call, with the path that openat is asked for;
+//       openat2 counts as openat everywhere
 //   fault_injector hit GENERATION NUMBER NTH[+] kill|cut|swap|ERRNO COMMAND...
 //       hits the NTH call of that number (with "+" all from there on) of the processes of a
 //       generation and prints "hit" when it comes to it
@@ -67,10 +68,16 @@ struct Task {
   int error = 0;           // 0 kills
 };
 
+unsigned long long countedAs(unsigned long long call) {
+  return call == SYS_openat2 ? SYS_openat : call;
+}
+
 bool installFilter(int call) {
+  const int alike = call == SYS_openat ? SYS_openat2 : call;
   sock_filter all[] = {BPF_STMT(BPF_RET | BPF_K, SECCOMP_RET_TRACE)};
   sock_filter one[] = {BPF_STMT(BPF_LD | BPF_W | BPF_ABS, offsetof(seccomp_data, nr)),
-                       BPF_JUMP(BPF_JMP | BPF_JEQ | BPF_K, static_cast<unsigned>(call), 0, 1),
+                       BPF_JUMP(BPF_JMP | BPF_JEQ | BPF_K, static_cast<unsigned>(call), 1, 0),
+                       BPF_JUMP(BPF_JMP | BPF_JEQ | BPF_K, static_cast<unsigned>(alike), 0, 1),
                        BPF_STMT(BPF_RET | BPF_K, SECCOMP_RET_TRACE),
                        BPF_STMT(BPF_RET | BPF_K, SECCOMP_RET_ALLOW)};
   sock_fprog filter = {std::size(one), one};
@@ -185,8 +192,9 @@ class Tracer {
   }
 
   static void _list(pid_t process, int generation, const user_regs_struct& registers) {
+    const unsigned long long call = countedAs(registers.orig_rax);
     std::string path;
-    if (registers.orig_rax == SYS_openat) {
+    if (call == SYS_openat) {
       std::array<char, PATH_MAX> buffer = {};
       // Page by page, because the text may lie at the end of the memory.
       for (std::size_t size = 0; size < buffer.size() - 1;) {
@@ -201,7 +209,7 @@ class Tracer {
       }
       path = std::string(" ") + buffer.data();
     }
-    std::printf("%d %llu%s\n", generation, registers.orig_rax, path.c_str());
+    std::printf("%d %llu%s\n", generation, call, path.c_str());
   }
 
   const Task _task;

@@ -10,6 +10,7 @@
 #include <dlfcn.h>
 #include <fcntl.h>
 #include <sys/stat.h>
+#include <sys/syscall.h>
 #include <unistd.h>
 
 #include <array>
@@ -153,6 +154,18 @@ mode_t modeAmong(int flags, __builtin_va_list& arguments) {
     swapPlacesAt("open");                                                  \
     return original<int(const char*, int, ...)>(#name)(path, flags, mode); \
   }
+
+// openat2 has no function of its own.
+EXPORTED long syscall(long number, ...) noexcept {
+  __builtin_va_list arguments;
+  __builtin_va_start(arguments, number);
+  std::array<long, 6> values = {};
+  for (long& value : values) value = __builtin_va_arg(arguments, long);
+  __builtin_va_end(arguments);
+  if (number == SYS_openat2) swapPlacesAt("open");
+  return original<long(long, ...)>("syscall")(number, values[0], values[1], values[2], values[3],
+                                              values[4], values[5]);
+}
 
 EXPORTED_OPENAT(openat)
 EXPORTED_OPENAT(openat64)

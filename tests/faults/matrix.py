@@ -23,7 +23,7 @@ _NUMBERS = "/usr/include/x86_64-linux-gnu/asm/unistd_64.h"
 
 # The errors that each call's manual page lists and that fit a file, a descriptor or a process of ours.
 ERRORS = {
-    "openat": "EACCES EMFILE ENFILE ENOSPC EROFS EIO EINTR ELOOP ENOMEM ENOENT", "openat2": "EACCES EMFILE EIO",
+    "openat": "EACCES EMFILE ENFILE ENOSPC EROFS EIO EINTR ELOOP ENOMEM ENOENT",
     "read": "EIO EINTR EISDIR", "pread64": "EIO EINTR", "readv": "EIO EINTR", "lseek": "EINVAL",
     "write": "ENOSPC EDQUOT EIO EFBIG EINTR", "pwrite64": "ENOSPC EDQUOT EIO EINTR",
     "writev": "ENOSPC EDQUOT EIO EFBIG EINTR", "copy_file_range": "ENOSPC EIO EXDEV",

@@ -40,10 +40,10 @@ AT_ITS_OPENINGS = {
     "System/Library/DeviceProperties.plist": 3 * [DONE],
 }
 AFTER_ITS_OPENINGS = {PREFERENCES: DONE_UNSEEN, CONTACTS: DONE_UNSEEN, "tmp": DONE, "etc": DONE_UNSEEN}
-# Where it turns into the link, or back, before each opening, beginning with the first one or the second one.
+# Where it turns into the link, or back, before each opening, beginning with the first one or the second one. What
+# does not get there in one step goes again step by step, and may find the directory back in its place.
 AT_EACH_OPENING = {
-    PREFERENCES: [NOT_SAVED_UNSEEN, NOT_SAVED_UNSEEN], CONTACTS: [RECORDS_LEFT, RECORDS_LEFT],
-    "tmp": [NOT_SAVED, DONE], "etc": [NOT_SAVED, NOT_SAVED],
+    PREFERENCES: [DONE_UNSEEN, DONE_UNSEEN], CONTACTS: [DONE, DONE], "tmp": [DONE, NOT_SAVED], "etc": [DONE, NOT_SAVED],
 }
 # Where it turns into the link before the first, second ... of another call. Both journals of the database are given
 # away and removed before the settings are written, given away and renamed.

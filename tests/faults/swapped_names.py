@@ -12,7 +12,7 @@ CONTACTS = "var/mobile/Library/Contacts"
 # What each program may end with, in the order of PROGRAMS, where a directory turns into a link out of the image
 # and back before each opening: which look meets the link depends on how many there are.
 AT_OPENINGS = {
-    PREFERENCES: ({0, 1, 16}, {0, 5, 7}, {0, 6}, {0, 6}, {0, 6}, {0}, {0, 6}, {0, 1, 6}),
+    PREFERENCES: ({0, 1, 16}, {0, 3, 5, 7}, {0, 6}, {0, 6}, {0, 6}, {0}, {0, 6}, {0, 1, 6}),
     CONTACTS: ({0}, {0, 3}, {0, 6}, {0, 6, 7}, {0}, {0, 6, 7}, {0}, {0}),
     "tmp": ({0, 1}, {0, 7}, {0, 6}, {0}, {0}, {0}, {0}, {0, 1, 7}),
     "etc": ({0, 1}, {0, 7}, {0, 6}, {0}, {0}, {0}, {0}, {0, 1}),
@@ -96,8 +96,10 @@ def wrong_effect(image, program, code):
         "import": len(records(image, "account IS NULL")) == 2}
     if program not in has_done:
         return "" if image.settings.read_bytes() == image.old else "the settings have changed"
-    # A migration that leaves records behind, or cannot look at what it has done, has retired the account.
-    succeeded = code in (0, 3, 5) if program == "migrate" else code == 0
+    if program == "migrate" and code == 3:
+        return ""  # the account is left behind, or only records of it
+    # A migration that cannot look at what it has done has retired the account.
+    succeeded = code in (0, 5) if program == "migrate" else code == 0
     if has_done[program] != succeeded:
         return f"ended with {code}, and has {'' if has_done[program] else 'not '}done its work"
     return ""

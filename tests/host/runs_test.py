@@ -48,6 +48,24 @@ class Bundles(hosttest.HostTestCase):
         self.assertEqual(str(self.image), hosttest.json.loads(process.stdout)["image"])
 
 
+class OlderKernels(hosttest.HostTestCase):
+    def run_without(self, call, name, limit=60):
+        run = self.run_host("--json", "--quiet", "--bundle", hosttest.BUNDLES / f"{name}.migrator",
+                            "--timeout", limit, prefix=(hosttest.WITHOUT_CALL, call))
+        return run.code, run.report["migrators"][0]["result"], run.report["log"]
+
+    def test_a_run_needs_no_openat2(self):
+        self.assertEqual((0, "done", self.run_bundle("LogsAndSucceeds").report["log"]),
+                         self.run_without("openat2", "LogsAndSucceeds"))
+
+    def test_a_run_needs_no_pidfd(self):
+        self.assertEqual((0, "done", self.run_bundle("LogsAndSucceeds").report["log"]),
+                         self.run_without("pidfd_open", "LogsAndSucceeds"))
+
+    def test_a_limit_needs_no_pidfd(self):
+        self.assertEqual((8, "timed out"), self.run_without("pidfd_open", "Sleeps", limit=1)[:2])
+
+
 class Output(hosttest.HostTestCase):
     def test_log_lines_go_to_the_standard_error(self):
         run = self.run_host("--bundle", GOOD)
