@@ -1,5 +1,6 @@
 #include "deviceimage/Database.h"
 
+#include <fcntl.h>
 #include <sqlite3.h>
 #include <sys/stat.h>
 
@@ -19,8 +20,26 @@ constexpr int kBusyMilliseconds = 5'000;
 
 using Connection = std::unique_ptr<sqlite3, int (*)(sqlite3*)>;
 
-// SQLite's own way to files, but for one thing: names are taken as they are. SQLite would look up
-// each link in them once and go by the result from then on.
+// What a database's files are called to SQLite: by the descriptor of the directory.
+constexpr std::string_view kHeldDirectories = "/proc/self/fd/";
+
+// Whether a file is there, which SQLite asks of two journals before each read. Asked of the held
+// directory it takes the system a third of the time that it takes over /proc.
+int isThere(sqlite3_vfs* /*files*/, const char* path, int what, int* answer) {
+  sqlite3_vfs* const usual = sqlite3_vfs_find(nullptr);
+  if (what != SQLITE_ACCESS_EXISTS || !std::string_view(path).starts_with(kHeldDirectories))
+    return usual->xAccess(usual, path, what, answer);
+  char* slash = nullptr;
+  const long directory = std::strtol(path + kHeldDirectories.size(), &slash, 10);
+  struct stat found = {};
+  const bool isFound = ::fstatat(static_cast<int>(directory), slash + 1, &found, 0) == 0;
+  *answer = isFound && (!S_ISREG(found.st_mode) || found.st_size > 0) ? 1 : 0;  // as SQLite does
+  return SQLITE_OK;
+}
+
+// SQLite's own way to files, but for two things: names are taken as they are, where SQLite would
+// look up each link in them once and go by the result from then on, and files are asked for in the
+// held directory.
 const char* wayToHeldFiles() {
   static sqlite3_vfs files = *sqlite3_vfs_find(nullptr);
   static const int registered = [] {
@@ -31,6 +50,7 @@ const char* wayToHeldFiles() {
       *std::copy(whole.begin(), whole.end(), full) = '\0';
       return SQLITE_OK;
     };
+    files.xAccess = isThere;
     return sqlite3_vfs_register(&files, 0);
   }();
   if (registered != SQLITE_OK) throw DatabaseFailure(registered, sqlite3_errstr(registered));
@@ -129,7 +149,7 @@ std::unique_ptr<Database> Database::openExisting(const DeviceImage& image,
     throw DatabaseFailure(SQLITE_CANTOPEN, parent.status.error->description);
   Descriptor directory(parent.descriptor);
   const std::string path =
-      "/proc/self/fd/" + std::to_string(directory.number()) + "/" + parent.name;
+      std::string(kHeldDirectories) + std::to_string(directory.number()) + "/" + parent.name;
   const int code =
       sqlite3_open_v2(path.c_str(), &opened, flags | SQLITE_OPEN_NOFOLLOW, wayToHeldFiles());
   std::unique_ptr<Database> database(new Database(name, std::move(directory), opened));
