@@ -4,7 +4,6 @@
 
 #include <algorithm>
 #include <cerrno>
-#include <vector>
 
 namespace host {
 namespace {
@@ -37,15 +36,16 @@ void sendMessage(int descriptor, MessageKind kind, std::string_view text) {
   sendOne(descriptor, kind, text);
 }
 
+MessageReader::MessageReader() : _buffer(kMaximumText + 1) {}
+
 bool MessageReader::receive(int descriptor, int limit, const Receiver& receiver) {
-  std::vector<char> buffer(kMaximumText + 1);
   for (int count = 0; count < limit; ++count) {
-    const ssize_t size = recv(descriptor, buffer.data(), buffer.size(), MSG_DONTWAIT);
+    const ssize_t size = recv(descriptor, _buffer.data(), _buffer.size(), MSG_DONTWAIT);
     if (size < 0 && errno == EINTR) continue;
     if (size < 0) return errno == EAGAIN;
     if (size == 0) return false;
-    const auto kind = static_cast<MessageKind>(buffer[0]);
-    const std::string_view text(buffer.data() + 1, static_cast<std::size_t>(size) - 1);
+    const auto kind = static_cast<MessageKind>(_buffer[0]);
+    const std::string_view text(_buffer.data() + 1, static_cast<std::size_t>(size) - 1);
     _parts += text.substr(0, kMaximumLine - std::min(kMaximumLine, _parts.size()));
     if (kind == MessageKind::linePart) continue;
     receiver(kind, _parts);

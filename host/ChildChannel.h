@@ -4,6 +4,7 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "deviceimage/Descriptor.h"
 
@@ -42,11 +43,13 @@ void sendMessage(int descriptor, MessageKind kind, std::string_view text);
 class MessageReader {
  public:
   using Receiver = std::function<void(MessageKind kind, std::string_view text)>;
+  MessageReader();
   // Hands on up to `limit` messages that have arrived and does not wait. False when the sender has
   // closed its end.
   bool receive(int descriptor, int limit, const Receiver& receiver);
 
  private:
+  std::vector<char> _buffer;  // for one message
   std::string _parts;
 };
 

@@ -39,10 +39,11 @@ class Watch {
   }
 
   MigratorOutcome untilItEnds(Interruption& interruption) {
+    if (interruption.requested()) _stop(Ending::interrupted);
     while (!_hasEnded() && !(_stopped && Clock::now() >= _deadline + kPatience)) {
       _waitForNews(interruption);
       _takeNews();
-      if (interruption.requested())
+      if (_hasNews(Source::interruption) && interruption.requested())
         _stop(Ending::interrupted);
       else if (Clock::now() >= _deadline)
         _stop(Ending::timedOut);
@@ -52,11 +53,12 @@ class Watch {
   }
 
  private:
+  enum class Source : std::size_t { end, channel, output, interruption };
+
   // A process that somebody traces has ended before its parent can take its end away; the
   // descriptor tells.
   bool _hasEnded() {
-    pollfd ended = {_process.ended.number(), POLLIN, 0};
-    if (poll(&ended, 1, 0) > 0) return true;
+    if (_process.ended.isOpen()) return _hasNews(Source::end);
     siginfo_t information = {};
     return waitid(P_PID, static_cast<id_t>(_process.identifier), &information,
                   WEXITED | WNOHANG | WNOWAIT) != 0 ||
@@ -67,21 +69,30 @@ class Watch {
     // A process that was killed needs a moment to end.
     const auto left =
         _stopped ? milliseconds(100) : std::chrono::ceil<milliseconds>(_deadline - Clock::now());
-    std::array<pollfd, 4> sources = {
-        pollfd{_process.ended.number(), POLLIN, 0},
-        pollfd{_channelIsOpen ? _process.channel.number() : -1, POLLIN, 0},
-        pollfd{_outputIsOpen ? _process.output.number() : -1, POLLIN, 0},
-        pollfd{interruption.descriptor(), POLLIN, 0}};
-    poll(sources.data(), sources.size(),
-         static_cast<int>(std::clamp<milliseconds::rep>(left.count(), 0, 1000)));
+    _look(interruption.descriptor(),
+          static_cast<int>(std::clamp<milliseconds::rep>(left.count(), 0, 1000)));
+  }
+
+  // Looks which sources have news, waiting so many milliseconds for the first.
+  void _look(int interruption, int longest) {
+    _sources = {pollfd{_process.ended.number(), POLLIN, 0},
+                pollfd{_channelIsOpen ? _process.channel.number() : -1, POLLIN, 0},
+                pollfd{_outputIsOpen ? _process.output.number() : -1, POLLIN, 0},
+                pollfd{interruption, POLLIN, 0}};
+    poll(_sources.data(), _sources.size(), longest);
+  }
+
+  // As of the last look.
+  bool _hasNews(Source source) const {
+    return _sources[static_cast<std::size_t>(source)].revents != 0;
   }
 
   void _takeNews() {
-    if (_channelIsOpen)
+    if (_hasNews(Source::channel))
       _channelIsOpen =
           _reader.receive(_process.channel.number(), kMessagesATurn,
                           [this](MessageKind kind, std::string_view text) { _note(kind, text); });
-    if (_outputIsOpen) _outputIsOpen = _readOutput();
+    if (_hasNews(Source::output)) _outputIsOpen = _readOutput();
   }
 
   void _note(MessageKind kind, std::string_view text) {
@@ -153,16 +164,11 @@ class Watch {
     const EndedChildren ended = endAllChildren(_process.identifier, _spared);
     // The rest of what was sent. Who cannot be killed may go on sending.
     const Clock::time_point end = Clock::now() + (ended.all ? kPatience : std::chrono::seconds(0));
-    do _takeNews();
-    while (_isAnythingLeft() && Clock::now() < end);
+    do {
+      _look(-1, 0);
+      _takeNews();
+    } while ((_hasNews(Source::channel) || _hasNews(Source::output)) && Clock::now() < end);
     _judge(ended);
-  }
-
-  bool _isAnythingLeft() {
-    std::array<pollfd, 2> sources = {
-        pollfd{_channelIsOpen ? _process.channel.number() : -1, POLLIN, 0},
-        pollfd{_outputIsOpen ? _process.output.number() : -1, POLLIN, 0}};
-    return poll(sources.data(), sources.size(), 0) > 0;
   }
 
   void _judge(const EndedChildren& ended) {
@@ -185,6 +191,7 @@ class Watch {
   }
 
   LaunchedMigrator _process;
+  std::array<pollfd, 4> _sources = {};  // by Source
   Sessions _spared;
   const LineSink& _sink;
   Clock::time_point _deadline;
