@@ -158,6 +158,30 @@ TEST(BinaryReader, RefusesWithThePlaceOfTheFault) {
   }
 }
 
+TEST(BinaryReader, LooksAtEachByteOfAnASCIIText) {
+  constexpr std::size_t kLongest = 14;  // with its count in the marker
+  const std::string letters = "abcdefghijklmn";
+  for (std::size_t size = 0; size <= kLongest; ++size) {
+    const std::string text = letters.substr(0, size);
+    const std::string marker(1, static_cast<char>(0x50 + size));
+    // What lies behind the text is none of its bytes.
+    const BinaryList good = {{"\xA2\x01\x02", marker + text, "\x44\xFF\xFF\xFF\xFF"}};
+    EXPECT_EQ(read(good), Value(Array{text, Bytes{0xFF, 0xFF, 0xFF, 0xFF}})) << size;
+    for (std::size_t at = 0; at < size; ++at) {
+      std::string bad = text;
+      bad[at] = '\x80';
+      EXPECT_EQ(errorOf(only(marker + bad)).byteOffset, 9 + at) << size;
+    }
+  }
+}
+
+TEST(BinaryReader, TakesUnitsOfEverySizeInOneText) {
+  // The last ones of one, two and three bytes of UTF-8, and the first of the next size.
+  const BinaryList list = only("\x67\0\x7F\0\x80\x07\xFF\x08\0\xD7\xFF\xE0\0\xFF\xFF"s);
+  EXPECT_EQ(read(list),
+            Value("\x7F\xC2\x80\xDF\xBF\xE0\xA0\x80\xED\x9F\xBF\xEE\x80\x80\xEF\xBF\xBF"));
+}
+
 TEST(BinaryReader, RefusesATrailerThatDoesNotFit) {
   // An object at 8, a table of four bytes at 9, the trailer at 13.
   const struct {
