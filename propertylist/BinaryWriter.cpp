@@ -27,6 +27,10 @@ std::string_view viewOf(const Bytes& data) {
   return {reinterpret_cast<const char*>(data.data()), data.size()};
 }
 
+std::uint64_t hashOfAddress(const void* content) {
+  return TextTable::hashOf(reinterpret_cast<std::uintptr_t>(content), 0);
+}
+
 bool isScalar(Kind kind) {
   return kind == Kind::integer || kind == Kind::real || kind == Kind::boolean || kind == Kind::date;
 }
@@ -208,9 +212,10 @@ BinaryWriter::Number BinaryWriter::_numberOfText(const Text& text, std::uint64_t
 }
 
 BinaryWriter::Number BinaryWriter::_numberOfNewText(const Text& text, std::uint64_t hash) {
-  if (text.size() > kShort) {
-    const auto known = _byAddress.find(&text);
-    if (known != _byAddress.end()) return known->second;
+  const bool isLong = text.size() > kShort;
+  if (isLong) {
+    const Number number = _numberAt(&text);
+    if (number != kNoNumber) return number;
   }
   if (hash == 0) hash = TextTable::hashOf(text);
   std::size_t known =
@@ -220,14 +225,15 @@ BinaryWriter::Number BinaryWriter::_numberOfNewText(const Text& text, std::uint6
     _contentBytes += text.size();
     _texts.add(hash, known);
   }
-  if (text.size() > kShort) _byAddress.emplace(&text, static_cast<Number>(known));
+  if (isLong) _remember(&text, static_cast<Number>(known));
   return static_cast<Number>(known);
 }
 
 BinaryWriter::Number BinaryWriter::_numberOfData(const Bytes& data, const Value& value) {
-  if (data.size() > kShort) {
-    const auto known = _byAddress.find(&data);
-    if (known != _byAddress.end()) return known->second;
+  const bool isLong = data.size() > kShort;
+  if (isLong) {
+    const Number number = _numberAt(&data);
+    if (number != kNoNumber) return number;
   }
   const std::uint64_t hash = TextTable::hashOf(viewOf(data));
   std::size_t known = _datas.find(
@@ -237,7 +243,7 @@ BinaryWriter::Number BinaryWriter::_numberOfData(const Bytes& data, const Value&
     _datas.add(hash, known);
     _contentBytes += data.size();
   }
-  if (data.size() > kShort) _byAddress.emplace(&data, static_cast<Number>(known));
+  if (isLong) _remember(&data, static_cast<Number>(known));
   return static_cast<Number>(known);
 }
 
@@ -253,6 +259,18 @@ BinaryWriter::Number BinaryWriter::_numberOfScalar(const Value& value, std::uint
     _scalars.add(hash, known);
   }
   return static_cast<Number>(known);
+}
+
+// The number of the long text or data that stands there; kNoNumber when it has not come yet.
+BinaryWriter::Number BinaryWriter::_numberAt(const void* content) const {
+  const std::size_t known = _placesByAddress.find(
+      hashOfAddress(content), [&](std::size_t index) { return _places[index].content == content; });
+  return known != TextTable::kNone ? _places[known].number : kNoNumber;
+}
+
+void BinaryWriter::_remember(const void* content, Number number) {
+  _placesByAddress.add(hashOfAddress(content), _places.size());
+  _places.push_back({content, number});
 }
 
 BinaryWriter::Number BinaryWriter::_add(const Object& object) {

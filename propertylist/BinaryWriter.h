@@ -4,7 +4,6 @@
 #include <cstdint>
 #include <optional>
 #include <string_view>
-#include <unordered_map>
 #include <vector>
 
 #include "propertylist/TextTable.h"
@@ -49,6 +48,11 @@ class BinaryWriter {
     const Text* text = nullptr;
     Number number = 0;
   };
+  // The same of a long text or data.
+  struct Place {
+    const void* content;
+    Number number;
+  };
 
   void _makeRoomFor(std::size_t values);
   std::size_t _expectedSize() const;
@@ -64,6 +68,8 @@ class BinaryWriter {
   Number _numberOfNewText(const Text& text, std::uint64_t hash);
   Number _numberOfData(const Bytes& data, const Value& value);
   Number _numberOfScalar(const Value& value, std::uint64_t hash);
+  Number _numberAt(const void* content) const;
+  void _remember(const void* content, Number number);
   Number _add(const Object& object);
 
   bool _put(const Object& object);
@@ -100,7 +106,8 @@ class BinaryWriter {
   TextTable _texts;
   TextTable _datas;
   TextTable _scalars;
-  std::unordered_map<const void*, Number> _byAddress;
+  std::vector<Place> _places;
+  TextTable _placesByAddress;
   std::vector<Recent> _recent;
   Bytes _wide;                          // the text that is being put, in UTF-16
   std::vector<std::uint32_t> _offsets;  // no file is larger than they can tell
