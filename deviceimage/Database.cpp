@@ -1,6 +1,5 @@
 #include "deviceimage/Database.h"
 
-#include <fcntl.h>
 #include <sqlite3.h>
 #include <sys/stat.h>
 
@@ -11,6 +10,7 @@
 #include <span>
 #include <utility>
 
+#include "deviceimage/HeldFiles.h"
 #include "deviceimage/Schema.h"
 
 namespace deviceimage {
@@ -19,43 +19,6 @@ namespace {
 constexpr int kBusyMilliseconds = 5'000;
 
 using Connection = std::unique_ptr<sqlite3, int (*)(sqlite3*)>;
-
-// What a database's files are called to SQLite: by the descriptor of the directory.
-constexpr std::string_view kHeldDirectories = "/proc/self/fd/";
-
-// Whether a file is there, which SQLite asks of two journals before each read. Asked of the held
-// directory it takes the system a third of the time that it takes over /proc.
-int isThere(sqlite3_vfs* /*files*/, const char* path, int what, int* answer) {
-  sqlite3_vfs* const usual = sqlite3_vfs_find(nullptr);
-  if (what != SQLITE_ACCESS_EXISTS || !std::string_view(path).starts_with(kHeldDirectories))
-    return usual->xAccess(usual, path, what, answer);
-  char* slash = nullptr;
-  const long directory = std::strtol(path + kHeldDirectories.size(), &slash, 10);
-  struct stat found = {};
-  const bool isFound = ::fstatat(static_cast<int>(directory), slash + 1, &found, 0) == 0;
-  *answer = isFound && (!S_ISREG(found.st_mode) || found.st_size > 0) ? 1 : 0;  // as SQLite does
-  return SQLITE_OK;
-}
-
-// SQLite's own way to files, but for two things: names are taken as they are, where SQLite would
-// look up each link in them once and go by the result from then on, and files are asked for in the
-// held directory.
-const char* wayToHeldFiles() {
-  static sqlite3_vfs files = *sqlite3_vfs_find(nullptr);
-  static const int registered = [] {
-    files.zName = "held-directory";
-    files.xFullPathname = [](sqlite3_vfs*, const char* name, int size, char* full) {
-      const std::string_view whole(name);
-      if (std::cmp_greater_equal(whole.size(), size)) return SQLITE_CANTOPEN;
-      *std::copy(whole.begin(), whole.end(), full) = '\0';
-      return SQLITE_OK;
-    };
-    files.xAccess = isThere;
-    return sqlite3_vfs_register(&files, 0);
-  }();
-  if (registered != SQLITE_OK) throw DatabaseFailure(registered, sqlite3_errstr(registered));
-  return files.zName;
-}
 
 void run(sqlite3* connection, const char* sql) {
   const int code = sqlite3_exec(connection, sql, nullptr, nullptr, nullptr);
@@ -148,8 +111,7 @@ std::unique_ptr<Database> Database::openExisting(const DeviceImage& image,
   if (!parent.status.isSuccess())
     throw DatabaseFailure(SQLITE_CANTOPEN, parent.status.error->description);
   Descriptor directory(parent.descriptor);
-  const std::string path =
-      std::string(kHeldDirectories) + std::to_string(directory.number()) + "/" + parent.name;
+  const std::string path = heldPath(directory.number(), parent.name);
   const int code =
       sqlite3_open_v2(path.c_str(), &opened, flags | SQLITE_OPEN_NOFOLLOW, wayToHeldFiles());
   std::unique_ptr<Database> database(new Database(name, std::move(directory), opened));
@@ -209,6 +171,11 @@ void Database::_raise(int code, std::string_view what) const {
   text += _connection == nullptr ? sqlite3_errstr(code) : sqlite3_errmsg(_connection);
   if (_connection != nullptr && sqlite3_extended_errcode(_connection) == SQLITE_READONLY_ROLLBACK)
     text += " (a program was stopped while it wrote; open the image for writing once)";
+  if (_connection != nullptr && sqlite3_extended_errcode(_connection) == SQLITE_IOERR_ACCESS) {
+    text +=
+        " (its journal cannot be reached, or is none of its own; put the right file in its place)";
+    code = SQLITE_CANTOPEN;
+  }
   throw DatabaseFailure(code, text);
 }
 

@@ -4,6 +4,7 @@ import os
 import plistlib
 import socket
 import stat
+import struct
 import subprocess
 
 from hostile_image import MARK, OTHER_USER, as_other
@@ -22,7 +23,7 @@ LINKED_DIRECTORIES = {
     "var/mobile": (16, 7, 7, 7, 7, 7, 7, 7), "var/mobile/Library": (16, 7, 7, 7, 7, 7, 7, 7),
     PREFERENCES: WITHOUT_SETTINGS, "var/mobile/Library/Contacts": (0, 3, 6, 6, 0, 6, 0, 0),
 }
-LINKED_JOURNAL = (0, 7, 6, 7, 0, 7, 0, 0)
+PLANTED_JOURNAL = (0, 7, 6, 7, 0, 7, 0, 0)
 PLANTS = {
     "a link to a secret": lambda image, path: path.symlink_to(image.secret),
     "a link to nothing": lambda image, path: path.symlink_to(image.outside / "nothing"),
@@ -153,11 +154,24 @@ def linked_directory(name):
     return case
 
 
-def linked_journal(image):
-    """A link lies where the database's journal would."""
-    for database in list(image.root.rglob("*.sqlite")):
-        database.with_name(database.name + "-journal").symlink_to(image.secret)
-    return image.wrong_ends(LINKED_JOURNAL) or wrong_accounts(image.settings)
+def journal_that_names(image):
+    """A journal without pages of a transaction over several files, of which one is outside of the image."""
+    name = os.fsencode(image.secret)
+    header = bytes.fromhex("d9d505f920a163d7") + struct.pack(">IIIII", 0, 0, 16, 512, 4096)
+    return (header.ljust(512, b"\0") + struct.pack(">I", 0) + name + struct.pack(">II", len(name), sum(name))
+            + header[:8])
+
+
+def planted_journal(plant):
+    """Something lies where each database's journal would."""
+    def case(image):
+        for database in list(image.root.rglob("*.sqlite")):
+            plant(image, database.with_name(database.name + "-journal"))
+        before = image.secret.read_bytes()
+        if wrong := image.wrong_ends(PLANTED_JOURNAL) or wrong_accounts(image.settings):
+            return wrong
+        return "" if image.secret.read_bytes() == before else "the secret has changed"
+    return case
 
 
 CASES = {
@@ -172,5 +186,7 @@ CASES = {
     "the settings file is 10 GiB of nothing": settings_are(settings_of_many_gigabytes),
     "the settings file grows while it is read": settings_grow_while_they_are_read,
     **{f"a link out of the image: {name}": linked_directory(name) for name in LINKED_DIRECTORIES},
-    "a journal is a link to a secret": linked_journal,
+    "a journal is a link to a secret": planted_journal(lambda i, journal: journal.symlink_to(i.secret)),
+    "a journal is a FIFO": planted_journal(lambda i, journal: os.mkfifo(journal)),
+    "a journal names a secret": planted_journal(lambda i, journal: journal.write_bytes(journal_that_names(i))),
 }
