@@ -58,7 +58,7 @@ class Watch {
   // A process that somebody traces has ended before its parent can take its end away; the
   // descriptor tells.
   bool _hasEnded() {
-    if (_process.ended.isOpen()) return _hasNews(Source::end);
+    if (_process.ended.isOpen() && _looked) return _hasNews(Source::end);
     siginfo_t information = {};
     return waitid(P_PID, static_cast<id_t>(_process.identifier), &information,
                   WEXITED | WNOHANG | WNOWAIT) != 0 ||
@@ -79,20 +79,20 @@ class Watch {
                 pollfd{_channelIsOpen ? _process.channel.number() : -1, POLLIN, 0},
                 pollfd{_outputIsOpen ? _process.output.number() : -1, POLLIN, 0},
                 pollfd{interruption, POLLIN, 0}};
-    poll(_sources.data(), _sources.size(), longest);
+    _looked = poll(_sources.data(), _sources.size(), longest) >= 0;
   }
 
-  // As of the last look.
+  // As of the last look; any source may have some when that failed.
   bool _hasNews(Source source) const {
-    return _sources[static_cast<std::size_t>(source)].revents != 0;
+    return !_looked || _sources[static_cast<std::size_t>(source)].revents != 0;
   }
 
   void _takeNews() {
-    if (_hasNews(Source::channel))
+    if (_channelIsOpen && _hasNews(Source::channel))
       _channelIsOpen =
           _reader.receive(_process.channel.number(), kMessagesATurn,
                           [this](MessageKind kind, std::string_view text) { _note(kind, text); });
-    if (_hasNews(Source::output)) _outputIsOpen = _readOutput();
+    if (_outputIsOpen && _hasNews(Source::output)) _outputIsOpen = _readOutput();
   }
 
   void _note(MessageKind kind, std::string_view text) {
@@ -167,8 +167,13 @@ class Watch {
     do {
       _look(-1, 0);
       _takeNews();
-    } while ((_hasNews(Source::channel) || _hasNews(Source::output)) && Clock::now() < end);
+    } while (_tookSome() && Clock::now() < end);
     _judge(ended);
+  }
+
+  // Not after a look that failed: how often it would is unknown.
+  bool _tookSome() const {
+    return _looked && (_hasNews(Source::channel) || _hasNews(Source::output));
   }
 
   void _judge(const EndedChildren& ended) {
@@ -192,6 +197,7 @@ class Watch {
 
   LaunchedMigrator _process;
   std::array<pollfd, 4> _sources = {};  // by Source
+  bool _looked = true;                  // and learnt what they have
   Sessions _spared;
   const LineSink& _sink;
   Clock::time_point _deadline;

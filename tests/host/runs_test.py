@@ -48,7 +48,7 @@ class Bundles(hosttest.HostTestCase):
         self.assertEqual(str(self.image), hosttest.json.loads(process.stdout)["image"])
 
 
-class OlderKernels(hosttest.HostTestCase):
+class LessThanUsual(hosttest.HostTestCase):
     def run_without(self, call, name, limit=60):
         run = self.run_host("--json", "--quiet", "--bundle", hosttest.BUNDLES / f"{name}.migrator",
                             "--timeout", limit, prefix=(hosttest.WITHOUT_CALL, call))
@@ -61,6 +61,13 @@ class OlderKernels(hosttest.HostTestCase):
     def test_a_run_needs_no_pidfd(self):
         self.assertEqual((0, "done", self.run_bundle("LogsAndSucceeds").report["log"]),
                          self.run_without("pidfd_open", "LogsAndSucceeds"))
+
+    def test_a_run_sees_all_that_happens_when_each_wait_fails(self):
+        self.assertEqual((0, "done", self.run_bundle("LogsAndSucceeds").report["log"]),
+                         self.run_without("poll", "LogsAndSucceeds", limit=5))
+
+    def test_a_limit_holds_when_each_wait_fails(self):
+        self.assertEqual((8, "timed out"), self.run_without("poll", "Sleeps", limit=1)[:2])
 
     def test_a_limit_needs_no_pidfd(self):
         self.assertEqual((8, "timed out"), self.run_without("pidfd_open", "Sleeps", limit=1)[:2])

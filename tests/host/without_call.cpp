@@ -5,6 +5,7 @@
 //   without_call subreaper COMMAND...   orphans cannot be adopted
 //   without_call openat2 COMMAND...     the system does not know openat2
 //   without_call pidfd_open COMMAND...  nor pidfd_open
+//   without_call poll COMMAND...        each wait is interrupted at once
 #include <linux/filter.h>
 #include <linux/seccomp.h>
 #include <sys/prctl.h>
@@ -42,6 +43,7 @@ Filter filterNamed(std::string_view name) {
   if (name == "kill") return without(SYS_kill, kRefuse);
   if (name == "openat2") return without(SYS_openat2, kUnknown);
   if (name == "pidfd_open") return without(SYS_pidfd_open, kUnknown);
+  if (name == "poll") return without(SYS_poll, SECCOMP_RET_ERRNO | EINTR);
   if (name != "subreaper") return {};
   return {load(kNumber),        unless(SYS_prctl, 3),
           load(kFirstArgument), unless(PR_SET_CHILD_SUBREAPER, 1),
