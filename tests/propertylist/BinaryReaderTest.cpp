@@ -159,18 +159,18 @@ TEST(BinaryReader, RefusesWithThePlaceOfTheFault) {
 }
 
 TEST(BinaryReader, LooksAtEachByteOfAnASCIIText) {
-  constexpr std::size_t kLongest = 14;  // with its count in the marker
-  const std::string letters = "abcdefghijklmn";
-  for (std::size_t size = 0; size <= kLongest; ++size) {
+  const std::string letters = "abcdefghijklmnopqrstuvwxyz";
+  for (std::size_t size = 0; size <= letters.size(); ++size) {
     const std::string text = letters.substr(0, size);
-    const std::string marker(1, static_cast<char>(0x50 + size));
-    // What lies behind the text is none of its bytes.
-    const BinaryList good = {{"\xA2\x01\x02", marker + text, "\x44\xFF\xFF\xFF\xFF"}};
-    EXPECT_EQ(read(good), Value(Array{text, Bytes{0xFF, 0xFF, 0xFF, 0xFF}})) << size;
+    const std::string head = "\x5F\x10" + std::string(1, static_cast<char>(size));
+    // What comes behind the text is not ASCII, and refused for something else.
+    const BinaryList good = {{"\xA2\x01\x02", head + text, "\x82\xFF\xFF\xFF"}};
+    EXPECT_EQ(errorOf(good).what, "an object of an unknown type") << size;
+    EXPECT_EQ(read(only(head + text)), Value(text)) << size;
     for (std::size_t at = 0; at < size; ++at) {
       std::string bad = text;
       bad[at] = '\x80';
-      EXPECT_EQ(errorOf(only(marker + bad)).byteOffset, 9 + at) << size;
+      EXPECT_EQ(errorOf(only(head + bad)).byteOffset, 11 + at) << size;
     }
   }
 }
