@@ -96,8 +96,9 @@ def wrong_effect(image, program, code):
         "import": len(records(image, "account IS NULL")) == 2}
     if program not in has_done:
         return "" if image.settings.read_bytes() == image.old else "the settings have changed"
-    if program == "migrate" and code == 3:
-        return ""  # the account is left behind, or only records of it
+    if program == "migrate" and code == 3:  # the account is left behind, or only records of it
+        return "" if 2 in (len(records(image, "account IS NULL")), len(records(image, "account IS NOT NULL"))) else \
+            "records are missing"
     # A migration that cannot look at what it has done has retired the account.
     succeeded = code in (0, 5) if program == "migrate" else code == 0
     if has_done[program] != succeeded:
