@@ -4,6 +4,7 @@
 #include <sys/stat.h>
 
 #include <algorithm>
+#include <array>
 #include <cerrno>
 #include <cstdlib>
 #include <map>
@@ -17,6 +18,7 @@ namespace deviceimage {
 namespace {
 
 constexpr int kBusyMilliseconds = 5'000;
+constexpr std::string_view kSaidNo = "said no";
 
 using Connection = std::unique_ptr<sqlite3, int (*)(sqlite3*)>;
 
@@ -37,6 +39,21 @@ Connection emptyDatabase() {
   return connection;
 }
 
+// What a killed program left would be put into a new database, though it belongs to one that has
+// gone.
+void refuseJournalWithoutDatabase(const DeviceImage& image, std::string_view name) {
+  for (const char* const suffix : {"-journal", "-wal"}) {
+    const std::string journal = std::string(name) + suffix;
+    const FileLook look = image.lookAt(journal);
+    const bool isEmpty = look.kind == FileLook::Kind::file && look.size == 0;
+    if (look.kind != FileLook::Kind::nothing && !isEmpty)
+      throw DatabaseFailure(SQLITE_CANTOPEN,
+                            "the database \"" + std::string(name) + "\" is missing, and \"" +
+                                journal +
+                                "\" is there; put the database back, or move that file away");
+  }
+}
+
 // Puts an empty database in place in one step, so that an empty file is never one of ours.
 void createDatabase(const DeviceImage& image, std::string_view name) {
   const Connection connection = emptyDatabase();
@@ -50,22 +67,26 @@ void createDatabase(const DeviceImage& image, std::string_view name) {
     throw DatabaseFailure(SQLITE_CANTOPEN, made.error->description);
 }
 
-std::map<std::string, std::string> schemaOf(sqlite3* connection) {
-  std::map<std::string, std::string> statements;
+// Everything that the schema says, whatever of it has a name in common: a trigger may be called
+// like its table.
+std::vector<std::string> schemaOf(sqlite3* connection) {
+  std::vector<std::string> rows;
   const int code = sqlite3_exec(
-      connection, "SELECT name, ifnull(sql, '') FROM sqlite_schema",
+      connection,
+      "SELECT json_array(type, name, tbl_name, sql) FROM sqlite_schema ORDER BY type, name, "
+      "tbl_name, sql",
       [](void* into, int, char** values, char**) {
-        static_cast<std::map<std::string, std::string>*>(into)->emplace(values[0], values[1]);
+        static_cast<std::vector<std::string>*>(into)->emplace_back(values[0]);
         return 0;
       },
-      &statements, nullptr);
+      &rows, nullptr);
   if (code != SQLITE_OK) throw DatabaseFailure(code, sqlite3_errmsg(connection));
-  return statements;
+  return rows;
 }
 
 // Made once a process, because making a database takes longer than opening one.
-const std::map<std::string, std::string>& expectedSchema() {
-  static const std::map<std::string, std::string> schema = schemaOf(emptyDatabase().get());
+const std::vector<std::string>& expectedSchema() {
+  static const std::vector<std::string> schema = schemaOf(emptyDatabase().get());
   return schema;
 }
 
@@ -116,6 +137,7 @@ std::unique_ptr<Database> Database::openExisting(const DeviceImage& image,
       sqlite3_open_v2(path.c_str(), &opened, flags | SQLITE_OPEN_NOFOLLOW, wayToHeldFiles());
   std::unique_ptr<Database> database(new Database(name, std::move(directory), opened));
   if (code != SQLITE_OK) database->_raise(code, "cannot be opened");
+  database->_refuseWriteAheadMode();
   database->_configure();
   database->_checkSchema();
   return database;
@@ -123,8 +145,10 @@ std::unique_ptr<Database> Database::openExisting(const DeviceImage& image,
 
 std::unique_ptr<Database> Database::openOrCreate(const DeviceImage& image,
                                                  platform::SyncDataType type) {
-  if (image.lookAt(DeviceImage::databaseFile(type)).kind == FileLook::Kind::nothing)
+  if (image.lookAt(DeviceImage::databaseFile(type)).kind == FileLook::Kind::nothing) {
+    refuseJournalWithoutDatabase(image, DeviceImage::databaseFile(type));
     createDatabase(image, DeviceImage::databaseFile(type));
+  }
   std::unique_ptr<Database> database = openExisting(image, type, DatabaseAccess::readWrite);
   if (database == nullptr)
     throw DatabaseFailure(SQLITE_CANTOPEN, "\"" + std::string(DeviceImage::databaseFile(type)) +
@@ -132,10 +156,28 @@ std::unique_ptr<Database> Database::openOrCreate(const DeviceImage& image,
   return database;
 }
 
+// Before anything else is read, because SQLite would make the files of that mode, and wait for what
+// lies in their places.
+void Database::_refuseWriteAheadMode() const {
+  constexpr sqlite3_int64 kVersionsAt = 18;  // for writing and for reading, in the file's header
+  constexpr unsigned char kWriteAhead = 2;
+  std::array<unsigned char, 2> versions{};
+  sqlite3_file* file = nullptr;
+  sqlite3_file_control(_connection, "main", SQLITE_FCNTL_FILE_POINTER, static_cast<void*>(&file));
+  if (file == nullptr || file->pMethods == nullptr) return;
+  file->pMethods->xRead(file, versions.data(), static_cast<int>(versions.size()), kVersionsAt);
+  if (versions[0] != kWriteAhead && versions[1] != kWriteAhead) return;
+  throw DatabaseFailure(SQLITE_SCHEMA, "the database \"" + _name +
+                                           "\" cannot be used: it is in write-ahead mode; run "
+                                           "\"PRAGMA journal_mode = DELETE\" on it");
+}
+
 void Database::_configure() {
   sqlite3_busy_timeout(_connection, kBusyMilliseconds);
   sqlite3_db_config(_connection, SQLITE_DBCONFIG_DEFENSIVE, 1, nullptr);
   sqlite3_db_config(_connection, SQLITE_DBCONFIG_TRUSTED_SCHEMA, 0, nullptr);
+  sqlite3_db_config(_connection, SQLITE_DBCONFIG_ENABLE_TRIGGER, 0, nullptr);
+  sqlite3_db_config(_connection, SQLITE_DBCONFIG_ENABLE_VIEW, 0, nullptr);
   for (const char* pragma : {"PRAGMA foreign_keys = ON", "PRAGMA cell_size_check = ON",
                              "PRAGMA mmap_size = 0", "PRAGMA temp_store = MEMORY",
                              // A commit that has returned survives a power cut.
@@ -156,10 +198,6 @@ void Database::_checkSchema() {
     if (version != kSchemaVersion || schemaOf(_connection) != expectedSchema())
       throw DatabaseFailure(
           SQLITE_SCHEMA, "its tables are not those of version " + std::to_string(kSchemaVersion));
-    Statement journal(*this, "PRAGMA journal_mode");
-    if (journal.step() && journal.bytes(0) == "wal")
-      throw DatabaseFailure(
-          SQLITE_SCHEMA, "it is in write-ahead mode; run \"PRAGMA journal_mode = DELETE\" on it");
   } catch (const DatabaseFailure& failure) {
     throw DatabaseFailure(failure.code(),
                           "the database \"" + _name + "\" cannot be used: " + failure.what());
@@ -171,9 +209,12 @@ void Database::_raise(int code, std::string_view what) const {
   text += _connection == nullptr ? sqlite3_errstr(code) : sqlite3_errmsg(_connection);
   if (_connection != nullptr && sqlite3_extended_errcode(_connection) == SQLITE_READONLY_ROLLBACK)
     text += " (a program was stopped while it wrote; open the image for writing once)";
-  if (_connection != nullptr && sqlite3_extended_errcode(_connection) == SQLITE_IOERR_ACCESS) {
+  const int extended = _connection == nullptr ? code : sqlite3_extended_errcode(_connection);
+  // Once the database is open, only its journals are opened.
+  if (extended == SQLITE_IOERR_ACCESS || (extended == SQLITE_CANTOPEN && what == kSaidNo)) {
     text +=
-        " (its journal cannot be reached, or is none of its own; put the right file in its place)";
+        " (what lies in the place of its \"-journal\" or \"-wal\" cannot be reached, or is none of "
+        "its own; keep it, and put the right file there)";
     code = SQLITE_CANTOPEN;
   }
   throw DatabaseFailure(code, text);
@@ -209,7 +250,7 @@ Statement::~Statement() {
 }
 
 void Statement::_check(int code) const {
-  if (code != SQLITE_OK) _database._raise(code, "said no");
+  if (code != SQLITE_OK) _database._raise(code, kSaidNo);
 }
 
 void Statement::_reset() {

@@ -68,6 +68,7 @@ class Database {
   friend class Statement;
   friend class Transaction;
   Database(std::string name, Descriptor directory, sqlite3* connection);
+  void _refuseWriteAheadMode() const;
   void _configure();
   void _checkSchema();
   [[noreturn]] void _raise(int code, std::string_view what) const;

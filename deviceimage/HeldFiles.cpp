@@ -55,16 +55,21 @@ Look lookAt(const char* path) {
 // SQLite asks for two journals before each read. By the path it would take the system three times
 // as long.
 int answerAccess(sqlite3_vfs* /*files*/, const char* path, int /*what*/, int* answer) {
-  const Look look = lookAt(path);
+  const std::string_view whole(path);
+  // The names of others come from journals.
+  const bool isJournal = whole.ends_with("-journal") || whole.ends_with("-wal");
+  const Look look = isJournal ? lookAt(path) : Look::other;
   *answer = look == Look::file ? 1 : 0;  // an empty journal is none
   return look == Look::other ? SQLITE_IOERR_ACCESS : SQLITE_OK;
 }
 
-// A file without a name is SQLite's own, for what it cannot keep in memory.
+// A file without a name is SQLite's own, for what it cannot keep in memory. With a journal of the
+// write-ahead mode it would open a third file by itself, and wait for a FIFO there.
 int openHeld(sqlite3_vfs* /*files*/, sqlite3_filename path, sqlite3_file* file, int flags,
              int* flagsOfFile) {
   file->pMethods = nullptr;  // not open
-  if (path != nullptr && ((flags & SQLITE_OPEN_SUPER_JOURNAL) != 0 || lookAt(path) == Look::other))
+  constexpr int kNeverOpened = SQLITE_OPEN_SUPER_JOURNAL | SQLITE_OPEN_WAL;
+  if (path != nullptr && ((flags & kNeverOpened) != 0 || lookAt(path) == Look::other))
     return SQLITE_CANTOPEN;
   return usual().xOpen(&usual(), path, file, flags, flagsOfFile);
 }

@@ -110,11 +110,28 @@ INSTANTIATE_TEST_SUITE_P(
         DamageCase{"WithoutATable",
                    [](const std::filesystem::path& path) { runSQL(path, "DROP TABLE anchors"); },
                    "its tables are not those of version 1"},
+        DamageCase{"WithATriggerCalledLikeItsTable",
+                   [](const std::filesystem::path& path) {
+                     runSQL(path,
+                            "CREATE TRIGGER records AFTER INSERT ON records BEGIN "
+                            "DELETE FROM records WHERE id <> new.id; END");
+                   },
+                   "its tables are not those of version 1"},
         DamageCase{
             "InWriteAheadMode",
             [](const std::filesystem::path& path) { runSQL(path, "PRAGMA journal_mode = WAL"); },
             "write-ahead mode"}),
     [](const auto& instance) { return std::string(instance.param.name); });
+
+TEST(DatabaseFile, HasNoFilesOfTheWriteAheadModeMade) {
+  const TemporaryImage image;
+  ASSERT_TRUE(image.stores().ensureStore(Dataclass::contacts, "x").isSuccess());
+  const std::string path = image.path(DeviceImage::databaseFile(platform::ContactsSyncType));
+  runSQL(path, "PRAGMA journal_mode = WAL");
+  EXPECT_FALSE(image.stores().ensureStore(Dataclass::contacts, "y").isSuccess());
+  EXPECT_FALSE(std::filesystem::exists(path + "-wal"));
+  EXPECT_FALSE(std::filesystem::exists(path + "-shm"));
+}
 
 TEST(DatabaseFile, IsNeverReachedThroughALink) {
   const TemporaryImage image;

@@ -59,7 +59,7 @@ class JournalsPlace : public testing::Test {
     ASSERT_EQ(listed.status.code, SQLITE_CANTOPEN);
     EXPECT_THAT(listed.status.error->description, HasSubstr("Contacts.sqlite"));
     EXPECT_THAT(listed.status.error->description,
-                HasSubstr("its journal cannot be reached, or is none of its own"));
+                HasSubstr("cannot be reached, or is none of its own; keep it"));
     EXPECT_FALSE(image.stores().ensureStore(Dataclass::contacts, "y").isSuccess());
   }
 
@@ -92,9 +92,28 @@ TEST_F(JournalsPlace, HasNoOtherFileOfTheImageDeletedThatAJournalNames) {
   const Descriptor held(::open(database.parent_path().c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
   const std::filesystem::path other = database.parent_path() / "other";
   std::ofstream(other) << "kept";
-  writeJournalThatNames(heldPath(held.number(), "other"));
-  EXPECT_FALSE(image.stores().ensureStore(Dataclass::contacts, "y").isSuccess());
-  EXPECT_EQ(textOf(other), "kept");
+  for (const char* const name : {"other", "missing"}) {
+    writeJournalThatNames(heldPath(held.number(), name));
+    expectRefused();
+    EXPECT_EQ(textOf(other), "kept");
+    EXPECT_TRUE(std::filesystem::exists(journal));
+  }
+}
+
+TEST_F(JournalsPlace, MayNotHoldAJournalOfAnotherMode) {
+  std::ofstream(database.string() + "-wal") << "no journal at all, but not empty";
+  expectRefused();
+  EXPECT_FALSE(std::filesystem::exists(database.string() + "-shm"));
+}
+
+TEST_F(JournalsPlace, MayNotHoldAJournalWhenThereIsNoDatabase) {
+  writeJournalThatNames("");
+  std::filesystem::remove(database);
+  const platform::Status made = image.stores().ensureStore(Dataclass::contacts, "y");
+  ASSERT_EQ(made.code, SQLITE_CANTOPEN);
+  EXPECT_THAT(made.error->description, HasSubstr("put the database back"));
+  EXPECT_FALSE(std::filesystem::exists(database));
+  EXPECT_TRUE(std::filesystem::exists(journal));
 }
 
 TEST_F(JournalsPlace, IsNotWaitedForWhenItIsAFIFO) {
@@ -112,7 +131,7 @@ TEST_F(JournalsPlace, IsTheSameAsALinkWhetherOrNotItLeadsToSomething) {
 TEST(HeldFiles, AreNamedByADescriptorAndAPlainName) {
   const TemporaryImage image;
   const Descriptor held(::open(image.path("tmp").c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
-  std::ofstream(image.path("tmp/file")) << "x";
+  std::ofstream(image.path("tmp/file-journal")) << "x";
   sqlite3_vfs& files = *sqlite3_vfs_find(wayToHeldFiles());
   const auto answerFor = [&files](const std::string& path) {
     int answer = -1;
@@ -120,18 +139,18 @@ TEST(HeldFiles, AreNamedByADescriptorAndAPlainName) {
     return code == SQLITE_OK ? answer : -1;
   };
   const std::string directory = "/proc/self/fd/" + std::to_string(held.number());
-  EXPECT_EQ(heldPath(held.number(), "file"), directory + "/file");
-  EXPECT_EQ(answerFor(directory + "/file"), 1);
-  EXPECT_EQ(answerFor(directory + "/missing"), 0);
+  EXPECT_EQ(heldPath(held.number(), "file-journal"), directory + "/file-journal");
+  EXPECT_EQ(answerFor(directory + "/file-journal"), 1);
+  EXPECT_EQ(answerFor(directory + "/missing-wal"), 0);
   for (const std::string& path :
        {std::string("/proc/self/fd/-100/etc/passwd"), directory + "//etc/passwd",
-        directory + "/../tmp/file", directory + "/..", directory + "/", directory,
-        std::string("/proc/self/fd/"), std::string("/proc/self/fd/99999999999999/file"),
-        image.path("tmp/file").string(), std::string("file"), std::string()}) {
+        directory + "/../tmp/file-journal", directory + "/..", directory + "/", directory,
+        std::string("/proc/self/fd/"), std::string("/proc/self/fd/99999999999999/file-journal"),
+        image.path("tmp/file-journal").string(), std::string("file-journal"), std::string()}) {
     EXPECT_EQ(answerFor(path), -1) << path;
     EXPECT_NE(files.xDelete(&files, path.c_str(), 0), SQLITE_OK) << path;
   }
-  EXPECT_EQ(textOf(image.path("tmp/file")), "x");
+  EXPECT_EQ(textOf(image.path("tmp/file-journal")), "x");
 }
 
 }  // namespace
