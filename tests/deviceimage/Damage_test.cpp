@@ -13,11 +13,6 @@ namespace {
 
 using testing::HasSubstr;
 
-std::string textOf(const std::filesystem::path& path) {
-  std::ifstream file(path, std::fstream::binary);
-  return {std::istreambuf_iterator<char>(file), {}};
-}
-
 void writeText(const std::filesystem::path& path, const std::string& text) {
   std::ofstream(path, std::fstream::binary | std::fstream::trunc) << text;
 }

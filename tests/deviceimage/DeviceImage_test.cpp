@@ -18,11 +18,6 @@ using testing::Field;
 using testing::HasSubstr;
 using testing::IsEmpty;
 
-std::string textOf(const std::filesystem::path& path) {
-  std::ifstream file(path, std::fstream::binary);
-  return {std::istreambuf_iterator<char>(file), {}};
-}
-
 std::span<const std::uint8_t> bytesOf(std::string_view text) {
   return {reinterpret_cast<const std::uint8_t*>(text.data()), text.size()};
 }

@@ -17,11 +17,6 @@ namespace {
 
 using testing::HasSubstr;
 
-std::string textOf(const std::filesystem::path& path) {
-  std::ifstream file(path, std::fstream::binary);
-  return {std::istreambuf_iterator<char>(file), {}};
-}
-
 std::string bigEndian(std::uint32_t number) {
   std::string bytes;
   for (const unsigned shift : {24U, 16U, 8U, 0U})

@@ -5,6 +5,8 @@
 
 #include <cstdlib>
 #include <filesystem>
+#include <fstream>
+#include <iterator>
 #include <memory>
 #include <stdexcept>
 #include <string>
@@ -14,6 +16,12 @@
 #include "deviceimage/RecordStores.h"
 
 namespace deviceimage {
+
+// Every byte of the file; empty when there is none.
+inline std::string textOf(const std::filesystem::path& path) {
+  std::ifstream file(path, std::fstream::binary);
+  return {std::istreambuf_iterator<char>(file), {}};
+}
 
 // A directory of its own for one test, which goes with the object. In memory where the machine has
 // such a file system that programs can be run from, because an image waits for the disk with every
